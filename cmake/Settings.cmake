@@ -1,0 +1,51 @@
+# What every target is compiled and linked with.
+
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS ON)  # TEMP_FAILURE_RETRY and the host's own calls
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+set(CMAKE_CXX_VISIBILITY_PRESET hidden)
+set(CMAKE_VISIBILITY_INLINES_HIDDEN ON)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+
+add_compile_options(-Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor -Wformat=2 -Werror)
+add_compile_definitions(_FILE_OFFSET_BITS=64)
+# A CGI process lives for two milliseconds, nearly all of it in the dynamic loader: no library
+# that is not needed, and symbols bound at the first call.
+add_link_options(-Wl,--as-needed -Wl,-O1 -Wl,-z,lazy)
+
+if(WEBAPI_SANITIZE)
+  add_compile_options(-fsanitize=${WEBAPI_SANITIZE} -fno-omit-frame-pointer
+                      -fno-sanitize-recover=all)
+  add_link_options(-fsanitize=${WEBAPI_SANITIZE})
+else()
+  add_link_options(-Wl,--no-undefined)
+endif()
+
+find_package(jsoncpp REQUIRED)
+find_package(Threads REQUIRED)
+
+# Where programs, API libraries and platform modules stand: in the build tree for a private root,
+# else where they are installed.
+if(WEBAPI_ROOT_PREFIX)
+  set(WEBAPI_MODULE_DIR ${CMAKE_BINARY_DIR}/modules)
+  set(WEBAPI_API_LIB_DIR ${CMAKE_BINARY_DIR}/apis)
+else()
+  set(WEBAPI_MODULE_DIR ${CMAKE_INSTALL_FULL_LIBDIR}/webapi/modules)
+  set(WEBAPI_API_LIB_DIR ${CMAKE_INSTALL_FULL_LIBDIR}/webapi/apis)
+endif()
+set(WEBAPI_DESCRIPTION_DIR ${CMAKE_BINARY_DIR}/descriptions)
+
+# webapi_folder(NAME FOLDER): the folder's sources as one OBJECT library, from which both the
+# shared library and the unit tests are linked.
+function(webapi_folder name folder)
+  file(GLOB sources CONFIGURE_DEPENDS ${folder}/*.cpp)
+  if(NOT sources)
+    add_library(${name} INTERFACE)
+    return()
+  endif()
+  add_library(${name} OBJECT ${sources})
+  target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR})
+  target_compile_definitions(${name} PUBLIC WEBAPI_ROOT_PREFIX="${WEBAPI_ROOT_PREFIX}")
+  target_link_libraries(${name} PUBLIC JsonCpp::JsonCpp)
+endfunction()

@@ -1,0 +1,38 @@
+#pragma once
+
+#include <cstdint>
+
+/// The binary interface between the framework and an API library.
+///
+/// An API library exports, with plain C names:
+///
+///     extern "C" QELO::_tag_API_TABLE* GetAPITable();
+///     extern "C" QELO::_tag_API_CHECK_TABLE* GetAPICheckTable();   // optional
+///
+/// Both return static arrays of the library, which the framework neither copies nor frees.
+namespace QELO {
+
+class APIRequest;
+class APIResponse;
+
+/// One method. The array ends with an entry whose `api` is null.
+struct _tag_API_TABLE {
+  const char* api;     ///< full API name, as in the request
+  int32_t version;     ///< API version that this entry serves
+  const char* method;  ///< method name
+  /// Serves the call. A method that sets neither success nor an error answers 117; so does one
+  /// that lets an exception escape, which is logged.
+  void (*function)(APIRequest*, APIResponse*);
+};
+
+/// One request check. The array ends with an entry whose `api` and `check` are null.
+struct _tag_API_CHECK_TABLE {
+  const char* api;
+  int32_t version;
+  const char* method;
+  /// Vets the request before the call; 0 stops it, and the check has set the response's error.
+  int (*check)(APIRequest*, APIResponse*);
+  void* reserved[2];  ///< the library's own; not read by the framework
+};
+
+}  // namespace QELO

@@ -1,0 +1,20 @@
+// The CGI program: one process, one request. It stands in the description directory, where the
+// library looks API descriptions up, and serves the request.
+
+#include <unistd.h>
+
+#include <cstdio>
+
+#include "webapi/WebEntry.h"
+#include "webapi/platform/Paths.h"
+
+int main(int argc, char** argv) {
+  if (chdir(QELO::Paths::kDescriptionDir) != 0) {
+    std::perror(QELO::Paths::kDescriptionDir);
+    return 1;
+  }
+  QELO::WebEntry entry;
+  entry.SetArgs(argc, argv);
+  entry.Run(Json::Value());
+  return 0;
+}

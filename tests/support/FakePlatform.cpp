@@ -1,0 +1,330 @@
+#include "tests/support/FakePlatform.h"
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <stdexcept>
+
+#include "webapi/platform/Cgi.h"
+#include "webapi/platform/Core.h"
+#include "webapi/platform/Credential.h"
+#include "webapi/platform/Session.h"
+#include "webapi/platform/Sharing.h"
+#include "webapi/platform/Token.h"
+#include "webapi/platform/WebServer.h"
+
+namespace {
+
+FakePlatform& fake() {
+  return FakePlatform::Get();
+}
+
+template <typename... Args>
+void note(const char* name, const Args&... args) {
+  std::string call = std::string(name) + "(";
+  const char* separator = "";
+  ((call += separator, call += args, separator = ", "), ...);
+  fake().calls.push_back(call + ")");
+}
+
+int fill(const std::string& text, char* buffer, int size) {
+  snprintf(buffer, static_cast<size_t>(size), "%s", text.c_str());
+  return 1;
+}
+
+}  // namespace
+
+FakePlatform& FakePlatform::Get() {
+  static FakePlatform instance;
+  return instance;
+}
+
+FakePlatform& FakePlatform::Reset() {
+  return Get() = FakePlatform();
+}
+
+extern "C" {
+
+int QLIBCFileExist(const char* path) {
+  return access(path, F_OK) == 0 ? 1 : 0;
+}
+
+int QLIBCFileTouch(const char* path) {
+  note("QLIBCFileTouch", path);
+  const int fd = open(path, O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  if (fd < 0) {
+    return -1;
+  }
+  const int result = futimens(fd, nullptr);
+  close(fd);
+  return result;
+}
+
+int QLIBCFileLockTimeByFile(const char* path, int type, int seconds, int* fd) {
+  note("QLIBCFileLockTimeByFile", path, std::to_string(type), std::to_string(seconds));
+  if (fake().lockResult < 0) {
+    return fake().lockResult;
+  }
+  *fd = open(path, O_RDWR | O_CREAT | O_CLOEXEC, 0600);
+  return *fd >= 0 ? flock(*fd, LOCK_EX) : -1;
+}
+
+int QLIBCFileUnlockByFile(int fd) {
+  note("QLIBCFileUnlockByFile");
+  return close(fd);
+}
+
+int QLIBCFileCheckKeyValue(const char* file, const char* key, const char* value, int) {
+  note("QLIBCFileCheckKeyValue", file, key);
+  const auto found = fake().settings.find(key);
+  return found != fake().settings.end() && found->second == value ? 1 : 0;
+}
+
+int QELOFSMkdirP(const char* path, int first, int second, uid_t uid, gid_t gid, mode_t mode) {
+  note("QELOFSMkdirP", path, std::to_string(first), std::to_string(second),
+         std::to_string(static_cast<int>(uid)), std::to_string(static_cast<int>(gid)),
+         std::to_string(mode));
+  if (fake().mkdirResult == 0) {
+    std::error_code error;
+    std::filesystem::create_directories(path, error);
+  }
+  return fake().mkdirResult;
+}
+
+pid_t QLIBCProcFork(void) {
+  note("QLIBCProcFork");
+  fflush(nullptr);
+  return fake().forkResult == -2 ? fork() : fake().forkResult;
+}
+
+pid_t QLIBCProcForkEx(int flags) {
+  note("QLIBCProcForkEx", std::to_string(flags));
+  fflush(nullptr);
+  return fake().forkResult == -2 ? fork() : fake().forkResult;
+}
+
+int QELOUserGetUGID(const char* name, uid_t* uid, gid_t* gid) {
+  return fake().userGetUGID ? fake().userGetUGID(name, uid, gid) : -1;
+}
+
+int QLIBGroupIsAdminGroupMem(const char* user, int) {
+  note("QLIBGroupIsAdminGroupMem", user);
+  return fake().isAdmin;
+}
+
+int QLIBAppPrivUserHas(const char* user, const char* application, const char* address) {
+  note("QLIBAppPrivUserHas", user, application, address);
+  return fake().appPriv;
+}
+
+int QELOUserPreferenceDirGet(const char* user, char* path, int size) {
+  note("QELOUserPreferenceDirGet", user);
+  return fake().preferenceDir.empty() ? -1 : fill(fake().preferenceDir, path, size);
+}
+
+int QELOGroupPreferenceDirGet(const char* group, char* path, int size) {
+  note("QELOGroupPreferenceDirGet", group);
+  return fake().preferenceDir.empty() ? -1 : fill(fake().preferenceDir, path, size);
+}
+
+int QLIBCConfGetARDOTimeout(void) {
+  return fake().timeoutSetting;
+}
+
+int QeloCgiInit(const char* program, QeloCgiContext*) {
+  note("QeloCgiInit", program);
+  return 1;
+}
+
+int QeloCgiInitEx(const char* userStore, QeloCgiContext*) {
+  note("QeloCgiInitEx", userStore);
+  return 1;
+}
+
+int QeloCgiLoadInCookies(QeloCgiContext*) {
+  const char* cookies = getenv("HTTP_COOKIE");
+  fake().loadedCookies = cookies != nullptr ? cookies : "";
+  note("QeloCgiLoadInCookies");
+  return 1;
+}
+
+const char* QeloCgiGetLang(QeloCgiContext*) {
+  return fake().language.c_str();
+}
+
+int QeloCgiIsTokenEnable(QeloCgiContext*) {
+  return fake().tokenEnable;
+}
+
+int QeloCgiGetRemoteIP(char* address, int size) {
+  if (fake().remoteAddress.empty()) {
+    return -1;
+  }
+  fill(fake().remoteAddress, address, size);
+  return 0;
+}
+
+int QeloCgiIsAuthorizedEx(QeloCgiContext*, const QeloCgiAuthFlags* flags, char* user, int size,
+                          int allowTimeout, int checkAddress) {
+  note("QeloCgiIsAuthorizedEx", std::to_string(flags->sessionFromParameter),
+         std::to_string(allowTimeout), std::to_string(checkAddress));
+  fill(fake().authorizedUser, user, size);
+  return fake().authorized;
+}
+
+int QeloCgiGetOption(QeloCgiContext*, const char* name, char* value, int size) {
+  const auto found = fake().options.find(name);
+  fill(found != fake().options.end() ? found->second : "", value, size);
+  return found != fake().options.end() ? 1 : 0;
+}
+
+unsigned int QeloCgiUIDGet(const char* sessionId, const char* user) {
+  note("QeloCgiUIDGet", sessionId, user);
+  return fake().uid;
+}
+
+int QeloCgiDetectAndDecryptParamLine(char* line) {
+  note("QeloCgiDetectAndDecryptParamLine", line);
+  return fake().detectResult;
+}
+
+int QeloCgiDecryptParam(char* text) {
+  note("QeloCgiDecryptParam", text);
+  return fake().decryptParam ? fake().decryptParam(text) : 0;
+}
+
+int QeloLoginAttempt(const char* address, const char* account) {
+  note("QeloLoginAttempt", address, account);
+  return fake().loginAttempt;
+}
+
+void QeloLoginSucceeded(const char* address, const char* account) {
+  note("QeloLoginSucceeded", address, account);
+}
+
+int QeloLoginPasswordCheck(const char* account, const char*, char* user, int size) {
+  note("QeloLoginPasswordCheck", account);
+  fill(account, user, size);
+  return fake().passwordCheck;
+}
+
+int QeloSessionCreate(const char* user, const char* address, char* id, char* token) {
+  note("QeloSessionCreate", user, address);
+  memset(id, 'i', QELO_SESSION_ID_LENGTH);
+  memset(token, 't', QELO_SESSION_ID_LENGTH);
+  id[QELO_SESSION_ID_LENGTH] = token[QELO_SESSION_ID_LENGTH] = '\0';
+  return fake().sessionCreate;
+}
+
+int QeloSessionRemove(const char* id) {
+  note("QeloSessionRemove", id);
+  return fake().sessionRemove;
+}
+
+int QeloSessionRefresh(const char* id) {
+  note("QeloSessionRefresh", id);
+  return fake().sessionRefresh;
+}
+
+long QeloSessionSecondsLeft(const char* id) {
+  note("QeloSessionSecondsLeft", id);
+  return fake().secondsLeft;
+}
+
+int QeloAccessTokenGrant(const char* token, const char* api, const char* method, char* user,
+                         int size) {
+  note("QeloAccessTokenGrant", token, api, method);
+  fill(fake().tokenUser, user, size);
+  return fake().tokenGrant;
+}
+
+int QELOCloudServiceZttokenGenerateToken(const char* token, char* key, int size) {
+  note("QELOCloudServiceZttokenGenerateToken", token, std::to_string(size));
+  fill("key", key, size);
+  return fake().aesKeyResult;
+}
+
+}  // extern "C"
+
+bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
+  note("ResetCredentialsByName", name, keepPrivilege ? "keep" : "drop");
+  return fake().credentialResult;
+}
+
+bool QELO::CredRequestUtil::GetDecryptAESString(const std::string& key, const std::string& cipher,
+                                                std::string& plain) {
+  note("GetDecryptAESString", key, cipher);
+  return fake().decryptAES && fake().decryptAES(key, cipher, plain);
+}
+
+namespace QELO::sharing {
+
+bool GetSharingURL(const std::string& host, int port, bool isHttps, const std::string& path,
+                   const std::string& rewriteApp, std::string& url, _tag_SHARING_URL_TYPE& type) {
+  note("GetSharingURL", host, std::to_string(port), isHttps ? "https" : "http", path,
+         rewriteApp);
+  url = "sharing:" + host + path + rewriteApp;
+  type = rewriteApp.empty() ? SHARING_URL_HOST : SHARING_URL_REWRITE;
+  return true;
+}
+
+namespace db {
+
+SharingDB& SharingDB::Instance() {
+  static SharingDB instance;
+  return instance;
+}
+
+bool SharingDB::IsGood() const {
+  return fake().sharingGood;
+}
+
+EntryDB::EntryDB(SharingDB&) {}
+SessionDB::SessionDB(SharingDB&) {}
+TokenDB::TokenDB(SharingDB&) {}
+
+bool EntryDB::GetByHash(const std::string& hash, record::Entry&) {
+  note("EntryDB::GetByHash", hash);
+  return false;
+}
+
+bool SessionDB::GetBySessionId(const std::string& id, record::Session&) {
+  note("SessionDB::GetBySessionId", id);
+  return false;
+}
+
+bool TokenDB::GetBySessionEntry(const record::Session&, const record::Entry&, record::Token&) {
+  note("TokenDB::GetBySessionEntry");
+  return false;
+}
+
+}  // namespace db
+}  // namespace QELO::sharing
+
+namespace qelow3 {
+
+struct EnginePrivate {};
+
+Engine::Engine() : private_(std::make_shared<EnginePrivate>()) {
+  note("Engine");
+  if (fake().engineThrows) {
+    throw std::runtime_error("no engine");
+  }
+}
+Engine::~Engine() = default;
+
+ARDO::ARDO(const Engine& engine) : engine_(engine) {}
+ARDO::~ARDO() = default;
+
+bool ARDO::RestartService() {
+  note("RestartService");
+  return true;
+}
+
+}  // namespace qelow3

@@ -1,0 +1,62 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <functional>
+#include <map>
+#include <string>
+#include <vector>
+
+/// The host's operations as unit tests want them: each answers what its field says, and the calls
+/// that matter are recorded. Linked in place of the embedded platform.
+struct FakePlatform {
+  /// The one in use; a fresh one for every test that calls Reset().
+  static FakePlatform& Get();
+  static FakePlatform& Reset();
+
+  std::vector<std::string> calls;  ///< "Operation(argument, ...)" in order
+
+  // Core library
+  std::map<std::string, std::string> settings;  ///< key of qeloinfo.conf: value
+  int lockResult = 0;
+  int mkdirResult = 0;
+  pid_t forkResult = -2;  ///< -2: really fork
+  std::function<int(const std::string&, uid_t*, gid_t*)> userGetUGID;
+  int isAdmin = 0;
+  int appPriv = 1;
+  std::string preferenceDir = "/fake/preferences";  ///< "": the look-up fails
+  int timeoutSetting = 900;
+
+  // CGI library
+  std::string language = "enu";
+  int tokenEnable = 0;
+  std::string remoteAddress = "192.0.2.7";  ///< "": not known
+  int authorized = -2;                      ///< result of QeloCgiIsAuthorizedEx
+  std::string authorizedUser;
+  std::map<std::string, std::string> options;
+  unsigned int uid = 1000;
+  std::string loadedCookies;  ///< HTTP_COOKIE at the last QeloCgiLoadInCookies
+  int detectResult = 1;
+  std::function<int(char*)> decryptParam;
+
+  // Credentials and tokens
+  bool credentialResult = true;
+  int tokenGrant = -1;
+  std::string tokenUser;
+  int aesKeyResult = -1;
+  std::function<bool(const std::string&, const std::string&, std::string&)> decryptAES;
+
+  // Login service
+  int loginAttempt = 0;
+  int passwordCheck = 0;
+  int sessionCreate = 0;
+  int sessionRemove = 0;
+  int sessionRefresh = 0;
+  long secondsLeft = 900;
+
+  // Sharing
+  bool sharingGood = false;
+
+  // Web server
+  bool engineThrows = false;
+};

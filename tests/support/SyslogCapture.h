@@ -1,0 +1,18 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+/// What the code under test wrote to syslog: the test program's own syslog() collects it.
+struct SyslogCapture {
+  struct Message {
+    int priority;  ///< as passed, facility included
+    std::string text;
+  };
+  static std::vector<Message>& Messages();
+  /// The identity of the last openlog().
+  static std::string& Identity();
+  static void Clear();
+  /// How many messages contain this text.
+  static int Count(const std::string& part);
+};

@@ -1,0 +1,178 @@
+#include "webapi/JsonHelper.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <charconv>
+#include <cmath>
+#include <cstdio>
+#include <limits>
+#include <memory>
+#include <utility>
+
+namespace QELO::JsonHelper {
+namespace {
+
+/// Builds one reader; comments are for files that people write.
+std::unique_ptr<Json::CharReader> makeReader(bool comments) {
+  Json::CharReaderBuilder builder;
+  builder["collectComments"] = false;
+  builder["allowComments"] = comments;
+  builder["failIfExtra"] = true;
+  builder["strictRoot"] = false;
+  builder["stackLimit"] = kMaxDepth;
+  return std::unique_ptr<Json::CharReader>(builder.newCharReader());
+}
+
+bool parse(const std::string& text, bool comments, Json::Value& value) {
+  try {
+    Json::Value parsed;
+    if (!makeReader(comments)->parse(text.data(), text.data() + text.size(), &parsed, nullptr)) {
+      return false;
+    }
+    value.swap(parsed);
+    return true;
+  } catch (const std::exception&) {  // nesting beyond the limit, or no memory
+    return false;
+  }
+}
+
+bool readAll(const std::string& path, std::string& text) {
+  // Not blocking: the name may be a pipe, which has no content to wait for.
+  const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+  if (fd < 0) {
+    return false;
+  }
+  struct stat info {};
+  bool good = fstat(fd, &info) == 0 && S_ISREG(info.st_mode);
+  text.clear();
+  while (good) {
+    char buffer[16384];
+    const ssize_t count = TEMP_FAILURE_RETRY(read(fd, buffer, sizeof buffer));
+    if (count <= 0) {
+      good = count == 0;
+      break;
+    }
+    text.append(buffer, static_cast<size_t>(count));
+  }
+  close(fd);
+  return good;
+}
+
+bool writeAll(int fd, const std::string& text) {
+  size_t done = 0;
+  while (done < text.size()) {
+    const ssize_t count = TEMP_FAILURE_RETRY(write(fd, text.data() + done, text.size() - done));
+    if (count <= 0) {
+      return false;
+    }
+    done += static_cast<size_t>(count);
+  }
+  return true;
+}
+
+/// The number that the whole text is, or nothing.
+template <typename T>
+bool parseNumber(const std::string& text, T& number) {
+  const char* end = text.data() + text.size();
+  const auto result = std::from_chars(text.data(), end, number);
+  return !text.empty() && result.ec == std::errc() && result.ptr == end;
+}
+
+template <typename T>
+T integerForm(const Json::Value& value, T fallback) {
+  switch (value.type()) {
+    case Json::intValue:
+      return std::in_range<T>(value.asLargestInt()) ? static_cast<T>(value.asLargestInt())
+                                                    : fallback;
+    case Json::uintValue:
+      return std::in_range<T>(value.asLargestUInt()) ? static_cast<T>(value.asLargestUInt())
+                                                     : fallback;
+    case Json::realValue: {
+      const double real = std::trunc(value.asDouble());
+      // 2^(digits) is exact as a double, the largest T itself may not be.
+      const double limit = std::ldexp(1.0, std::numeric_limits<T>::digits);
+      const double lowest = std::numeric_limits<T>::is_signed ? -limit : 0.0;
+      return real >= lowest && real < limit ? static_cast<T>(real) : fallback;
+    }
+    case Json::booleanValue:
+      return value.asBool() ? 1 : 0;
+    case Json::stringValue: {
+      T number = 0;
+      return parseNumber(value.asString(), number) ? number : fallback;
+    }
+    default:
+      return fallback;
+  }
+}
+
+}  // namespace
+
+std::string toString(const Json::Value& value) {
+  Json::StreamWriterBuilder builder;
+  builder["indentation"] = "";
+  builder["emitUTF8"] = true;
+  builder["commentStyle"] = "None";
+  return Json::writeString(builder, value);
+}
+
+bool fromString(const std::string& text, Json::Value& value) {
+  return parse(text, false, value);
+}
+
+bool fromFile(const std::string& path, Json::Value& value) {
+  std::string text;
+  return readAll(path, text) && parse(text, true, value);
+}
+
+bool toFile(const std::string& path, const Json::Value& value) {
+  struct stat old {};
+  const mode_t mode = stat(path.c_str(), &old) == 0 ? old.st_mode & 07777 : 0600;
+  std::string temporary = path + ".XXXXXX";
+  const int fd = mkostemp(temporary.data(), O_CLOEXEC);
+  if (fd < 0) {
+    return false;
+  }
+  const bool written = writeAll(fd, toString(value)) && fchmod(fd, mode) == 0;
+  if (close(fd) != 0 || !written || rename(temporary.c_str(), path.c_str()) != 0) {
+    unlink(temporary.c_str());
+    return false;
+  }
+  return true;
+}
+
+const Json::Value& member(const Json::Value& value, const std::string& key) {
+  static const Json::Value null;
+  if (!value.isObject()) {
+    return null;
+  }
+  const Json::Value* found = value.find(key.data(), key.data() + key.size());
+  return found != nullptr ? *found : null;
+}
+
+bool hasMember(const Json::Value& value, const std::string& key) {
+  return value.isObject() && value.find(key.data(), key.data() + key.size()) != nullptr;
+}
+
+std::string asString(const Json::Value& value, const std::string& fallback) {
+  return value.isConvertibleTo(Json::stringValue) ? value.asString() : fallback;
+}
+
+int asInt(const Json::Value& value, int fallback) {
+  return integerForm<int>(value, fallback);
+}
+
+int64_t asInt64(const Json::Value& value, int64_t fallback) {
+  return integerForm<int64_t>(value, fallback);
+}
+
+uint64_t asUInt64(const Json::Value& value, uint64_t fallback) {
+  return integerForm<uint64_t>(value, fallback);
+}
+
+bool asBool(const Json::Value& value, bool fallback) {
+  return value.isBool() || value.isNumeric() ? value.asBool() : fallback;
+}
+
+}  // namespace QELO::JsonHelper

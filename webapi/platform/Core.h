@@ -1,0 +1,51 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include "webapi/Export.h"
+
+/// The host's core library: files, locks, processes, configuration keys, users and groups.
+extern "C" {
+
+/// @return 1 when the path exists, else 0
+WEBAPI_API int QLIBCFileExist(const char* path);
+/// Sets a file's times to now, creating it empty. @return 0 on success
+WEBAPI_API int QLIBCFileTouch(const char* path);
+/// Takes a lock on a file, which is created.
+/// @param type     1: exclusive
+/// @param seconds  how long to wait for it
+/// @param fd       receives the descriptor that holds the lock
+/// @return 0 or more on success; a negative value when it was not to be had
+WEBAPI_API int QLIBCFileLockTimeByFile(const char* path, int type, int seconds, int* fd);
+WEBAPI_API int QLIBCFileUnlockByFile(int fd);
+/// Whether a file of `key="value"` lines gives `key` this value. @return 1 yes, 0 no
+WEBAPI_API int QLIBCFileCheckKeyValue(const char* file, const char* key, const char* value,
+                                      int ignoreCase);
+/// Creates a directory and its parents.
+/// @param uid, gid  owner of what is created, -1: as it comes
+/// @param mode      search permission is added wherever it grants reading
+/// @return 0 on success, also when it exists
+WEBAPI_API int QELOFSMkdirP(const char* path, int keepExistingOwner, int reserved, uid_t uid,
+                            gid_t gid, mode_t mode);
+
+/// Forks a background process: the child has /dev/null as descriptors 0, 1 and 2, so that nobody
+/// who waits for the end of our output waits for it. Buffered output is written first.
+/// @return as fork()
+WEBAPI_API pid_t QLIBCProcFork(void);
+/// Forks leaving the standard descriptors as they are. Buffered output is written first.
+/// @param flags  65 is what callers here pass; no bit changes anything
+WEBAPI_API pid_t QLIBCProcForkEx(int flags);
+
+/// The ids of a user. @return 0 on success
+WEBAPI_API int QELOUserGetUGID(const char* name, uid_t* uid, gid_t* gid);
+/// @return 1 when the user is an administrator, 0 when not, -1 when that cannot be told
+WEBAPI_API int QLIBGroupIsAdminGroupMem(const char* user, int flags);
+/// @return 1 when the user may use the application from this address, else 0
+WEBAPI_API int QLIBAppPrivUserHas(const char* user, const char* application, const char* address);
+/// The user's directory for preferences. @return a negative value on failure
+WEBAPI_API int QELOUserPreferenceDirGet(const char* user, char* path, int size);
+WEBAPI_API int QELOGroupPreferenceDirGet(const char* group, char* path, int size);
+/// The idle time-out of login sessions in seconds.
+WEBAPI_API int QLIBCConfGetARDOTimeout(void);
+
+}  // extern "C"
