@@ -1,0 +1,91 @@
+#include "webapi/model/APIBase.h"
+
+#include "webapi/JsonHelper.h"
+
+namespace QELO {
+
+APIBase::APIBase() : store_(Json::objectValue) {}
+
+APIBase::~APIBase() = default;
+
+Json::Value* APIBase::FindSection(const std::string& section) {
+  if (!JsonHelper::hasMember(store_, section)) {
+    return nullptr;
+  }
+  Json::Value& found = store_[section];
+  return found.isObject() || found.isNull() ? &found : nullptr;
+}
+
+bool APIBase::HasData(const std::string& section, const std::string& key) const {
+  return JsonHelper::hasMember(JsonHelper::member(store_, section), key);
+}
+
+bool APIBase::SetData(const std::string& section, const Json::Value& members, bool stringOnly) {
+  Json::Value* target = FindSection(section);
+  if (target == nullptr || members.empty() || !members.isObject()) {
+    return false;
+  }
+  for (auto it = members.begin(); it != members.end(); ++it) {
+    if (!stringOnly || it->isString()) {
+      (*target)[it.name()] = *it;
+    }
+  }
+  return true;
+}
+
+bool APIBase::SetData(const std::string& section, const std::string& key, const Json::Value& value,
+                      bool stringOnly) {
+  Json::Value* target = FindSection(section);
+  if (target == nullptr || key.empty() || (stringOnly && !value.isString())) {
+    return false;
+  }
+  (*target)[key] = value;
+  return true;
+}
+
+const Json::Value& APIBase::GetData(const std::string& section, const std::string& key,
+                                    const Json::Value& defaultValue) const {
+  if (!JsonHelper::hasMember(store_, section)) {
+    return defaultValue;
+  }
+  const Json::Value& found = JsonHelper::member(store_, section);
+  if (key.empty()) {
+    return found;
+  }
+  return JsonHelper::hasMember(found, key) ? JsonHelper::member(found, key) : defaultValue;
+}
+
+bool APIBase::ClearData(const std::string& section, const std::string& key) {
+  if (section.empty() || !JsonHelper::hasMember(store_, section)) {
+    return false;
+  }
+  Json::Value& found = store_[section];
+  if (key.empty()) {
+    const bool clearable = found.isObject() || found.isArray() || found.isNull();
+    if (clearable) {
+      found.clear();
+    }
+    return clearable;
+  }
+  if (!JsonHelper::hasMember(found, key)) {
+    return false;
+  }
+  found.removeMember(key);
+  return true;
+}
+
+const Json::Value& APIBase::GetData(const std::string& section,
+                                    const Json::Value& defaultValue) const {
+  return GetData(section, "", defaultValue);
+}
+
+bool APIBase::InitField(const std::string& section) {
+  if (section.empty() || !(store_.isObject() || store_.isNull()) ||
+      JsonHelper::hasMember(store_, section)) {
+    return false;
+  }
+  store_[section] = Json::Value(Json::objectValue);
+  return true;
+}
+
+}  // namespace QELO

@@ -1,0 +1,41 @@
+#pragma once
+
+#include <string>
+
+#include "webapi/APIResponse.h"
+#include "webapi/model/APIBase.h"
+
+namespace QELO {
+
+/// The state of a response.
+///
+/// Sections: "headers" (name to text), "setCookie" (list of Set-Cookie texts), "success" (empty),
+/// "option" ("isDownload", "restart_httpd", "statusMsg"), "code" (integer) and, once a result was
+/// set, "body".
+class APIResponsePrivate : public APIBase {
+ public:
+  APIResponsePrivate(APIRequest* request, APIResponse* owner);
+  APIResponsePrivate(const APIResponsePrivate&) = delete;
+  APIResponsePrivate& operator=(const APIResponsePrivate&) = delete;
+
+  void SetError(int code, const Json::Value& data);
+  bool AddCookie(const std::string& name, const std::string& value, const std::string& path,
+                 long expireMinutes, const std::string& domain, bool secure, bool httpOnly);
+  bool SetStatus(int code, const std::string& message);
+  /// Sets "Location" alone.
+  bool Redirect(const std::string& path);
+  void SetCallbackFunc(APIResponse::CallbackFunc function, void* argument);
+
+  APIResponse::CallbackList& callbacks() { return callbacks_; }
+
+ private:
+  /// "; expires=..." of a cookie, or "".
+  std::string CookieExpiry(long minutes) const;
+  bool AppendCookie(const std::string& line);
+
+  APIRequest* request_;
+  APIResponse* owner_;
+  APIResponse::CallbackList callbacks_;
+};
+
+}  // namespace QELO
