@@ -147,15 +147,15 @@ class WEBAPI_API APIRequest {
   APIParameter<double> GetAndCheckReal(const std::string& name,
                                        PARAM_NECESSITY necessity = PARAM_REQUIRED,
                                        bool (*validator)(const double&) = nullptr) const;
-  APIParameter<std::string> GetAndCheckString(const std::string& name,
-                                              PARAM_NECESSITY necessity = PARAM_REQUIRED,
-                                              bool (*validator)(const std::string&) = nullptr) const;
+  APIParameter<std::string> GetAndCheckString(
+      const std::string& name, PARAM_NECESSITY necessity = PARAM_REQUIRED,
+      bool (*validator)(const std::string&) = nullptr) const;
   APIParameter<Json::Value> GetAndCheckArray(const std::string& name,
                                              PARAM_NECESSITY necessity = PARAM_REQUIRED,
                                              bool (*validator)(const Json::Value&) = nullptr) const;
-  APIParameter<Json::Value> GetAndCheckObject(const std::string& name,
-                                              PARAM_NECESSITY necessity = PARAM_REQUIRED,
-                                              bool (*validator)(const Json::Value&) = nullptr) const;
+  APIParameter<Json::Value> GetAndCheckObject(
+      const std::string& name, PARAM_NECESSITY necessity = PARAM_REQUIRED,
+      bool (*validator)(const Json::Value&) = nullptr) const;
   /// As GetAndCheckArray, but a single value (null too) counts as a list of one.
   APIParameter<Json::Value> GetAndCheckUnitArray(
       const std::string& name, PARAM_NECESSITY necessity = PARAM_REQUIRED,

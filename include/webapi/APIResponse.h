@@ -35,8 +35,8 @@ class WEBAPI_API APIResponse {
   /// The body becomes {"success": false, "error": {"code": code, "errors": data}}, without
   /// "errors" when `data` is null. Code 0 is success.
   void SetError(int code, const Json::Value& data = Json::Value());
-  int GetError() const;           ///< the last code; 0 for success and when none was set
-  Json::Value GetBody() const;    ///< an empty object when nothing was set
+  int GetError() const;         ///< the last code; 0 for success and when none was set
+  Json::Value GetBody() const;  ///< an empty object when nothing was set
 
   bool HasHeader(const std::string& name) const;
   /// @return false when `name` is empty. A line that holds CR, LF or NUL is not sent.

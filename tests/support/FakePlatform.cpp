@@ -28,7 +28,7 @@ FakePlatform& fake() {
 template <typename... Args>
 void note(const char* name, const Args&... args) {
   std::string call = std::string(name) + "(";
-  const char* separator = "";
+  [[maybe_unused]] const char* separator = "";
   ((call += separator, call += args, separator = ", "), ...);
   fake().calls.push_back(call + ")");
 }
@@ -88,8 +88,8 @@ int QLIBCFileCheckKeyValue(const char* file, const char* key, const char* value,
 
 int QELOFSMkdirP(const char* path, int first, int second, uid_t uid, gid_t gid, mode_t mode) {
   note("QELOFSMkdirP", path, std::to_string(first), std::to_string(second),
-         std::to_string(static_cast<int>(uid)), std::to_string(static_cast<int>(gid)),
-         std::to_string(mode));
+       std::to_string(static_cast<int>(uid)), std::to_string(static_cast<int>(gid)),
+       std::to_string(mode));
   if (fake().mkdirResult == 0) {
     std::error_code error;
     std::filesystem::create_directories(path, error);
@@ -173,7 +173,7 @@ int QeloCgiGetRemoteIP(char* address, int size) {
 int QeloCgiIsAuthorizedEx(QeloCgiContext*, const QeloCgiAuthFlags* flags, char* user, int size,
                           int allowTimeout, int checkAddress) {
   note("QeloCgiIsAuthorizedEx", std::to_string(flags->sessionFromParameter),
-         std::to_string(allowTimeout), std::to_string(checkAddress));
+       std::to_string(allowTimeout), std::to_string(checkAddress));
   fill(fake().authorizedUser, user, size);
   return fake().authorized;
 }
@@ -267,8 +267,7 @@ namespace QELO::sharing {
 
 bool GetSharingURL(const std::string& host, int port, bool isHttps, const std::string& path,
                    const std::string& rewriteApp, std::string& url, _tag_SHARING_URL_TYPE& type) {
-  note("GetSharingURL", host, std::to_string(port), isHttps ? "https" : "http", path,
-         rewriteApp);
+  note("GetSharingURL", host, std::to_string(port), isHttps ? "https" : "http", path, rewriteApp);
   url = "sharing:" + host + path + rewriteApp;
   type = rewriteApp.empty() ? SHARING_URL_HOST : SHARING_URL_REWRITE;
   return true;

@@ -1,0 +1,150 @@
+// The runner's life: construction, one run of a request, destruction.
+
+#include "webapi/APIRunner.h"
+
+#include <sys/prctl.h>
+#include <unistd.h>
+
+#include "webapi/APIRequest.h"
+#include "webapi/APIResponse.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/WebAPIError.h"
+#include "webapi/model/Log.h"
+#include "webapi/platform/Paths.h"
+#include "webapi/platform/WebAPIUtil.h"
+#include "webapi/runner/APIRunnerPrivate.h"
+
+namespace QELO {
+
+APIRunner::APIRunner()
+    : libDef(Json::objectValue),
+      catalogue(Json::objectValue),
+      request_(std::make_unique<APIRequest>(Json::Value())),
+      response_(std::make_unique<APIResponse>(request_.get())),
+      private_(std::make_unique<APIRunnerPrivate>(this)) {
+  setsid();
+  Json::Value defaults;
+  if (WebAPIUtil::ReadJsonFile(Paths::kLibDef, defaults) && defaults.isObject()) {
+    libDef = defaults;
+  }
+}
+
+APIRunner::~APIRunner() {
+  CloseLib();
+  response_.reset();
+  request_.reset();
+  const std::string name = private_->GetOrigProcName();
+  private_->SetArgv0(name);
+  APIRunnerPrivate::SetLogIdentity(name);
+  prctl(PR_SET_NAME, name.substr(0, 16).c_str());
+}
+
+bool APIRunner::Run(const Json::Value& param) {
+  if (param.isNull()) {
+    response_->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
+  if (!Initialize(param) || !SetProcessName(request_.get(), response_.get())) {
+    return false;
+  }
+  if (request_->HasParam("relay_zt")) {
+    response_->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
+  return Process(request_.get(), response_.get());
+}
+
+bool APIRunner::Initialize(const Json::Value& param) {
+  Json::Value env(Json::objectValue);
+  if (!InitEnv(env)) {
+    return false;
+  }
+  request_->InitEnv(env);
+  if (JsonHelper::hasMember(param, "environ")) {
+    request_->InitEnv(param["environ"]);
+  }
+  if (JsonHelper::hasMember(param, "session")) {
+    request_->InitSession(param["session"]);
+  }
+  const Json::Value& attributes = JsonHelper::member(param, "attr");
+  if (attributes.isObject()) {
+    for (auto it = attributes.begin(); it != attributes.end(); ++it) {
+      request_->SetAttr(it.name(), *it);
+    }
+  }
+  if (param.empty()) {
+    response_->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
+  request_->InitParam(param, false);
+  return true;
+}
+
+bool APIRunner::InitEnv(Json::Value& env) {
+  if (!env.isObject()) {
+    response_->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
+  for (char** entry = environ; entry != nullptr && *entry != nullptr; ++entry) {
+    const std::string text = *entry;
+    const size_t equals = text.find('=');
+    if (equals != std::string::npos) {
+      env[text.substr(0, equals)] = text.substr(equals + 1);
+    }
+  }
+  return true;
+}
+
+Json::Value APIRunner::GetResponse() const {
+  if (response_ == nullptr) {
+    return Json::Value();
+  }
+  Json::Value body = response_->GetBody();
+  body["httpd_restart"] = response_->GetHttpdRestart();
+  return body;
+}
+
+void APIRunner::SetArgs(int argc, char** argv) {
+  private_->SetArgs(argc, argv);
+}
+
+bool APIRunner::SetProcessName(APIRequest* request, APIResponse* response) {
+  const std::string api = request->GetAPIClass();
+  if (api.empty()) {
+    response->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
+  const std::string call =
+      api + "_" + std::to_string(request->GetAPIVersion()) + "_" + request->GetAPIMethod();
+  const std::string full = private_->GetProcName() + "_" + call;
+  APIRunnerPrivate::SetLogIdentity(full);
+  private_->SetArgv0(full);
+  if (prctl(PR_SET_NAME, call.substr(0, 16).c_str()) != 0) {
+    response->SetError(WEBAPI_ERR_PROCESS_NAME);
+    WEBAPI_LOG("APIRunner.cpp", "Set process name fail[%m]");
+    return false;
+  }
+  return true;
+}
+
+bool APIRunner::CheckSharingPermission(APIRequest*, APIResponse*) {
+  return true;
+}
+
+bool APIRunner::NeedPermission(APIRequest*) {
+  return false;
+}
+
+bool APIRunner::CheckPermission(APIRequest*, APIResponse*) {
+  return true;
+}
+
+bool APIRunner::HandleUpload(APIRequest*, APIResponse*) {
+  return true;
+}
+
+bool APIRunner::SkipPermission(APIRequest*) {
+  return true;
+}
+
+}  // namespace QELO

@@ -1,0 +1,67 @@
+#include "webapi/runner/APIRunnerPrivate.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <libgen.h>
+#include <syslog.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstring>
+
+namespace QELO {
+namespace {
+
+/// The first argument up to its first space; "" when it cannot be read.
+std::string firstArgument() {
+  char text[1024] = {};
+  const int fd = open("/proc/self/cmdline", O_RDONLY | O_CLOEXEC);
+  if (fd < 0) {
+    return "";
+  }
+  const ssize_t count = read(fd, text, sizeof text - 1);
+  close(fd);
+  if (count <= 0) {
+    return "";
+  }
+  const std::string argument = text;
+  return argument.substr(0, argument.find(' '));
+}
+
+}  // namespace
+
+APIRunnerPrivate::APIRunnerPrivate(APIRunner* owner)
+    : owner_(owner), procName(program_invocation_short_name), origProcName(procName) {
+  std::string argument = firstArgument();
+  if (!argument.empty()) {
+    procName = origProcName = basename(argument.data());
+  }
+}
+
+void APIRunnerPrivate::SetArgs(int argc, char** argv) {
+  if (argc < 1) {
+    return;
+  }
+  argv0_ = argv[0];
+  argv0Length_ = static_cast<uint32_t>(strlen(argv[0]));
+  if (origProcName.find("__") != std::string::npos) {
+    procName = origProcName.substr(0, origProcName.find('_'));
+  }
+}
+
+void APIRunnerPrivate::SetArgv0(const std::string& name) {
+  if (argv0_ == nullptr) {
+    return;
+  }
+  memset(argv0_, 0, argv0Length_);
+  snprintf(argv0_, argv0Length_, "%s", name.c_str());
+}
+
+void APIRunnerPrivate::SetLogIdentity(const std::string& text) {
+  static char identity[1024];  // syslog keeps the pointer
+  closelog();
+  snprintf(identity, sizeof identity, "%s", text.c_str());
+  openlog(identity, LOG_PID | LOG_CONS, 0);
+}
+
+}  // namespace QELO

@@ -1,0 +1,35 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+namespace QELO {
+
+class APIRunner;
+
+/// What the process is called, and its name while it serves a call.
+class APIRunnerPrivate {
+ public:
+  explicit APIRunnerPrivate(APIRunner* owner);
+
+  /// Remembers where the process's arguments stand; nothing when `argc` is below 1.
+  void SetArgs(int argc, char** argv);
+  /// Shows `name` as the process's first argument, cut to the room that is there. Nothing before
+  /// SetArgs.
+  void SetArgv0(const std::string& name);
+
+  const std::string& GetProcName() const { return procName; }
+  const std::string& GetOrigProcName() const { return origProcName; }
+
+  /// Makes `text` the syslog identity, cut to 1023 bytes.
+  static void SetLogIdentity(const std::string& text);
+
+ private:
+  APIRunner* owner_;
+  char* argv0_ = nullptr;
+  uint32_t argv0Length_ = 0;
+  std::string procName;
+  std::string origProcName;
+};
+
+}  // namespace QELO

@@ -1,0 +1,113 @@
+#include "webapi/runner/ProcessGuards.h"
+
+#include <fcntl.h>
+#include <sys/resource.h>
+#include <unistd.h>
+
+#include <iostream>
+
+namespace QELO {
+namespace {
+
+constexpr char kNull[] = "/dev/null";
+
+/// Puts /dev/null in a descriptor's place. @return the former one, or -1
+int replaceByNull(int descriptor, int flags) {
+  const int former = fcntl(descriptor, F_DUPFD_CLOEXEC, 3);
+  const int null = open(kNull, flags | O_CLOEXEC);
+  if (null >= 0) {
+    dup2(null, descriptor);
+    close(null);
+  }
+  return former;
+}
+
+void restoreDescriptor(int descriptor, int former) {
+  if (former < 0) {
+    close(descriptor);  // it was closed before
+    return;
+  }
+  dup2(former, descriptor);
+  close(former);
+}
+
+}  // namespace
+
+StandardStreams::StandardStreams(bool shutInput, bool shutOutput) {
+  if (shutInput) {
+    ShutInput();
+  }
+  if (shutOutput) {
+    ShutOutput();
+  }
+}
+
+StandardStreams::~StandardStreams() {
+  if (inputBuffer_ != nullptr) {
+    GiveBackInput();
+  }
+  if (outputBuffer_ != nullptr) {
+    GiveBackOutput();
+  }
+}
+
+void StandardStreams::ShutInput() {
+  nullInput_.open(kNull, std::ios::in);
+  inputBuffer_ = std::cin.rdbuf(nullInput_.rdbuf());
+  // A stream of its own: the former one may hold input that was read ahead.
+  inputFile_ = stdin;
+  std::FILE* null = std::fopen(kNull, "re");
+  stdin = null != nullptr ? null : inputFile_;
+  inputDescriptor_ = replaceByNull(STDIN_FILENO, O_RDONLY);
+}
+
+void StandardStreams::GiveBackInput() {
+  if (stdin != inputFile_) {
+    std::fclose(stdin);
+    stdin = inputFile_;
+  }
+  restoreDescriptor(STDIN_FILENO, inputDescriptor_);
+  std::cin.rdbuf(inputBuffer_);
+}
+
+void StandardStreams::ShutOutput() {
+  std::cout.flush();
+  std::fflush(stdout);
+  nullOutput_.open(kNull, std::ios::out | std::ios::trunc);
+  outputBuffer_ = std::cout.rdbuf(nullOutput_.rdbuf());
+  outputDescriptor_ = replaceByNull(STDOUT_FILENO, O_WRONLY | O_TRUNC);
+}
+
+void StandardStreams::GiveBackOutput() {
+  std::cout.flush();
+  std::fflush(stdout);
+  restoreDescriptor(STDOUT_FILENO, outputDescriptor_);
+  std::cout.rdbuf(outputBuffer_);
+}
+
+Priority::~Priority() {
+  if (changed_) {
+    setpriority(PRIO_PROCESS, 0, former_);
+  }
+}
+
+void Priority::Set(int priority) {
+  former_ = getpriority(PRIO_PROCESS, 0);
+  if (priority != former_) {
+    setpriority(PRIO_PROCESS, 0, priority);
+    changed_ = true;
+  }
+}
+
+WorkingDirectory::WorkingDirectory()
+    // A descriptor, since the way back by name may be barred after a change of user.
+    : directory_(open(".", O_PATH | O_DIRECTORY | O_CLOEXEC)) {}
+
+WorkingDirectory::~WorkingDirectory() {
+  if (directory_ >= 0) {
+    [[maybe_unused]] const int result = fchdir(directory_);
+    close(directory_);
+  }
+}
+
+}  // namespace QELO
