@@ -3,5 +3,61 @@
 
 include(CMakePackageConfigHelpers)
 
-install(TARGETS webapi EXPORT webapi-targets)
-install(TARGETS webapi_platform)
+set(webapi_package_dir ${CMAKE_INSTALL_LIBDIR}/cmake/webapi)
+
+# Programs and libraries find each other by an absolute path, which a set-user-id program may use,
+# unless they stand where the dynamic loader looks anyway.
+if(NOT CMAKE_INSTALL_FULL_LIBDIR IN_LIST CMAKE_PLATFORM_IMPLICIT_LINK_DIRECTORIES)
+  set_target_properties(webapi webapi_platform entry.cgi
+                        PROPERTIES INSTALL_RPATH ${CMAKE_INSTALL_FULL_LIBDIR})
+endif()
+
+install(TARGETS webapi EXPORT webapi-targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
+# The platform is exported as what the library itself needs at link time; its headers are not.
+set_target_properties(webapi_platform PROPERTIES INTERFACE_INCLUDE_DIRECTORIES
+  "$<BUILD_INTERFACE:${PROJECT_SOURCE_DIR}/include;${PROJECT_SOURCE_DIR}>"
+  INTERFACE_COMPILE_DEFINITIONS "$<BUILD_INTERFACE:WEBAPI_ROOT_PREFIX=\"${WEBAPI_ROOT_PREFIX}\">")
+install(TARGETS webapi_platform EXPORT webapi-targets
+        LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} NAMELINK_SKIP)
+install(TARGETS entry.cgi RUNTIME DESTINATION ${CMAKE_INSTALL_LIBEXECDIR}/webapi)
+install(DIRECTORY include/webapi DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}
+        FILES_MATCHING PATTERN *.h)
+
+install(EXPORT webapi-targets NAMESPACE webapi:: DESTINATION ${webapi_package_dir})
+configure_package_config_file(cmake/webapiConfig.cmake.in ${CMAKE_BINARY_DIR}/webapiConfig.cmake
+                              INSTALL_DESTINATION ${webapi_package_dir})
+write_basic_package_version_file(${CMAKE_BINARY_DIR}/webapiConfigVersion.cmake
+                                 COMPATIBILITY SameMinorVersion)
+install(FILES ${CMAKE_BINARY_DIR}/webapiConfig.cmake ${CMAKE_BINARY_DIR}/webapiConfigVersion.cmake
+        DESTINATION ${webapi_package_dir})
+file(RELATIVE_PATH webapi_prefix_from_pc ${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig
+     ${CMAKE_INSTALL_PREFIX})
+string(REGEX REPLACE "/$" "" webapi_prefix_from_pc ${webapi_prefix_from_pc})
+configure_file(cmake/webapi-ARDO5.pc.in ${CMAKE_BINARY_DIR}/webapi-ARDO5.pc @ONLY)
+install(FILES ${CMAKE_BINARY_DIR}/webapi-ARDO5.pc
+        DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
+
+# Descriptions stand where entry.cgi looks, whatever the installation prefix is.
+install(DIRECTORY ${WEBAPI_DESCRIPTION_DIR}/
+        DESTINATION ${WEBAPI_ROOT_PREFIX}/usr/qelo/qeloman/webapi
+        FILES_MATCHING PATTERN *.lib PATTERN lib.def)
+# webapi_install_modules(FOLDER DESTINATION): the loadable libraries that a folder builds.
+function(webapi_install_modules folder destination)
+  get_property(targets DIRECTORY ${folder} PROPERTY BUILDSYSTEM_TARGETS)
+  foreach(target ${targets})
+    get_target_property(type ${target} TYPE)
+    if(type STREQUAL MODULE_LIBRARY)
+      install(TARGETS ${target} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/${destination})
+    endif()
+  endforeach()
+endfunction()
+webapi_install_modules(platform modules)
+webapi_install_modules(apis apis)
+
+file(GLOB webapi_api_readmes RELATIVE ${PROJECT_SOURCE_DIR} apis/*/README.md)
+foreach(readme ${webapi_api_readmes})
+  get_filename_component(folder ${readme} DIRECTORY)
+  get_filename_component(api ${folder} NAME)
+  install(FILES ${readme} DESTINATION ${CMAKE_INSTALL_DOCDIR}/apis RENAME ${api}.md)
+endforeach()
+install(FILES README.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR} OPTIONAL)
