@@ -14,18 +14,25 @@ class APIResponse;
 /// Permission checks for callers other than the web entry.
 class WEBAPI_API APIAuth {
  public:
-  /// Whether the API's "allowUser" (its description's, not a method's) names the class of `user`.
+  /// Whether the API's "allowUser" (its description's, not a method's) names the class of `user`,
+  /// an administrator when the request's caller is one.
   /// Refused when the list is missing or empty, or `user` is null or empty.
   static bool CheckAllowUser(APIRequest* request, const char* user);
 
-  /// Checks a login session, the user class and the application privilege.
+  /// Checks a login session, the user class and the application privilege, for a program that was
+  /// started for one request.
+  ///
+  /// The CGI library checks the session of the process's own cookies. So `session` must be the one
+  /// that they name (the last "id" in HTTP_COOKIE), and the request's; another one is refused with
+  /// 105. The session's address binding is always checked.
   /// @param session       session id; null is refused with 105
   /// @param allowTimeout  whether a timed-out session is accepted
-  /// @return false with error 105, 106, 107, 150 or 160 set on the response
+  /// @return false with error 105, 106, 107, 150 or 160 set on the response; true with the
+  ///         response as it was. The request stays as it was.
   static bool CheckPermission(APIRequest* request, APIResponse* response, const char* session,
                               bool allowTimeout);
 
-  /// Counts now as the last use of the request's session.
+  /// Counts now as the last use of the request's session. @return false when there is none
   static bool UpdateTimeout(APIRequest* request);
 
   /// "admin." or "normal.", followed by "domain" for a name with a backslash, "ldap" for one with
@@ -33,7 +40,7 @@ class WEBAPI_API APIAuth {
   static std::string GetUserClass(bool isAdmin, const std::string& user);
 
   /// Whether the request's caller may call a method, by the rules of the web entry: login needed,
-  /// user class, application privilege.
+  /// user class, application privilege. The caller must have been checked before.
   /// @param description  the API's description
   /// @param attributes   the method's attributes
   static bool MayCall(const APIRequest& request, const Json::Value& description,

@@ -7,6 +7,8 @@
 #include "webapi/APIRunner.h"
 #include "webapi/Export.h"
 
+struct QeloCgiContext;
+
 namespace QELO {
 
 /// The front of one CGI invocation: reads the request from the CGI environment and standard
@@ -35,11 +37,14 @@ class WEBAPI_API WebEntry : public APIRunner {
   bool SkipPermission(APIRequest* request) override;
 
  protected:
-  /// Authenticates the caller and fills the request's session.
+  /// Authenticates the caller of the process's own request and fills its session.
   /// @param allowTimeout  whether a timed-out session is accepted
   /// @return 0, or the web-API error code. Asked once per process and allowance.
   int CheckPermission(bool allowTimeout);
 
+  /// Parameter intake. Each fills one JSON object with names and values.
+  /// @return false when the input cannot be read; `params` or `section` then holds what had been
+  ///         read so far.
   bool InitParam(Json::Value& params);
   bool InitGetParam(Json::Value& section);
   bool InitPostParam(Json::Value& section);
@@ -48,19 +53,25 @@ class WEBAPI_API WebEntry : public APIRunner {
   bool DecryptParam(const std::string& text, Json::Value& section);
   bool DecryptAESParam(Json::Value& section);
 
+  /// Print the response to standard output, whatever IsEnableOutput() says.
   void OutputHeader();
   void OutputBody();
+  /// Forwards the request to the host that its parameter "relay_zt" names.
+  /// @return whether the other host's answer was printed; else the response has the error
   bool ProcessRelay(APIRequest* request, APIResponse* response);
 
  private:
+  QeloCgiContext* Context();
+  bool GatherEnvironment();
   bool RewriteCredentials();
-  int Authorise();
-  void FillSession(const std::string& user);
+  const Json::Value& KnownResult(bool allowTimeout) const;
+  int Authorise(bool allowTimeout);
+  void FillSession(const std::string& user, bool isAuthorized);
   bool IsAllowedUser(APIRequest* request);
 
   Json::Value temporaryFiles_;
-  alignas(void*) unsigned char cgiContext_[60];
-  Json::Value permission_;
+  alignas(void*) unsigned char cgiContext_[60];  ///< the CGI library's, see Context()
+  Json::Value permission_;  ///< "permResult": authorisation results, by CheckPermission(bool)
 };
 
 /// After-output callback that restarts the web server; the argument is not used.

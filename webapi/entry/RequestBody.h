@@ -1,0 +1,21 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <string>
+
+namespace QELO::RequestBody {
+
+/// How long a client may send nothing before the rest of its body is given up.
+inline constexpr std::chrono::seconds kIdleLimit{30};
+
+/// Reads a body of `length` bytes and takes the text up to its first NUL. A body that ends or
+/// stalls early is taken as far as it came; memory is used for what came, not for `length`.
+/// @param length  bytes announced, above 0
+/// @return false, and `text` unchanged, when memory is short or `fd` cannot be read
+bool Read(int fd, int64_t length, std::chrono::milliseconds idleLimit, std::string& text);
+
+/// Makes /dev/null the process's standard input. Stays as it is when /dev/null cannot be opened.
+void CloseStandardInput();
+
+}  // namespace QELO::RequestBody

@@ -1,0 +1,33 @@
+// The web entry's intake of uploads, which are not served yet: none is read here. A method that
+// reads its upload itself is called.
+
+#include "webapi/APIRequest.h"
+#include "webapi/APIResponse.h"
+#include "webapi/WebAPIError.h"
+#include "webapi/WebEntry.h"
+
+namespace QELO {
+namespace {
+
+constexpr int kUploadUnavailable = -9;  ///< "upload_err": the upload could not be converted
+
+}  // namespace
+
+bool WebEntry::LoadUploadAPIDesc(Json::Value&) {
+  return false;
+}
+
+bool WebEntry::HandleUpload(APIRequest* request, APIResponse* response) {
+  if (request == nullptr || response == nullptr) {
+    return false;
+  }
+  if (GetMethodAttr(request, "deferUpload")) {
+    return true;
+  }
+  Json::Value errors(Json::objectValue);
+  errors["upload_err"] = kUploadUnavailable;
+  response->SetError(WEBAPI_ERR_UPLOAD_FAILED, errors);
+  return false;
+}
+
+}  // namespace QELO

@@ -1,0 +1,163 @@
+#include "webapi/WebEntry.h"
+
+#include <cstdlib>
+#include <cstring>
+
+#include "webapi/APIRequest.h"
+#include "webapi/APIResponse.h"
+#include "webapi/WebAPIError.h"
+#include "webapi/entry/BrokenPipe.h"
+#include "webapi/platform/Cgi.h"
+#include "webapi/platform/Sharing.h"
+
+namespace QELO {
+namespace {
+
+constexpr int kAddressSize = 65;  ///< bytes of a remote address with its NUL
+constexpr char kSessionCookie[] = "id=";
+constexpr char kOldSessionName[] = "abandoned";
+constexpr char kTokenVariable[] = "qeloAccessToken";
+
+/// A credential that may come as a parameter.
+struct Credential {
+  bool isSet;
+  std::string value;
+};
+
+Credential readCredential(const APIRequest& request, const char* name) {
+  const APIParameter<std::string> parameter =
+      request.GetAndCheckString(name, APIRequest::PARAM_OPTIONAL, nullptr);
+  // Environment variables end at a NUL. What they and the request hold must not differ.
+  return {parameter.IsSet(), parameter.Get().c_str()};
+}
+
+std::string environmentText(const char* name) {
+  const char* text = getenv(name);
+  return text != nullptr ? text : "";
+}
+
+void putEnvironment(const char* name, const std::string& value) {
+  setenv(name, value.c_str(), 1);
+}
+
+/// Adds the session cookie that counts, and renames the one before it.
+void replaceSession(std::string& cookies, bool hadCookies, const std::string& sessionId) {
+  if (hadCookies) {
+    cookies += "; ";
+    const size_t old = cookies.find(kSessionCookie);
+    if (old != std::string::npos) {
+      cookies.replace(old, strlen(kSessionCookie) - 1, kOldSessionName);
+    }
+  }
+  cookies += kSessionCookie + sessionId;
+}
+
+}  // namespace
+
+WebEntry::WebEntry()
+    : temporaryFiles_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
+  static_assert(sizeof cgiContext_ == sizeof(QeloCgiContext));
+  permission_["permResult"] = Json::Value(Json::arrayValue);
+}
+
+WebEntry::~WebEntry() = default;
+
+QeloCgiContext* WebEntry::Context() {
+  return reinterpret_cast<QeloCgiContext*>(cgiContext_);
+}
+
+bool WebEntry::Run(const Json::Value&) {
+  if (Initialize(Json::Value()) && SetProcessName(Request(), Response())) {
+    if (Request()->HasParam("relay_zt")) {
+      ProcessRelay(Request(), Response());
+    } else {
+      Process(Request(), Response());
+    }
+  }
+  if (Response()->IsEnableOutput()) {
+    const BrokenPipe tolerated;
+    OutputHeader();
+    OutputBody();
+  }
+  if (Response()->GetHttpdRestart()) {
+    Response()->SetCallbackFunc(RestartHttpd, nullptr);
+  }
+  return HandleCallback(Response());
+}
+
+bool WebEntry::Initialize(const Json::Value&) {
+  QeloCgiInit("", Context());
+  QeloCgiLoadInCookies(Context());
+  Request()->SetAttr("_collector_count_webapi", true);
+  Json::Value session(Json::objectValue);
+  session["uiLang"] = QeloCgiGetLang(Context());
+  session["tokenEnable"] = QeloCgiIsTokenEnable(Context());
+  Request()->InitSession(session);
+  if (!GatherEnvironment()) {
+    Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
+  Json::Value params(Json::objectValue);
+  if (!InitParam(params)) {
+    if (Response()->GetError() == WEBAPI_ERR_NONE) {
+      Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+    }
+    return false;
+  }
+  Request()->InitParam(params, false);
+  return RewriteCredentials();
+}
+
+bool WebEntry::GatherEnvironment() {
+  Json::Value environment(Json::objectValue);
+  if (!InitEnv(environment)) {
+    return false;
+  }
+  char address[kAddressSize] = {};
+  if (QeloCgiGetRemoteIP(address, kAddressSize) == 0) {
+    environment["QELO_REMOTE_IP"] = address;
+  }
+  Request()->InitEnv(environment);
+  return true;
+}
+
+/// Credentials given as parameters take the place of those in cookies and headers, in the process
+/// environment too, where the platform's libraries look for them.
+bool WebEntry::RewriteCredentials() {
+  const Credential session = readCredential(*Request(), "_sid");
+  const Credential token = readCredential(*Request(), "tid");
+  const Credential sharing = readCredential(*Request(), "_sharing_id");
+  const Credential sharingSession = readCredential(*Request(), "_sharing_sid");
+  if (!session.isSet && !token.isSet && !sharing.isSet && !sharingSession.isSet) {
+    return true;
+  }
+  std::string cookies = environmentText("HTTP_COOKIE");
+  const bool hadCookies = !cookies.empty();
+  std::string sharingHeader = environmentText(SZ_X_SHARING_HEADER);
+  if (sharing.isSet) {
+    sharingHeader = sharing.value;
+    putEnvironment(SZ_X_SHARING_HEADER, sharingHeader);
+    if (sharingSession.isSet) {
+      cookies += hadCookies ? "; " : "";
+      cookies += std::string(sharing::SZK_SHARING_SID) + "=" + sharingSession.value;
+      putEnvironment("HTTP_COOKIE", cookies);
+    }
+  }
+  Json::Value environment(Json::objectValue);
+  if (session.isSet) {
+    replaceSession(cookies, hadCookies, session.value);
+    putEnvironment("HTTP_COOKIE", cookies);
+  } else if (token.isSet) {
+    if (setenv(kTokenVariable, token.value.c_str(), 1) != 0) {
+      return false;
+    }
+    environment[kTokenVariable] = token.value;
+  }
+  QeloCgiLoadInCookies(Context());
+  environment["HTTP_COOKIE"] = cookies;
+  environment[SZ_X_SHARING_HEADER] = sharingHeader;
+  Request()->InitEnv(environment);
+  return true;
+}
+
+}  // namespace QELO
