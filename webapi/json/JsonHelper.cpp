@@ -6,34 +6,34 @@
 
 #include <charconv>
 #include <cmath>
-#include <cstdio>
+#include <cstdlib>
+#include <exception>
 #include <limits>
 #include <memory>
 #include <utility>
 
+#include "webapi/json/JsonSyntax.h"
+
 namespace QELO::JsonHelper {
 namespace {
 
-/// Builds one reader; comments are for files that people write.
-std::unique_ptr<Json::CharReader> makeReader(bool comments) {
+bool parse(const std::string& text, bool comments, Json::Value& value) {
+  if (!isJsonText(text, comments, kMaxDepth)) {
+    return false;
+  }
   Json::CharReaderBuilder builder;
   builder["collectComments"] = false;
   builder["allowComments"] = comments;
-  builder["failIfExtra"] = true;
-  builder["strictRoot"] = false;
-  builder["stackLimit"] = kMaxDepth;
-  return std::unique_ptr<Json::CharReader>(builder.newCharReader());
-}
-
-bool parse(const std::string& text, bool comments, Json::Value& value) {
+  builder["stackLimit"] = kMaxDepth + 1;  // the innermost value counts there, too
   try {
+    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
     Json::Value parsed;
-    if (!makeReader(comments)->parse(text.data(), text.data() + text.size(), &parsed, nullptr)) {
+    if (!reader->parse(text.data(), text.data() + text.size(), &parsed, nullptr)) {
       return false;
     }
     value.swap(parsed);
     return true;
-  } catch (const std::exception&) {  // nesting beyond the limit, or no memory
+  } catch (const std::exception&) {
     return false;
   }
 }
@@ -128,13 +128,14 @@ bool fromFile(const std::string& path, Json::Value& value) {
 
 bool toFile(const std::string& path, const Json::Value& value) {
   struct stat old {};
+  const std::string text = toString(value);
   const mode_t mode = stat(path.c_str(), &old) == 0 ? old.st_mode & 07777 : 0600;
   std::string temporary = path + ".XXXXXX";
   const int fd = mkostemp(temporary.data(), O_CLOEXEC);
   if (fd < 0) {
     return false;
   }
-  const bool written = writeAll(fd, toString(value)) && fchmod(fd, mode) == 0;
+  const bool written = writeAll(fd, text) && fchmod(fd, mode) == 0;
   if (close(fd) != 0 || !written || rename(temporary.c_str(), path.c_str()) != 0) {
     unlink(temporary.c_str());
     return false;
