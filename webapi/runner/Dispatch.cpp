@@ -9,6 +9,7 @@
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/APIRunner.h"
+#include "webapi/CompoundHandler.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/platform/Core.h"
@@ -67,9 +68,8 @@ bool APIRunner::ProcessEntry(APIRequest* request, APIResponse* response) {
   return result;
 }
 
-bool APIRunner::HandleCompound(APIRequest*, APIResponse* response) {
-  response->SetError(WEBAPI_ERR_NO_ANSWER);  // compound requests are not served yet
-  return false;
+bool APIRunner::HandleCompound(APIRequest* request, APIResponse* response) {
+  return CompoundHandler(request, response, this).Process();
 }
 
 bool APIRunner::CheckRequestParam(APIRequest* request, APIResponse* response) {

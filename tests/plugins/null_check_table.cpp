@@ -1,0 +1,17 @@
+// The characteristics of this library are: its methods work, its check table is null.
+
+#include "PluginTable.h"
+
+static void run(QELO::APIRequest*, QELO::APIResponse* response) {
+  response->SetSuccess("ran");
+}
+
+PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
+  static QELO::_tag_API_TABLE table[] = {{"QELO.Test.Call", 1, "run", run},
+                                         {nullptr, 0, nullptr, nullptr}};
+  return table;
+}
+
+PLUGIN_EXPORT QELO::_tag_API_CHECK_TABLE* GetAPICheckTable() {
+  return nullptr;
+}

@@ -1,0 +1,260 @@
+#include "tests/unit/runner/RunnerFixture.h"
+
+namespace QELO {
+namespace {
+
+class Catalogue : public RunnerTest {
+ protected:
+  static Json::Value Valid() {
+    return Parse(R"({"lib": "x.so", "minVersion": 1, "maxVersion": 2, "methods": {}})");
+  }
+  static std::string LibOf(Json::Value& catalogue, const std::string& api) {
+    return JsonHelper::asString(JsonHelper::member(catalogue[api], "lib"));
+  }
+  static void WriteNamed(const std::string& file, const std::string& api, const std::string& lib) {
+    Json::Value description = Valid();
+    description["lib"] = lib;
+    Json::Value content;
+    content[api] = description;
+    Write(file, JsonHelper::toString(content));
+  }
+  Json::Value catalogue{Json::objectValue};
+};
+
+TEST_F(Catalogue, DescriptionNeedsLibVersionsAndMethodsOfTheRightTypes) {
+  TestRunner tested;
+  EXPECT_TRUE(tested.CheckLibDescription(Valid()));
+  EXPECT_FALSE(tested.CheckLibDescription(Json::Value()));
+  EXPECT_FALSE(tested.CheckLibDescription(Json::Value("text")));
+  EXPECT_FALSE(tested.CheckLibDescription(Json::Value(Json::arrayValue)));
+  for (const char* key : {"lib", "minVersion", "maxVersion", "methods"}) {
+    Json::Value lacking = Valid();
+    lacking.removeMember(key);
+    EXPECT_FALSE(tested.CheckLibDescription(lacking)) << key;
+    Json::Value wrong = Valid();
+    wrong[key] = Json::Value(Json::arrayValue);
+    EXPECT_FALSE(tested.CheckLibDescription(wrong)) << key;
+  }
+}
+
+TEST_F(Catalogue, EmptyLibPassesTheCheck) {
+  Json::Value description = Valid();
+  description["lib"] = "";
+  EXPECT_TRUE(TestRunner().CheckLibDescription(description));
+}
+
+TEST_F(Catalogue, MinimumAboveMaximumPassesTheCheck) {
+  Json::Value description = Valid();
+  description["minVersion"] = 3;
+  description["maxVersion"] = 1;
+  EXPECT_TRUE(TestRunner().CheckLibDescription(description));
+}
+
+TEST_F(Catalogue, PriorityIsAnIntegerFromMinusTenToTen) {
+  TestRunner tested;
+  const auto accepts = [&](const Json::Value& priority) {
+    Json::Value description = Valid();
+    description["priority"] = priority;
+    return tested.CheckLibDescription(description);
+  };
+  EXPECT_TRUE(accepts(10));
+  EXPECT_TRUE(accepts(-10));
+  EXPECT_FALSE(accepts(11));
+  EXPECT_FALSE(accepts(-11));
+  EXPECT_FALSE(accepts("5"));
+  EXPECT_FALSE(accepts(1.5));
+  EXPECT_FALSE(accepts(Json::Value()));
+}
+
+TEST_F(Catalogue, MissingKeysAreFilledFromLibDef) {
+  WriteLibDef(R"({"authLevel": 2, "allowUser": ["normal.local"], "priority": 7})");
+  Json::Value description = Valid();
+  Json::Value& filled = TestRunner().ApplyLibDef(description);
+  EXPECT_EQ(&filled, &description);
+  EXPECT_EQ(filled["authLevel"], Json::Value(2));
+  EXPECT_EQ(filled["allowUser"][0], Json::Value("normal.local"));
+  EXPECT_EQ(filled["priority"], Json::Value(7));
+  EXPECT_EQ(filled["requestFormat"], Json::Value("JSON"));
+}
+
+TEST_F(Catalogue, KeysThereAreKept) {
+  Json::Value description = Valid();
+  description["authLevel"] = 0;
+  description["requestFormat"] = "XML";
+  TestRunner().ApplyLibDef(description);
+  EXPECT_EQ(description["authLevel"], Json::Value(0));
+  EXPECT_EQ(description["requestFormat"], Json::Value("XML"));
+}
+
+TEST_F(Catalogue, UnreadableLibDefGivesNullDefaults) {
+  for (const char* text : {"not json", "[1, 2]"}) {
+    WriteLibDef(text);
+    Json::Value description = Valid();
+    TestRunner().ApplyLibDef(description);
+    EXPECT_TRUE(JsonHelper::hasMember(description, "authLevel"));
+    EXPECT_TRUE(description["authLevel"].isNull());
+    EXPECT_EQ(description["requestFormat"], Json::Value("JSON"));
+  }
+}
+
+TEST_F(Catalogue, LongestExistingPrefixWins) {
+  WriteNamed("QELO.A.lib", "QELO.A.B.X", "short");
+  WriteNamed("QELO.A.B.lib", "QELO.A.B.X", "long");
+  TestRunner tested;
+  EXPECT_TRUE(tested.InitLibDesc(catalogue, "QELO.A.B.X"));
+  EXPECT_EQ(LibOf(catalogue, "QELO.A.B.X"), "long");
+}
+
+TEST_F(Catalogue, FirstComponentAloneIsNoCandidate) {
+  WriteNamed("QELO.lib", "QELO.A.B", "x");
+  EXPECT_FALSE(TestRunner().InitLibDesc(catalogue, "QELO.A.B"));
+}
+
+TEST_F(Catalogue, NameWithoutDotIsItsOnlyCandidate) {
+  WriteNamed("Plain.lib", "Plain", "x");
+  EXPECT_TRUE(TestRunner().InitLibDesc(catalogue, "Plain"));
+  EXPECT_EQ(LibOf(catalogue, "Plain"), "x");
+}
+
+TEST_F(Catalogue, NameOfManyDotsIsSoughtByItsFirstFiveComponents) {
+  WriteNamed("Q.A.B.C.D.E.lib", "Q.A.B.C.D.E", "whole");
+  EXPECT_FALSE(TestRunner().InitLibDesc(catalogue, "Q.A.B.C.D.E"));
+  WriteNamed("Q.A.B.C.D.lib", "Q.A.B.C.D.E", "five");
+  EXPECT_TRUE(TestRunner().InitLibDesc(catalogue, "Q.A.B.C.D.E"));
+  EXPECT_EQ(LibOf(catalogue, "Q.A.B.C.D.E"), "five");
+}
+
+TEST_F(Catalogue, OneFileDescribesSeveralApis) {
+  Json::Value file;
+  file["QELO.A.B"] = Valid();
+  file["QELO.A.C"] = Valid();
+  file["QELO.A.Broken"] = "text";
+  Write("QELO.A.lib", JsonHelper::toString(file));
+  EXPECT_TRUE(TestRunner().InitLibDesc(catalogue, "QELO.A.B"));
+  EXPECT_TRUE(catalogue.isMember("QELO.A.C"));
+  EXPECT_FALSE(catalogue.isMember("QELO.A.Broken"));
+  EXPECT_EQ(SyslogCapture::Count("WebAPI description QELO.A.Broken is not valid."), 1);
+}
+
+TEST_F(Catalogue, ApiAbsentFromItsFileLoadsButIsNotAdded) {
+  WriteNamed("QELO.A.lib", "QELO.A.Other", "x");
+  TestRunner tested;
+  MakeRequest("QELO.A.B", 1, "get");
+  EXPECT_TRUE(tested.InitLibDesc(catalogue, "QELO.A.B"));
+  EXPECT_FALSE(tested.AddAPIInfo(request.get()));
+}
+
+TEST_F(Catalogue, KnownApiIsNotReadAgain) {
+  catalogue["QELO.A.B"] = Valid();
+  EXPECT_TRUE(TestRunner().InitLibDesc(catalogue, "QELO.A.B"));
+  EXPECT_EQ(LibOf(catalogue, "QELO.A.B"), "x.so");
+}
+
+TEST_F(Catalogue, EmptyNameAndNullRequestFail) {
+  TestRunner tested;
+  EXPECT_FALSE(tested.InitLibDesc(catalogue, ""));
+  EXPECT_FALSE(tested.InitLibDesc(catalogue, static_cast<APIRequest*>(nullptr)));
+  EXPECT_FALSE(tested.AddAPIInfo(nullptr));
+}
+
+TEST_F(Catalogue, MissingFileIsLogged) {
+  EXPECT_FALSE(TestRunner().InitLibDesc(catalogue, "QELO.No.Such"));
+  EXPECT_EQ(SyslogCapture::Count("WebAPI QELO.No.Such is not valid"), 1);
+  EXPECT_EQ(SyslogCapture::Messages().at(0).text.find("APIRunner.cpp:"), 0u);
+  EXPECT_EQ(SyslogCapture::Messages().at(0).priority, 3);
+}
+
+TEST_F(Catalogue, UnparsableFileOrDirectoryIsLogged) {
+  Write("QELO.A.lib", "{ not json");
+  EXPECT_FALSE(TestRunner().InitLibDesc(catalogue, "QELO.A"));
+  EXPECT_EQ(SyslogCapture::Count("WebAPI description file QELO.A.lib is not valid"), 1);
+  std::filesystem::create_directory("QELO.D.lib");
+  EXPECT_FALSE(TestRunner().InitLibDesc(catalogue, "QELO.D"));
+  EXPECT_EQ(SyslogCapture::Count("WebAPI description file QELO.D.lib is not valid"), 1);
+}
+
+TEST_F(Catalogue, FileOfAnotherTypeAddsNothing) {
+  Write("QELO.A.lib", "[1, {\"QELO.A\": {}}]");
+  EXPECT_TRUE(TestRunner().InitLibDesc(catalogue, "QELO.A"));
+  EXPECT_TRUE(catalogue.empty());
+}
+
+TEST_F(Catalogue, NameThatLeavesTheDirectoryIsNeverOpened) {
+  const std::string outside = (directory / "sub").string();
+  std::filesystem::create_directory(outside);
+  WriteNamed("QELO.A.lib", "QELO.A", "x");
+  std::filesystem::current_path(outside);
+  TestRunner tested;
+  for (const std::string& api : {std::string("../QELO.A"), directory.string() + "/QELO.A",
+                                 std::string("QELO.A\0x", 8), std::string("QELO A")}) {
+    EXPECT_FALSE(tested.InitLibDesc(catalogue, api)) << api;
+  }
+  EXPECT_TRUE(catalogue.empty());
+}
+
+TEST_F(Catalogue, LoadingAllReadsEveryGoodFile) {
+  TestRunner tested;
+  EXPECT_FALSE(tested.InitLibDesc(catalogue));  // nothing matches
+  WriteNamed("QELO.A.lib", "QELO.A", "a");
+  WriteNamed("QELO.B.lib", "QELO.B", "b");
+  Write("QELO.C.lib", "broken");
+  Write("QELO.D.txt", "{}");
+  EXPECT_TRUE(tested.InitLibDesc(catalogue));
+  EXPECT_EQ(catalogue.getMemberNames(), (std::vector<std::string>{"QELO.A", "QELO.B"}));
+}
+
+class MethodLookup : public Catalogue {
+ protected:
+  void SetUp() override {
+    Catalogue::SetUp();
+    Json::Value description = Valid();
+    description["methods"] = Parse(R"({
+      "1": ["plain", {"first": {"allowUpload": true, "other": false}, "second": {"never": true}},
+            {}, 7, {"named": "text"}],
+      "2": "no list"})");
+    WriteDescription(description);
+  }
+  TestRunner tested;
+};
+
+TEST_F(MethodLookup, ObjectEntryGivesItsAttributes) {
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "first", "allowUpload"));
+  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "first", "other"));
+  EXPECT_TRUE(tested.GetMethod("QELO.Test.Call", 1, "first").isMember("allowUpload"));
+}
+
+TEST_F(MethodLookup, AttributeMissingFromAMethodsOwnIsFalse) {
+  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "first", "byDefault"));
+}
+
+TEST_F(MethodLookup, PlainStringTakesTheDefaults) {
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "plain", "byDefault"));
+  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "plain", "allowUpload"));
+}
+
+TEST_F(MethodLookup, OnlyTheFirstMemberOfAnEntryHasAttributes) {
+  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "second", "never"));
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "second", "byDefault"));
+}
+
+TEST_F(MethodLookup, AttributesThatAreNoObjectGiveTheDefaults) {
+  EXPECT_EQ(tested.GetMethod("QELO.Test.Call", 1, "named"), Json::Value("text"));
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "named", "byDefault"));
+}
+
+TEST_F(MethodLookup, UnknownApiVersionOrMethodGivesTheDefaults) {
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.No.Such", 1, "plain", "byDefault"));
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 2, "plain", "byDefault"));
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 3, "plain", "byDefault"));
+  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "absent", "byDefault"));
+}
+
+TEST_F(MethodLookup, NullRequestOrEmptyAttributeIsFalse) {
+  MakeRequest("QELO.Test.Call", 1, "plain");
+  EXPECT_TRUE(tested.GetMethodAttr(request.get(), "byDefault"));
+  EXPECT_FALSE(tested.GetMethodAttr(request.get(), ""));
+  EXPECT_FALSE(tested.GetMethodAttr(nullptr, "byDefault"));
+}
+
+}  // namespace
+}  // namespace QELO

@@ -1,0 +1,204 @@
+#include <sys/wait.h>
+
+#include <chrono>
+
+#include "tests/unit/runner/RunnerFixture.h"
+
+namespace QELO {
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+class RequestCheck : public RunnerTest {
+ protected:
+  void SetUp() override {
+    RunnerTest::SetUp();
+    Json::Value description = Description("state");
+    description["methods"] = Parse(R"({"1": ["plain", {"upload": {"allowUpload": true}},
+                                             {"one": {}, "two": {}}],
+                                       "2": "no list", "3": [7, null, "later"]})");
+    WriteDescription(description);
+  }
+  int Check(const std::string& api, int version, const std::string& method) {
+    MakeRequest(api, version, method);
+    const bool passed = TestRunner().CheckRequestParam(request.get(), response.get());
+    EXPECT_EQ(passed, response->GetError() == 0);
+    return response->GetError();
+  }
+};
+
+TEST_F(RequestCheck, BadNamesAndVersionsAre101) {
+  EXPECT_EQ(Check("", 1, "plain"), 101);
+  EXPECT_EQ(Check("QELO.Test.Call", 0, "plain"), 101);
+  EXPECT_EQ(Check("QELO.Test.Call", -1, "plain"), 101);
+  EXPECT_EQ(Check("QELO.Test.Call", 1, ""), 101);
+}
+
+TEST_F(RequestCheck, UnknownApiIs102) {
+  EXPECT_EQ(Check("QELO.No.Such", 1, "plain"), 102);
+  EXPECT_EQ(Check("QELO.Test.Call.Other", 1, "plain"), 102);  // its file exists, without it
+}
+
+TEST_F(RequestCheck, VersionBoundsAreInclusive) {
+  EXPECT_EQ(Check("QELO.Test.Call", 1, "plain"), 0);
+  EXPECT_EQ(Check("QELO.Test.Call", 3, "later"), 0);
+  EXPECT_EQ(Check("QELO.Test.Call", 4, "plain"), 104);
+}
+
+TEST_F(RequestCheck, MethodNotListedForTheVersionIs103) {
+  EXPECT_EQ(Check("QELO.Test.Call", 1, "absent"), 103);
+  EXPECT_EQ(Check("QELO.Test.Call", 2, "plain"), 103);
+  EXPECT_EQ(Check("QELO.Test.Call", 3, "plain"), 103);
+}
+
+TEST_F(RequestCheck, VersionKeyMissingThoughInRangeIs103) {
+  Json::Value description = Description("state");
+  description["methods"].removeMember("2");
+  WriteDescription(description);
+  EXPECT_EQ(Check("QELO.Test.Call", 2, "run"), 103);
+}
+
+TEST_F(RequestCheck, AnyMemberOfAnObjectEntryIsListed) {
+  EXPECT_EQ(Check("QELO.Test.Call", 1, "one"), 0);
+  EXPECT_EQ(Check("QELO.Test.Call", 1, "two"), 0);
+}
+
+TEST_F(RequestCheck, UploadNeedsItsAttribute) {
+  for (const auto& [method, code] : {std::pair("plain", 115), std::pair("upload", 0)}) {
+    MakeRequest("QELO.Test.Call", 1, method);
+    request->InitEnv(Parse(R"({"CONTENT_TYPE": "multipart/form-data; boundary=x"})"));
+    TestRunner().CheckRequestParam(request.get(), response.get());
+    EXPECT_EQ(response->GetError(), code) << method;
+  }
+}
+
+class Dispatch : public RunnerTest {};
+
+TEST_F(Dispatch, HooksOfTheBaseAreConstant) {
+  APIRunner base;
+  EXPECT_TRUE(base.CheckSharingPermission(nullptr, nullptr));
+  EXPECT_FALSE(base.NeedPermission(nullptr));
+  EXPECT_TRUE(base.CheckPermission(nullptr, nullptr));
+  EXPECT_TRUE(base.SkipPermission(nullptr));
+  EXPECT_TRUE(base.HandleUpload(nullptr, nullptr));
+}
+
+TEST_F(Dispatch, RunWithNullIs101) {
+  TestRunner tested;
+  EXPECT_FALSE(tested.Run(Json::Value()));
+  EXPECT_EQ(tested.Response()->GetError(), 101);
+}
+
+TEST_F(Dispatch, RunWithAnEmptyObjectIs101) {
+  TestRunner tested;
+  EXPECT_FALSE(tested.Run(Json::Value(Json::objectValue)));
+  EXPECT_EQ(tested.Response()->GetError(), 101);
+}
+
+TEST_F(Dispatch, RunWithoutApiIs101) {
+  TestRunner tested;
+  EXPECT_FALSE(tested.Run(Parse(R"({"getParam": {"version": 1}})")));
+  EXPECT_EQ(tested.Response()->GetError(), 101);
+}
+
+TEST_F(Dispatch, RunOfARelayRequestIs101AndProcessOfItIs109) {
+  WriteDescription(Description("state"));
+  TestRunner tested;
+  EXPECT_FALSE(tested.Run(Parse(R"({"getParam": {"api": "QELO.Test.Call", "version": 1,
+                                                 "method": "run", "relay_zt": 5}})")));
+  EXPECT_EQ(tested.Response()->GetError(), 101);
+  MakeRequest("QELO.Test.Call", 1, "run", Parse(R"({"relay_zt": 5})"));
+  EXPECT_FALSE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 109);
+}
+
+TEST_F(Dispatch, RunMakesTheCall) {
+  WriteDescription(Description("state"));
+  TestRunner tested;
+  EXPECT_TRUE(tested.Run(Parse(R"({"postParam": {"api": "QELO.Test.Call", "version": 1,
+                                                 "method": "run"}})")));
+  const Json::Value answer = tested.GetResponse();
+  EXPECT_EQ(answer["success"], Json::Value(true));
+  EXPECT_EQ(answer["httpd_restart"], Json::Value(false));
+  EXPECT_EQ(answer["data"]["code"], Json::Value(117));  // preset during the call
+}
+
+TEST_F(Dispatch, InitializeLaysEnvironmentSessionAttributesAndParameters) {
+  setenv("RUNNER_TEST", "a=b", 1);
+  TestRunner tested;
+  EXPECT_TRUE(tested.Initialize(Parse(R"({"environ": {"REQUEST_METHOD": "POST", "N": 1},
+    "session": {"username": "alice"}, "attr": {"colour": "red"}, "getParam": {"x": [1]}})")));
+  const APIRequest& made = *tested.Request();
+  EXPECT_EQ(made.GetEnv("RUNNER_TEST"), Json::Value("a=b"));
+  EXPECT_EQ(made.GetRequestMethod(), APIRequest::METHOD_POST);
+  EXPECT_FALSE(made.HasEnv("N"));
+  EXPECT_EQ(made.GetLoginUserName(), "alice");
+  EXPECT_EQ(made.GetAttr("colour"), Json::Value("red"));
+  EXPECT_EQ(made.GetParam("x"), Parse("[1]"));
+  EXPECT_FALSE(made.HasParam("environ"));
+  unsetenv("RUNNER_TEST");
+}
+
+TEST_F(Dispatch, EnvironmentIntoANonObjectIs101) {
+  TestRunner tested;
+  Json::Value list(Json::arrayValue);
+  EXPECT_FALSE(tested.InitEnv(list));
+  EXPECT_EQ(tested.Response()->GetError(), 101);
+}
+
+TEST_F(Dispatch, EntryWithoutCompoundIs110AndOtherMethodsSetNothing) {
+  TestRunner tested;
+  MakeRequest("QELO.Entry.Request", 1, "request");
+  EXPECT_FALSE(tested.ProcessEntry(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 110);
+  MakeRequest("QELO.Entry.Request", 1, "list");
+  EXPECT_FALSE(tested.ProcessEntry(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 0);
+  EXPECT_EQ(response->GetBody(), Json::Value(Json::objectValue));
+}
+
+/// Writes one byte for each call into the descriptor that the argument points to.
+void writeByte(void* argument) {
+  [[maybe_unused]] const ssize_t count = write(*static_cast<int*>(argument), "x", 1);
+}
+
+TEST_F(Dispatch, NoCallbacksForkNothing) {
+  MakeRequest("QELO.Test.Call", 1, "run");
+  TestRunner tested;
+  EXPECT_FALSE(tested.HandleCallback(response.get()));
+  EXPECT_FALSE(tested.HandleCallback(nullptr));
+  EXPECT_TRUE(platform->calls.empty());
+}
+
+TEST_F(Dispatch, CallbacksRunInAnotherProcessAfterASecond) {
+  MakeRequest("QELO.Test.Call", 1, "run");
+  int ends[2];
+  ASSERT_EQ(pipe(ends), 0);
+  int other = ends[1];
+  response->SetCallbackFunc(writeByte, &ends[1]);
+  response->SetCallbackFunc(writeByte, &other);
+  const auto start = Clock::now();
+  EXPECT_TRUE(TestRunner().HandleCallback(response.get()));
+  EXPECT_LT(Clock::now() - start, std::chrono::milliseconds(500));
+  close(ends[1]);
+  char bytes[8];
+  EXPECT_EQ(read(ends[0], bytes, sizeof bytes), 1);
+  EXPECT_GE(Clock::now() - start, std::chrono::milliseconds(950));
+  EXPECT_EQ(read(ends[0], bytes, sizeof bytes), 1);
+  EXPECT_EQ(read(ends[0], bytes, sizeof bytes), 0);
+  close(ends[0]);
+  int status = -1;
+  EXPECT_GT(wait(&status), 0);
+  EXPECT_EQ(status, 0);
+}
+
+TEST_F(Dispatch, FailedForkOfCallbacksReturns) {
+  MakeRequest("QELO.Test.Call", 1, "run");
+  int unused = 0;
+  response->SetCallbackFunc(writeByte, &unused);
+  platform->forkResult = -1;
+  EXPECT_FALSE(TestRunner().HandleCallback(response.get()));
+}
+
+}  // namespace
+}  // namespace QELO

@@ -1,0 +1,112 @@
+#include <syslog.h>
+
+#include "tests/unit/runner/RunnerFixture.h"
+
+namespace QELO {
+namespace {
+
+class LibraryLoading : public RunnerTest {
+ protected:
+  std::string Plugin(const std::string& name) {
+    return std::string(TEST_PLUGIN_DIR) + "/" + name + ".so";
+  }
+  void Describe(const Json::Value& lib) {
+    MakeRequest("QELO.Test.Call", 1, "run");
+    Json::Value description;
+    description["lib"] = lib;
+    request->InitAPIInfo(description);
+  }
+  bool Open(const std::string& lib) {
+    Describe(lib);
+    table = nullptr;
+    checkTable = nullptr;
+    return tested.OpenLib(request.get(), &table, &checkTable);
+  }
+  TestRunner tested;
+  _tag_API_TABLE* table = nullptr;
+  _tag_API_CHECK_TABLE* checkTable = nullptr;
+};
+
+TEST_F(LibraryLoading, NullArgumentsAreRefused) {
+  EXPECT_FALSE(tested.OpenLib(nullptr, &table, nullptr));
+  Describe(Plugin("state"));
+  EXPECT_FALSE(tested.OpenLib(request.get(), nullptr, nullptr));
+  EXPECT_EQ(SyslogCapture::Count("Bad parameters"), 2);
+}
+
+TEST_F(LibraryLoading, OpensTablesOfALibrary) {
+  ASSERT_TRUE(Open(Plugin("checked")));
+  EXPECT_STREQ(table->api, "QELO.Test.Call");
+  ASSERT_NE(checkTable, nullptr);
+  EXPECT_STREQ(checkTable->method, "run");
+}
+
+TEST_F(LibraryLoading, CheckTableNeedNotBeAskedFor) {
+  Describe(Plugin("checked"));
+  EXPECT_TRUE(tested.OpenLib(request.get(), &table, nullptr));
+  EXPECT_NE(table, nullptr);
+}
+
+TEST_F(LibraryLoading, LibraryWithoutCheckTableLoads) {
+  EXPECT_TRUE(Open(Plugin("state")));
+  EXPECT_EQ(checkTable, nullptr);
+  EXPECT_EQ(SyslogCapture::Count("check table"), 0);
+}
+
+TEST_F(LibraryLoading, NullCheckTableIsLoggedAndLoads) {
+  EXPECT_TRUE(Open(Plugin("null_check_table")));
+  EXPECT_EQ(checkTable, nullptr);
+  EXPECT_EQ(SyslogCapture::Count("cannot get api check table"), 1);
+}
+
+TEST_F(LibraryLoading, LibraryWithoutTableFails) {
+  EXPECT_FALSE(Open(Plugin("no_table")));
+  EXPECT_EQ(SyslogCapture::Count("cannot load table: "), 1);
+  EXPECT_EQ(SyslogCapture::Messages().at(0).priority, LOG_DEBUG);
+  EXPECT_EQ(SyslogCapture::Count("Get API Table Fail"), 1);
+}
+
+TEST_F(LibraryLoading, NullOrThrowingTableFails) {
+  EXPECT_FALSE(Open(Plugin("null_table")));
+  EXPECT_EQ(SyslogCapture::Count("cannot get api table"), 1);
+  EXPECT_FALSE(Open(Plugin("throwing_table")));
+  EXPECT_EQ(SyslogCapture::Count("GetAPITable threw an exception: no table today"), 1);
+}
+
+TEST_F(LibraryLoading, NullHandleOrTargetFailsSilently) {
+  EXPECT_FALSE(tested.GetTableFunc(nullptr, &table));
+  EXPECT_FALSE(tested.GetCheckTableFunc(nullptr, &checkTable));
+  EXPECT_FALSE(tested.GetTableFunc(this, nullptr));
+  EXPECT_FALSE(tested.GetCheckTableFunc(this, nullptr));
+  EXPECT_TRUE(SyslogCapture::Messages().empty());
+}
+
+TEST_F(LibraryLoading, EmptyPathFails) {
+  EXPECT_FALSE(Open(""));
+  EXPECT_EQ(SyslogCapture::Count("library path empty"), 1);
+  Describe(Json::Value(Json::objectValue));
+  EXPECT_FALSE(tested.OpenLib(request.get(), &table, nullptr));
+  EXPECT_EQ(SyslogCapture::Count("library path empty"), 2);
+}
+
+TEST_F(LibraryLoading, MissingFileIsLoggedWithItsPath) {
+  EXPECT_FALSE(Open("/no/such.so"));
+  EXPECT_EQ(SyslogCapture::Count("cannot open library: /no/such.so. error = "), 1);
+}
+
+TEST_F(LibraryLoading, OnePathIsOpenedOnce) {
+  const std::string copy = (directory / "copy.so").string();
+  std::filesystem::copy_file(Plugin("state"), copy);
+  void* first = nullptr;
+  void* second = nullptr;
+  Describe(copy);
+  EXPECT_TRUE(tested.CacheLib(request.get(), &first));
+  std::filesystem::remove(copy);  // a second opening would fail
+  EXPECT_TRUE(tested.CacheLib(request.get(), &second));
+  EXPECT_EQ(first, second);
+  tested.CloseLib();
+  EXPECT_FALSE(tested.CacheLib(request.get(), &second));
+}
+
+}  // namespace
+}  // namespace QELO
