@@ -3,13 +3,15 @@
 
 webserver_pid=
 
-# webserver_start DIR PORT ENTRY: serves ENTRY as /webapi/entry.cgi, with configuration and logs in
-# DIR. The server ends with this shell, however that ends. Says why when it cannot start.
+# webserver_start DIR PORT ENTRY [EXTRA]: serves ENTRY as /webapi/entry.cgi, with configuration and
+# logs in DIR; EXTRA is a file of further configuration. The server ends with this shell, however
+# that ends. Says why when it cannot start.
 webserver_start() {
-  local dir=$1 port=$2 entry=$3 tries
+  local dir=$1 port=$2 entry=$3 extra=${4:-} tries
   mkdir -p "$dir/www" "$dir/uploads"
   sed -e "s|@DIR@|$dir|g; s|@PORT@|$port|g; s|@ENTRY@|$entry|g" \
     "$(dirname "${BASH_SOURCE[0]}")/lighttpd.conf.in" > "$dir/lighttpd.conf"
+  [[ -z $extra ]] || cat "$extra" >> "$dir/lighttpd.conf"
   if webserver_port_is_taken "$port"; then
     echo "Port $port of 127.0.0.1 is taken by another program; choose one with --port." >&2
     return 1

@@ -213,47 +213,48 @@ class MethodLookup : public Catalogue {
             {}, 7, {"named": "text"}],
       "2": "no list"})");
     WriteDescription(description);
+    tested = std::make_unique<TestRunner>();
   }
-  TestRunner tested;
+  std::unique_ptr<TestRunner> tested;
 };
 
 TEST_F(MethodLookup, ObjectEntryGivesItsAttributes) {
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "first", "allowUpload"));
-  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "first", "other"));
-  EXPECT_TRUE(tested.GetMethod("QELO.Test.Call", 1, "first").isMember("allowUpload"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.Test.Call", 1, "first", "allowUpload"));
+  EXPECT_FALSE(tested->GetMethodAttr("QELO.Test.Call", 1, "first", "other"));
+  EXPECT_TRUE(tested->GetMethod("QELO.Test.Call", 1, "first").isMember("allowUpload"));
 }
 
 TEST_F(MethodLookup, AttributeMissingFromAMethodsOwnIsFalse) {
-  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "first", "byDefault"));
+  EXPECT_FALSE(tested->GetMethodAttr("QELO.Test.Call", 1, "first", "byDefault"));
 }
 
 TEST_F(MethodLookup, PlainStringTakesTheDefaults) {
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "plain", "byDefault"));
-  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "plain", "allowUpload"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.Test.Call", 1, "plain", "byDefault"));
+  EXPECT_FALSE(tested->GetMethodAttr("QELO.Test.Call", 1, "plain", "allowUpload"));
 }
 
 TEST_F(MethodLookup, OnlyTheFirstMemberOfAnEntryHasAttributes) {
-  EXPECT_FALSE(tested.GetMethodAttr("QELO.Test.Call", 1, "second", "never"));
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "second", "byDefault"));
+  EXPECT_FALSE(tested->GetMethodAttr("QELO.Test.Call", 1, "second", "never"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.Test.Call", 1, "second", "byDefault"));
 }
 
 TEST_F(MethodLookup, AttributesThatAreNoObjectGiveTheDefaults) {
-  EXPECT_EQ(tested.GetMethod("QELO.Test.Call", 1, "named"), Json::Value("text"));
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "named", "byDefault"));
+  EXPECT_EQ(tested->GetMethod("QELO.Test.Call", 1, "named"), Json::Value("text"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.Test.Call", 1, "named", "byDefault"));
 }
 
 TEST_F(MethodLookup, UnknownApiVersionOrMethodGivesTheDefaults) {
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.No.Such", 1, "plain", "byDefault"));
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 2, "plain", "byDefault"));
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 3, "plain", "byDefault"));
-  EXPECT_TRUE(tested.GetMethodAttr("QELO.Test.Call", 1, "absent", "byDefault"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.No.Such", 1, "plain", "byDefault"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.Test.Call", 2, "plain", "byDefault"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.Test.Call", 3, "plain", "byDefault"));
+  EXPECT_TRUE(tested->GetMethodAttr("QELO.Test.Call", 1, "absent", "byDefault"));
 }
 
 TEST_F(MethodLookup, NullRequestOrEmptyAttributeIsFalse) {
   MakeRequest("QELO.Test.Call", 1, "plain");
-  EXPECT_TRUE(tested.GetMethodAttr(request.get(), "byDefault"));
-  EXPECT_FALSE(tested.GetMethodAttr(request.get(), ""));
-  EXPECT_FALSE(tested.GetMethodAttr(nullptr, "byDefault"));
+  EXPECT_TRUE(tested->GetMethodAttr(request.get(), "byDefault"));
+  EXPECT_FALSE(tested->GetMethodAttr(request.get(), ""));
+  EXPECT_FALSE(tested->GetMethodAttr(nullptr, "byDefault"));
 }
 
 }  // namespace
