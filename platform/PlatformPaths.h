@@ -1,0 +1,23 @@
+#pragma once
+
+#include "webapi/platform/Paths.h"
+
+/// What the embedded platform keeps below the system's root, next to the paths that the library
+/// knows too.
+namespace QELO::Paths {
+
+/// For paths that come from a setting or from the account database.
+inline constexpr char kRootPrefix[] = WEBAPI_ROOT_PREFIX;
+
+inline constexpr char kRuntimeDir[] = WEBAPI_ROOT_PREFIX "/run/webapi";
+inline constexpr char kSessionDir[] = WEBAPI_ROOT_PREFIX "/run/webapi/sessions";
+inline constexpr char kLoginDir[] = WEBAPI_ROOT_PREFIX "/run/webapi/logins";
+inline constexpr char kStateDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi";
+inline constexpr char kTokenDatabase[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/tokens.db";
+inline constexpr char kGroupPreferenceDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/groups";
+inline constexpr char kAppPrivileges[] = WEBAPI_ROOT_PREFIX "/etc/webapi/appprivs.json";
+inline constexpr char kPasswd[] = WEBAPI_ROOT_PREFIX "/etc/passwd";
+inline constexpr char kGroup[] = WEBAPI_ROOT_PREFIX "/etc/group";
+inline constexpr char kShadow[] = WEBAPI_ROOT_PREFIX "/etc/shadow";
+
+}  // namespace QELO::Paths

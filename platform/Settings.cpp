@@ -1,0 +1,35 @@
+#include "platform/Settings.h"
+
+#include <strings.h>
+
+#include <charconv>
+
+#include "platform/PlatformPaths.h"
+
+namespace QELO::Platform {
+
+Settings::Settings() : own_(Paths::kSystemInfo), defaults_(Paths::kSystemInfoDefaults) {}
+
+std::string Settings::Get(std::string_view key, const char* fallback) const {
+  std::string value;
+  return own_.Get(key, value) || defaults_.Get(key, value) ? value : fallback;
+}
+
+int Settings::GetNumber(std::string_view key, int fallback, int lowest, int highest) const {
+  const std::string text = Get(key, "");
+  int number = 0;
+  const char* end = text.data() + text.size();
+  const auto result = std::from_chars(text.data(), end, number);
+  const bool good = result.ec == std::errc() && result.ptr == end;
+  return good && number >= lowest && number <= highest ? number : fallback;
+}
+
+bool Settings::GetSwitch(std::string_view key, bool fallback) const {
+  const std::string text = Get(key, "");
+  if (strcasecmp(text.c_str(), "yes") == 0) {
+    return true;
+  }
+  return strcasecmp(text.c_str(), "no") == 0 ? false : fallback;
+}
+
+}  // namespace QELO::Platform

@@ -1,0 +1,31 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "platform/KeyValueFile.h"
+
+namespace QELO::Platform {
+
+/// The platform's settings: /etc/qeloinfo.conf, and for a key that is not there
+/// /etc.defaults/qeloinfo.conf. Read at construction.
+class Settings {
+ public:
+  Settings();
+
+  std::string Get(std::string_view key, const char* fallback) const;
+  /// The fallback also when the value is no whole decimal number or out of range.
+  int GetNumber(std::string_view key, int fallback, int lowest, int highest) const;
+  /// "yes" and "no" in any case; the fallback for all else.
+  bool GetSwitch(std::string_view key, bool fallback) const;
+
+  /// Idle time-out of login sessions in seconds.
+  int SessionTimeout() const { return GetNumber("session_timeout", 900, 1, 366 * 86400); }
+  bool TokenEnabled() const { return GetSwitch("enable_token", true); }
+
+ private:
+  KeyValueFile own_;
+  KeyValueFile defaults_;
+};
+
+}  // namespace QELO::Platform

@@ -1,0 +1,18 @@
+#include "platform/modules/password_crypt/PasswordCrypt.h"
+
+#include <crypt.h>
+
+#include <cstring>
+#include <memory>
+
+#include "platform/Secrets.h"
+#include "webapi/Export.h"
+
+extern "C" WEBAPI_API int webapiPasswordVerify(const char* hash, const char* password) {
+  const auto work = std::make_unique<crypt_data>();  // 32 KiB, zeroed
+  const char* result = crypt_r(password, hash, work.get());
+  const bool known = result != nullptr && result[0] != '*';
+  const bool matches = known && QELO::Platform::equalSecrets(result, hash);
+  explicit_bzero(work.get(), sizeof *work);
+  return known ? static_cast<int>(matches) : -1;
+}

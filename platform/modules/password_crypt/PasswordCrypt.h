@@ -1,0 +1,8 @@
+#pragma once
+
+/// Checks a password against a hash of the shadow file.
+/// @return 1 it is the password; 0 it is not; -1 the hash is of no scheme that is known here
+using PasswordCryptVerify = int (*)(const char* hash, const char* password);
+
+inline constexpr char kPasswordCryptModule[] = "password_crypt.so";
+inline constexpr char kPasswordCryptVerify[] = "webapiPasswordVerify";
