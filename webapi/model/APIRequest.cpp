@@ -139,23 +139,23 @@ std::string APIRequest::GetUILanguage() const {
 }
 
 bool APIRequest::IsTokenEnable() const {
-  return private_->Flag("session", "tokenEnable", false);
+  return private_->Flag("session", "tokenEnable", false, false);
 }
 
 bool APIRequest::IsAdmin() const {
-  return private_->Flag("session", "isAdmin", false);
+  return private_->Flag("session", "isAdmin", false, false);
 }
 
 bool APIRequest::IsAuthorized() const {
-  return private_->Flag("session", "isAuthorized", false);
+  return private_->Flag("session", "isAuthorized", false, false);
 }
 
 bool APIRequest::IsSkipCheckIP() const {
-  return private_->Flag("session", "isSkipCheckIP", true);
+  return private_->Flag("session", "isSkipCheckIP", true, false);
 }
 
 bool APIRequest::IsTimeout() const {
-  return private_->Flag("session", "isTimeout", true);
+  return private_->Flag("session", "isTimeout", true, true);
 }
 
 int APIRequest::GetTimeoutDuration() const {

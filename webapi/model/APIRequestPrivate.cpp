@@ -180,8 +180,9 @@ int APIRequestPrivate::Number(const std::string& section, const std::string& key
   return JsonHelper::asInt(GetData(section, key, def), def);
 }
 
-bool APIRequestPrivate::Flag(const std::string& section, const std::string& key, bool def) const {
-  return JsonHelper::asBool(GetData(section, key, def), def);
+bool APIRequestPrivate::Flag(const std::string& section, const std::string& key, bool missing,
+                             bool unreadable) const {
+  return JsonHelper::asBool(GetData(section, key, missing), unreadable);
 }
 
 }  // namespace QELO

@@ -53,11 +53,13 @@ class APIRequestPrivate : public APIBase {
   std::string GetCookie(const std::string& name, const std::string& def) const;
   int GetURLPort(int def);
 
-  /// A key's text, integer or truth; `def` when it is missing or cannot be read as one.
+  /// A key's text or integer; `def` when it is missing or cannot be read as one.
   std::string Text(const std::string& section, const std::string& key,
                    const std::string& def = "") const;
   int Number(const std::string& section, const std::string& key, int def) const;
-  bool Flag(const std::string& section, const std::string& key, bool def) const;
+  /// A key's truth; `missing` without the key, `unreadable` when it holds none.
+  bool Flag(const std::string& section, const std::string& key, bool missing,
+            bool unreadable) const;
 
   template <typename T>
   APIParameter<T> GetAndCheckParam(const std::string& name, bool required, Json::ValueType type,
