@@ -1,0 +1,185 @@
+#include "programs/webapi-token-commands.h"
+
+#include <time.h>
+
+#include <charconv>
+#include <map>
+
+#include "platform/modules/tokens/TokenStore.h"
+#include "webapi/platform/Core.h"
+
+namespace QELO::TokenProgram {
+namespace {
+
+using Platform::TokenStore;
+
+constexpr int kDefaultDays = 90;
+constexpr int kMostDays = 36500;
+constexpr int64_t kDaySeconds = 86400;
+constexpr mode_t kStateDirMode = 0711;  // the groups' directories stand there too
+
+constexpr char kHelp[] =
+    "Access tokens stand for a user in API calls.\n"
+    "\n"
+    "webapi-token create --user USER [--api API] [--method METHOD] [--days N]\n"
+    "    Makes a token and prints it, this once: only a hash of it is kept.\n"
+    "    --api, --method  the one API or method that it is for; \"*\", the default: all\n"
+    "    --days           how long it is good, 90 when not given; 0: for ever\n"
+    "webapi-token list\n"
+    "    Lists the tokens: number, user, API, method, when made, until when good (UTC).\n"
+    "webapi-token revoke ID\n"
+    "    Removes the token with this number.\n";
+
+struct Streams {
+  FILE* output;
+  FILE* messages;
+};
+
+ExitCode wrongUse(const Streams& streams, const std::string& reason) {
+  fprintf(streams.messages, "webapi-token: %s; see webapi-token --help\n", reason.c_str());
+  return kWrongUse;
+}
+
+ExitCode failed(const Streams& streams, const std::string& reason) {
+  fprintf(streams.messages, "webapi-token: %s\n", reason.c_str());
+  return kFailed;
+}
+
+template <typename T>
+bool parse(const std::string& text, T lowest, T highest, T& number) {
+  const char* end = text.data() + text.size();
+  const auto result = std::from_chars(text.data(), end, number);
+  return result.ec == std::errc() && result.ptr == end && number >= lowest && number <= highest;
+}
+
+std::string timeText(int64_t seconds) {
+  const time_t when = seconds;
+  tm parts{};
+  char text[32] = "";
+  gmtime_r(&when, &parts);
+  strftime(text, sizeof text, "%Y-%m-%d %H:%M", &parts);
+  return seconds == 0 ? "never" : text;
+}
+
+bool isPattern(const std::string& text) {
+  return text == "*" || (!text.empty() && text.find_first_of("* \t\r\n") == std::string::npos);
+}
+
+/// Reads "--name value" pairs. @return what is wrong, or ""
+std::string readOptions(const std::vector<std::string>& arguments,
+                        std::map<std::string, std::string>& options) {
+  for (size_t i = 1; i < arguments.size(); i += 2) {
+    const auto option = options.find(arguments[i]);
+    if (option == options.end()) {
+      return arguments[i] + " is no option of create";
+    }
+    if (i + 1 == arguments.size()) {
+      return arguments[i] + " needs a value";
+    }
+    option->second = arguments[i + 1];
+  }
+  return "";
+}
+
+/// Reads what the new token is to be. @return what is wrong with the call, or ""
+std::string readEntry(const std::vector<std::string>& arguments, TokenStore::Entry& entry) {
+  std::map<std::string, std::string> options = {
+      {"--user", ""}, {"--api", "*"}, {"--method", "*"}, {"--days", std::to_string(kDefaultDays)}};
+  const std::string wrong = readOptions(arguments, options);
+  int days = 0;
+  if (!wrong.empty()) {
+    return wrong;
+  }
+  if (options["--user"].empty()) {
+    return "--user is missing";
+  }
+  if (!isPattern(options["--api"]) || !isPattern(options["--method"])) {
+    return "--api and --method take a whole name, or \"*\" for all";
+  }
+  if (!parse(options["--days"], 0, kMostDays, days)) {
+    return "--days takes a number from 0 to " + std::to_string(kMostDays);
+  }
+  entry.user = options["--user"];
+  entry.api = options["--api"];
+  entry.method = options["--method"];
+  entry.expires = days == 0 ? 0 : time(nullptr) + days * kDaySeconds;
+  return "";
+}
+
+ExitCode create(const std::vector<std::string>& arguments, const std::string& database,
+                const Streams& streams) {
+  TokenStore::Entry entry;
+  const std::string wrong = readEntry(arguments, entry);
+  if (!wrong.empty()) {
+    return wrongUse(streams, wrong);
+  }
+  uid_t uid = 0;
+  gid_t gid = 0;
+  if (QELOUserGetUGID(entry.user.c_str(), &uid, &gid) != 0) {
+    return failed(streams, "there is no user " + entry.user);
+  }
+  QELOFSMkdirP(database.substr(0, database.rfind('/')).c_str(), 1, 0, static_cast<uid_t>(-1),
+               static_cast<gid_t>(-1), kStateDirMode);
+  TokenStore store;
+  std::string token;
+  if (!store.Open(database.c_str(), true) || !store.Create(entry, token)) {
+    return failed(streams, database + ": " + store.Error());
+  }
+  fprintf(streams.output, "%s\n", token.c_str());
+  fprintf(streams.messages, "Token %lld of %s, good until: %s. It is not shown again.\n",
+          static_cast<long long>(entry.id), entry.user.c_str(), timeText(entry.expires).c_str());
+  return kDone;
+}
+
+ExitCode list(const std::string& database, const Streams& streams) {
+  TokenStore store;
+  std::vector<TokenStore::Entry> entries;
+  const bool opened = store.Open(database.c_str(), false);
+  if ((!opened && !store.Missing()) || (opened && !store.List(entries))) {
+    return failed(streams, database + ": " + store.Error());
+  }
+  for (const TokenStore::Entry& entry : entries) {
+    fprintf(streams.output, "%lld\t%s\t%s\t%s\t%s\t%s\n", static_cast<long long>(entry.id),
+            entry.user.c_str(), entry.api.c_str(), entry.method.c_str(),
+            timeText(entry.created).c_str(), timeText(entry.expires).c_str());
+  }
+  return kDone;
+}
+
+ExitCode revoke(const std::string& number, const std::string& database, const Streams& streams) {
+  int64_t id = 0;
+  if (!parse<int64_t>(number, 1, INT64_MAX, id)) {
+    return wrongUse(streams, "revoke takes the number of a token");
+  }
+  TokenStore store;
+  bool found = false;
+  const bool opened = store.Open(database.c_str(), false);
+  if ((!opened && !store.Missing()) || (opened && !store.Revoke(id, found))) {
+    return failed(streams, database + ": " + store.Error());
+  }
+  return found ? kDone : failed(streams, "there is no token " + number);
+}
+
+}  // namespace
+
+ExitCode run(const std::vector<std::string>& arguments, const std::string& database, FILE* output,
+             FILE* messages) {
+  const Streams streams{output, messages};
+  const std::string command = arguments.empty() ? "" : arguments[0];
+  if (command == "--help" || command == "-h") {
+    fputs(kHelp, output);
+    return kDone;
+  }
+  if (command == "create") {
+    return create(arguments, database, streams);
+  }
+  if (command == "list" && arguments.size() == 1) {
+    return list(database, streams);
+  }
+  if (command == "revoke" && arguments.size() == 2) {
+    return revoke(arguments[1], database, streams);
+  }
+  return wrongUse(streams, command.empty() ? "a command is missing" : "wrong command");
+}
+
+}  // namespace QELO::TokenProgram
