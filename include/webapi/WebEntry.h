@@ -17,7 +17,8 @@ namespace QELO {
 ///     int main(int argc, char** argv) {
 ///       QELO::WebEntry entry;
 ///       entry.SetArgs(argc, argv);
-///       return entry.Run(Json::Value()) ? 0 : 1;
+///       entry.Run(Json::Value());
+///       return 0;
 ///     }
 ///
 /// Changes the process environment when credentials come as parameters. Run once, then destroy.

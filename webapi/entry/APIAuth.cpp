@@ -53,7 +53,7 @@ int checkSession(const APIRequest& request, const char* session, bool allowTimeo
   if (session == nullptr || request.GetSessionID() != session || processSession() != session) {
     return WEBAPI_ERR_NO_PERMISSION;
   }
-  QeloCgiContext context{};
+  alignas(void*) QeloCgiContext context{};
   QeloCgiInitEx(kUserStore, &context);
   QeloCgiLoadInCookies(&context);
   char name[kUserNameSize] = {};

@@ -1,0 +1,157 @@
+// Credentials given as parameters, and how they reach cookies and environment.
+
+#include "tests/support/CgiFixture.h"
+#include "tests/unit/entry/FailingSetenv.h"
+#include "webapi/platform/Sharing.h"
+
+namespace QELO {
+namespace {
+
+class CredentialParameters : public CgiTest {
+ protected:
+  /// Initialises an entry with this query string and cookie line.
+  void Initialize(const std::string& query, const std::string& cookies = "") {
+    Get(query);
+    if (!cookies.empty()) {
+      Set("HTTP_COOKIE", cookies);
+    }
+    EXPECT_TRUE(entry_.Initialize(Json::Value()));
+  }
+
+  std::string RequestCookies() {
+    return JsonHelper::asString(entry_.Request()->GetEnv("HTTP_COOKIE"));
+  }
+
+  TestEntry entry_;
+};
+
+TEST_F(CredentialParameters, NoneLeavesCookieUntouched) {
+  Initialize("api=a", "id=OLD; lang=en");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "id=OLD; lang=en");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "OLD");
+  EXPECT_EQ(Environment("HTTP_X_QELO_SHARING"), "(unset)");
+  EXPECT_FALSE(entry_.Request()->HasEnv("HTTP_X_QELO_SHARING"));
+  EXPECT_EQ(Calls("QeloCgiLoadInCookies"), 1);
+}
+
+TEST_F(CredentialParameters, SidTakesThePlaceOfTheSessionCookie) {
+  Initialize("_sid=X", "id=OLD; lang=en");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "abandoned=OLD; lang=en; id=X");
+  EXPECT_EQ(RequestCookies(), "abandoned=OLD; lang=en; id=X");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "X");
+  EXPECT_EQ(entry_.Request()->GetCookie("abandoned"), "OLD");
+}
+
+TEST_F(CredentialParameters, SidWithoutCookiesIsTheOnlyCookie) {
+  Initialize("_sid=X");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "id=X");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "X");
+}
+
+TEST_F(CredentialParameters, SidWithoutSessionCookieIsAppended) {
+  Initialize("_sid=X", "lang=en");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "lang=en; id=X");
+}
+
+TEST_F(CredentialParameters, SidRenamesTheFirstMatchBeItInALongerName) {
+  Initialize("_sid=X", "userid=7; id=OLD");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "userabandoned=7; id=OLD; id=X");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "X");
+}
+
+TEST_F(CredentialParameters, SidRenamesASharingSessionAppendedBefore) {
+  Initialize("_sid=X&_sharing_id=S&_sharing_sid=T", "lang=en");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "lang=en; sharing_sabandoned=T; id=X");
+}
+
+TEST_F(CredentialParameters, CookiesAreLoadedAgainOnceRewritten) {
+  Initialize("_sid=X", "id=OLD");
+  EXPECT_EQ(Calls("QeloCgiLoadInCookies"), 2);
+  EXPECT_EQ(platform->loadedCookies, "abandoned=OLD; id=X");
+}
+
+TEST_F(CredentialParameters, SidSentAsNullEndsTheSession) {
+  Initialize("_sid=null", "id=OLD");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "abandoned=OLD; id=");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "");
+}
+
+TEST_F(CredentialParameters, SidWithANulIsCutSoThatRequestAndEnvironmentAgree) {
+  Initialize("_sid=X%00Y&_sharing_id=S&_sharing_sid=T%00", "a=1; id=OLD");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "a=1; abandoned=OLD; sharing_sid=T; id=X");
+  EXPECT_EQ(RequestCookies(), Environment("HTTP_COOKIE"));
+}
+
+TEST_F(CredentialParameters, SidWinsOverTid) {
+  Initialize("_sid=X&tid=T");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "id=X");
+  EXPECT_EQ(Environment("qeloAccessToken"), "(unset)");
+  EXPECT_EQ(entry_.Request()->GetQeloAccessTokenID(), nullptr);
+}
+
+TEST_F(CredentialParameters, TidBecomesTheAccessToken) {
+  Initialize("tid=T", "id=OLD");
+  EXPECT_EQ(Environment("qeloAccessToken"), "T");
+  EXPECT_STREQ(entry_.Request()->GetQeloAccessTokenID(), "T");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "id=OLD");
+  EXPECT_EQ(RequestCookies(), "id=OLD");
+  EXPECT_EQ(Calls("QeloCgiLoadInCookies"), 2);
+}
+
+TEST_F(CredentialParameters, TidThatCannotBeExportedStopsWithoutAnError) {
+  Get("tid=T");
+  const FailingSetenv failing("qeloAccessToken");
+  EXPECT_FALSE(entry_.Initialize(Json::Value()));
+  EXPECT_EQ(entry_.Response()->GetError(), 0);
+  EXPECT_EQ(entry_.Response()->GetBody(), Json::Value(Json::objectValue));
+}
+
+TEST_F(CredentialParameters, SharingSidWithoutSharingIdIsIgnored) {
+  Initialize("_sharing_sid=T", "id=OLD");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "id=OLD");
+  EXPECT_EQ(entry_.Request()->GetSharingSID(), "");
+  EXPECT_FALSE(entry_.Request()->IsSharing());
+}
+
+TEST_F(CredentialParameters, SharingIdTakesThePlaceOfTheHeader) {
+  Set(SZ_X_SHARING_HEADER, "header");
+  Initialize("_sharing_id=S");
+  EXPECT_EQ(Environment(SZ_X_SHARING_HEADER), "S");
+  EXPECT_EQ(entry_.Request()->GetSharingID(), "S");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "(unset)");
+}
+
+TEST_F(CredentialParameters, SharingHeaderStaysWhenOnlySidIsGiven) {
+  Set(SZ_X_SHARING_HEADER, "header");
+  Initialize("_sid=X");
+  EXPECT_EQ(Environment(SZ_X_SHARING_HEADER), "header");
+  EXPECT_EQ(entry_.Request()->GetSharingID(), "header");
+}
+
+TEST_F(CredentialParameters, SharingIdAndSidAddTheCookie) {
+  Initialize("_sharing_id=S&_sharing_sid=T", "id=OLD");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "id=OLD; sharing_sid=T");
+  EXPECT_EQ(entry_.Request()->GetSharingSID(), "T");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "OLD");
+}
+
+TEST_F(CredentialParameters, SharingIdAndSidWithoutCookiesAreTheOnlyCookie) {
+  Initialize("_sharing_id=S&_sharing_sid=T");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "sharing_sid=T");
+}
+
+// Only the cookies that came decide on a separator, so these two run together.
+TEST_F(CredentialParameters, SharingSidAndSidWithoutCookiesHaveNoSeparator) {
+  Initialize("_sharing_id=S&_sharing_sid=T&_sid=X");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "sharing_sid=Tid=X");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "");
+}
+
+TEST_F(CredentialParameters, SidInTheBodyCountsAsInTheQuery) {
+  Post("_sid=X");
+  EXPECT_TRUE(entry_.Initialize(Json::Value()));
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "id=X");
+}
+
+}  // namespace
+}  // namespace QELO

@@ -1,0 +1,245 @@
+// One entry's life: from the CGI environment to the printed answer and the work after it.
+
+#include <sys/stat.h>
+#include <sys/wait.h>
+
+#include "tests/support/CgiFixture.h"
+
+namespace QELO {
+namespace {
+
+class EntryLifecycle : public CgiTest {
+ protected:
+  /// A description that anybody may call.
+  static void DescribeOpen() { Describe(R"({"authLevel": 0})", R"({"grantByDefault": true})"); }
+};
+
+constexpr char kEcho[] = "api=QELO.Test.Good&version=1&method=echo";
+
+TEST_F(EntryLifecycle, InitializeLaysEnvironmentSessionAndParameters) {
+  platform->language = "ger";
+  platform->tokenEnable = 1;
+  Get("api=QELO.Test.Good&version=1&method=echo&x=1");
+  TestEntry entry;
+  EXPECT_TRUE(entry.Initialize(Json::Value()));
+  EXPECT_EQ(platform->calls[0], "QeloCgiInit()");
+  EXPECT_EQ(platform->calls[1], "QeloCgiLoadInCookies()");
+  const APIRequest& request = *entry.Request();
+  EXPECT_EQ(request.GetAttr("_collector_count_webapi"), Json::Value(true));
+  EXPECT_EQ(request.GetUILanguage(), "ger");
+  EXPECT_TRUE(request.IsTokenEnable());
+  EXPECT_EQ(request.GetRemoteIP(), "192.0.2.7");
+  EXPECT_EQ(request.GetRequestMethod(), APIRequest::METHOD_GET);
+  EXPECT_EQ(request.GetAPIClass(), "QELO.Test.Good");
+  EXPECT_EQ(request.GetParam("x"), Json::Value(1));
+}
+
+TEST_F(EntryLifecycle, InitializeGoesOnWithoutARemoteAddress) {
+  platform->remoteAddress = "";
+  Get("api=a");
+  TestEntry entry;
+  EXPECT_TRUE(entry.Initialize(Json::Value()));
+  EXPECT_FALSE(entry.Request()->HasEnv("QELO_REMOTE_IP"));
+  EXPECT_EQ(entry.Response()->GetError(), 0);
+}
+
+TEST_F(EntryLifecycle, RunPrintsTheMethodsAnswer) {
+  DescribeOpen();
+  Get(std::string(kEcho) + "&name=a%20b");
+  const CgiAnswer answer = Serve();
+  EXPECT_TRUE(answer.HasLine("Content-type: application/json; charset=\"UTF-8\""));
+  EXPECT_TRUE(answer.Json()["success"].asBool());
+  EXPECT_EQ(answer.Json()["data"]["name"], "a b");
+}
+
+TEST_F(EntryLifecycle, RunReadsAPostedCall) {
+  DescribeOpen();
+  Post(std::string(kEcho) + "&name=posted");
+  EXPECT_EQ(Serve().Json()["data"]["name"], "posted");
+}
+
+TEST_F(EntryLifecycle, RunLetsPostOverrideGet) {
+  DescribeOpen();
+  Get("api=QELO.Other&version=7&method=none&name=got");
+  Post(std::string(kEcho) + "&name=posted");
+  EXPECT_EQ(Serve().Json()["data"]["name"], "posted");
+}
+
+TEST_F(EntryLifecycle, RunAnswersTheMethodsError) {
+  DescribeOpen();
+  Get("api=QELO.Test.Good&version=1&method=fail");
+  EXPECT_EQ(Serve().Code(), 400);
+}
+
+TEST_F(EntryLifecycle, RunAnswers117ForASilentMethod) {
+  DescribeOpen();
+  Get("api=QELO.Test.Good&version=1&method=silent");
+  EXPECT_EQ(Serve().Code(), 117);
+}
+
+TEST_F(EntryLifecycle, RunWithoutAnApiAnswers101) {
+  Get("");
+  EXPECT_EQ(Serve().Code(), 101);
+}
+
+TEST_F(EntryLifecycle, RunWithAnUnknownApiAnswers102) {
+  Get("api=QELO.Nothing&version=1&method=x");
+  EXPECT_EQ(Serve().Code(), 102);
+}
+
+TEST_F(EntryLifecycle, FailedInitializationStillPrintsAndCallsNothing) {
+  DescribeOpen();
+  Get(kEcho);
+  Set("REQUEST_METHOD", "POST");
+  Set("CONTENT_LENGTH", "0");
+  const CgiAnswer answer = Serve();
+  EXPECT_EQ(answer.Code(), 101);
+  EXPECT_TRUE(answer.HasLine("Pragma: no-cache"));
+  EXPECT_EQ(Calls("QeloCgiLoadInCookies"), 1);  // it stopped before credentials
+  EXPECT_EQ(Calls("QLIBCFileExist"), 0);
+}
+
+TEST_F(EntryLifecycle, RunDoesNotConsultItsArgument) {
+  DescribeOpen();
+  Get(kEcho);
+  const CgiAnswer answer = Printed([] {
+    TestEntry entry;
+    entry.Run(CgiTest::Parse(R"({"getParam": {"method": "fail"}})"));
+  });
+  EXPECT_TRUE(answer.Json()["success"].asBool());
+}
+
+TEST_F(EntryLifecycle, RunCallsADerivedInitialize) {
+  struct Derived : TestEntry {
+    bool Initialize(const Json::Value& param) override {
+      sawNull = param.isNull();
+      return false;
+    }
+    bool sawNull = false;
+  } entry;
+  const CgiAnswer answer = Printed([&entry] { entry.Run(Json::Value(1)); });
+  EXPECT_TRUE(entry.sawNull);
+  EXPECT_EQ(answer.Body(), "{}");
+}
+
+TEST_F(EntryLifecycle, DisabledOutputPrintsNothingButRestarts) {
+  platform->forkResult = 4321;
+  TestEntry entry;
+  entry.Response()->SetEnableOutput(false);
+  entry.Response()->SetHttpdRestart(true);
+  bool started = false;
+  const CgiAnswer answer = Printed([&] { started = entry.Run(Json::Value()); });
+  EXPECT_EQ(answer.text, "");
+  EXPECT_TRUE(started);
+  EXPECT_EQ(Calls("QLIBCProcFork"), 1);
+  const APIResponse::CallbackList expected{{RestartHttpd, nullptr}};
+  EXPECT_EQ(*entry.Response()->GetCallbackFuncs(), expected);
+}
+
+TEST_F(EntryLifecycle, NoRestartAskedForRegistersNone) {
+  TestEntry entry;
+  bool started = true;
+  Printed([&] { started = entry.Run(Json::Value()); });
+  EXPECT_FALSE(started);
+  EXPECT_TRUE(entry.Response()->GetCallbackFuncs()->empty());
+}
+
+TEST_F(EntryLifecycle, RestartComesAfterTheBodyAndInAnotherProcess) {
+  struct Report {
+    pid_t process;
+    off_t printed;
+  };
+  static int pipe[2];
+  ASSERT_EQ(pipe2(pipe, O_CLOEXEC), 0);
+  TestEntry entry;
+  entry.Response()->SetHttpdRestart(true);
+  // Called in the restart's process right before it: tells what has been printed by then.
+  entry.Response()->SetCallbackFunc(
+      [](void*) {
+        struct stat output {};
+        fstat(STDOUT_FILENO, &output);
+        const Report report{getpid(), output.st_size};
+        _exit(write(pipe[1], &report, sizeof report) == sizeof report ? 0 : 1);
+      },
+      nullptr);
+  const CgiAnswer answer = Printed([&] { entry.Run(Json::Value()); });
+  EXPECT_EQ(answer.Code(), 101);
+  const APIResponse::CallbackFunc last = entry.Response()->GetCallbackFuncs()->back().first;
+  EXPECT_EQ(last, RestartHttpd);
+  Report report{};
+  ASSERT_EQ(read(pipe[0], &report, sizeof report), static_cast<ssize_t>(sizeof report));
+  EXPECT_NE(report.process, getpid());
+  EXPECT_EQ(report.printed, static_cast<off_t>(answer.text.size()));
+  waitpid(report.process, nullptr, 0);
+  close(pipe[0]);
+  close(pipe[1]);
+}
+
+TEST_F(EntryLifecycle, ClientThatIsGoneDoesNotEndTheProcess) {
+  int pipes[2];
+  ASSERT_EQ(pipe2(pipes, O_CLOEXEC), 0);
+  close(pipes[0]);
+  platform->forkResult = 4321;
+  TestEntry entry;
+  entry.Response()->SetHttpdRestart(true);
+  bool started = false;
+  {
+    fflush(stdout);
+    const Redirection output(STDOUT_FILENO, pipes[1]);
+    started = entry.Run(Json::Value());
+  }
+  close(pipes[1]);
+  EXPECT_TRUE(started);
+  EXPECT_EQ(Calls("QLIBCProcFork"), 1);
+}
+
+TEST_F(EntryLifecycle, RelayIsAnsweredWith109) {
+  DescribeOpen();
+  Get(std::string(kEcho) + "&relay_zt=1");
+  EXPECT_EQ(Serve().Code(), 109);
+}
+
+TEST_F(EntryLifecycle, SharingRequestIsRefusedWith126) {
+  DescribeOpen();
+  Get(std::string(kEcho) + "&_sharing_id=S");
+  TestEntry entry;
+  const CgiAnswer answer = Printed([&] { entry.Run(Json::Value()); });
+  EXPECT_EQ(answer.Code(), 126);
+  EXPECT_EQ(entry.Request()->GetAuthResult(), AUTHORIZED_UNKNOWN);
+}
+
+TEST_F(EntryLifecycle, CallThatNeedsALoginIsRefusedWithoutOne) {
+  Describe(R"({"authLevel": 1, "allowUser": ["normal.local"]})", R"({"grantByDefault": true})");
+  Get(kEcho);
+  const CgiAnswer answer = Serve();
+  EXPECT_EQ(answer.Code(), 105);
+  EXPECT_TRUE(answer.HasLine("x-request-error: noprivilege"));
+}
+
+TEST_F(EntryLifecycle, CallThatNeedsALoginRunsForItsUser) {
+  Describe(R"({"authLevel": 1, "allowUser": ["normal.local"]})", R"({"grantByDefault": true})");
+  platform->authorized = 1;
+  platform->authorizedUser = "ann";
+  Set("HTTP_COOKIE", "id=S");
+  Get("api=QELO.Test.Good&version=1&method=whoami");
+  const Json::Value data = Serve().Json()["data"];
+  EXPECT_EQ(data["user"], "ann");
+  EXPECT_EQ(data["isAdmin"], false);
+  EXPECT_EQ(data["isAuthorized"], true);
+  EXPECT_EQ(data["authResult"], 1);
+  EXPECT_EQ(data["address"], "192.0.2.7");
+}
+
+TEST_F(EntryLifecycle, SkippedCheckRunsWithNobodyLoggedIn) {
+  Describe(R"({"authLevel": 2})", R"({"grantByDefault": true})");
+  platform->authorized = -1;
+  platform->authorizedUser = "ann";
+  Set("HTTP_COOKIE", "id=S");
+  Get("api=QELO.Test.Good&version=1&method=whoami");
+  const Json::Value data = Serve().Json()["data"];
+  EXPECT_EQ(data["user"], "");
+  EXPECT_EQ(data["isAuthorized"], false);
+}
+
+}  // namespace
+}  // namespace QELO

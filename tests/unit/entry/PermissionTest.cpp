@@ -1,0 +1,362 @@
+// Who calls, and whether that user may run the method.
+
+#include <memory>
+
+#include "tests/support/CgiFixture.h"
+#include "webapi/WebAPIError.h"
+
+namespace QELO {
+namespace {
+
+class Permission : public CgiTest {
+ protected:
+  void SetUp() override {
+    CgiTest::SetUp();
+    platform->authorized = 1;
+    platform->authorizedUser = "ann";
+  }
+
+  /// Makes the entry's request a call of QELO.Test.Good, with this session id and parameters.
+  void MakeRequest(TestEntry& entry, const std::string& sessionId = "S",
+                   const std::string& extra = "{}") {
+    Json::Value environment;
+    environment["HTTP_COOKIE"] = "id=" + sessionId;
+    environment["QELO_REMOTE_IP"] = "192.0.2.7";
+    if (!token.empty()) {
+      environment["qeloAccessToken"] = token;
+    }
+    entry.Request()->InitEnv(environment);
+    Json::Value params;
+    params["getParam"] = Parse(extra);
+    params["getParam"]["api"] = "QELO.Test.Good";
+    params["getParam"]["version"] = 1;
+    params["getParam"]["method"] = "echo";
+    entry.Request()->InitParam(params, false);
+    entry.CheckRequestParam(entry.Request(), entry.Response());
+    entry.AddAPIInfo(entry.Request());
+  }
+
+  /// A fresh entry's full check of a call whose description has these keys and attributes.
+  bool Check(const std::string& keys, const std::string& attributes = "{}") {
+    entry_ = std::make_unique<TestEntry>();
+    Describe(keys, attributes);
+    MakeRequest(*entry_);
+    return entry_->CheckPermission(entry_->Request(), entry_->Response());
+  }
+
+  /// The full check when the CGI library answers this, with the error and server error as text.
+  std::string CheckResult(int result) {
+    platform->authorized = result;
+    TestEntry entry;
+    Describe(kOpenToAll);
+    MakeRequest(entry);
+    const bool passed = entry.CheckPermission(entry.Request(), entry.Response());
+    return std::string(passed ? "passed " : "refused ") +
+           std::to_string(entry.Response()->GetError()) + " " + entry.Response()->GetServerError();
+  }
+
+  static constexpr char kOpenToAll[] =
+      R"({"allowUser": ["admin.local", "admin.domain", "admin.ldap",
+                        "normal.local", "normal.domain", "normal.ldap"]})";
+  std::string token;
+  std::unique_ptr<TestEntry> entry_ = std::make_unique<TestEntry>();
+};
+
+TEST_F(Permission, ApiWithoutAuthLevelNeedsItAndIsNotSkipped) {
+  EXPECT_TRUE(entry_->NeedPermission(entry_->Request()));
+  EXPECT_FALSE(entry_->SkipPermission(entry_->Request()));
+}
+
+TEST_F(Permission, AuthLevelDecidesOnNeedAndSkip) {
+  const auto ask = [this](const char* description) {
+    entry_->Request()->InitAPIInfo(Parse(description));
+    return std::pair(entry_->NeedPermission(entry_->Request()),
+                     entry_->SkipPermission(entry_->Request()));
+  };
+  EXPECT_EQ(ask(R"({"authLevel": 0})"), std::pair(false, false));
+  EXPECT_EQ(ask(R"({"authLevel": 1})"), std::pair(true, false));
+  EXPECT_EQ(ask(R"({"authLevel": 2})"), std::pair(true, true));
+  EXPECT_EQ(ask(R"({"authLevel": 3})"), std::pair(true, false));
+}
+
+TEST_F(Permission, AuthLevelThatIsNoNumberAsksForALogin) {
+  for (const char* description :
+       {R"({"authLevel": null})", R"({"authLevel": "none"})", R"({"authLevel": []})"}) {
+    entry_->Request()->InitAPIInfo(Parse(description));
+    EXPECT_TRUE(entry_->NeedPermission(entry_->Request())) << description;
+    EXPECT_FALSE(entry_->SkipPermission(entry_->Request())) << description;
+  }
+}
+
+TEST_F(Permission, NullRequestNeedsItAndIsNeitherSkippedNorPassed) {
+  EXPECT_TRUE(entry_->NeedPermission(nullptr));
+  EXPECT_FALSE(entry_->SkipPermission(nullptr));
+  EXPECT_FALSE(entry_->CheckPermission(nullptr, entry_->Response()));
+  EXPECT_FALSE(entry_->CheckPermission(entry_->Request(), nullptr));
+}
+
+TEST_F(Permission, EveryResultHasItsErrorAndServerError) {
+  EXPECT_EQ(CheckResult(-9), "refused 105 noprivilege");
+  EXPECT_EQ(CheckResult(-8), "refused 150 errorip");
+  EXPECT_EQ(CheckResult(-7), "refused 105 noprivilege");
+  EXPECT_EQ(CheckResult(-6), "refused 105 noprivilege");
+  EXPECT_EQ(CheckResult(-5), "refused 119 unauth");
+  EXPECT_EQ(CheckResult(-4), "refused 105 noprivilege");
+  EXPECT_EQ(CheckResult(-3), "refused 105 noprivilege");
+  EXPECT_EQ(CheckResult(-2), "refused 105 noprivilege");
+  EXPECT_EQ(CheckResult(-1), "refused 106 timeout");
+  EXPECT_EQ(CheckResult(0), "refused 105 noprivilege");
+  EXPECT_EQ(CheckResult(1), "passed 0 ");
+  EXPECT_EQ(CheckResult(2), "passed 0 ");
+  EXPECT_EQ(CheckResult(3), "refused 105 noprivilege");
+}
+
+TEST_F(Permission, RefusalBodyHasTheCodeAlone) {
+  platform->authorized = -1;
+  EXPECT_FALSE(Check(kOpenToAll));
+  EXPECT_EQ(entry_->Response()->GetBody(), Parse(R"({"success": false, "error": {"code": 106}})"));
+}
+
+TEST_F(Permission, AuthorisationClearsAnErrorSetBefore) {
+  Describe(kOpenToAll);
+  MakeRequest(*entry_);
+  entry_->Response()->SetError(117);
+  EXPECT_TRUE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
+  EXPECT_EQ(entry_->Response()->GetError(), 0);
+}
+
+TEST_F(Permission, NeitherSessionNorTokenIsNoPrivilege) {
+  Describe(kOpenToAll);
+  MakeRequest(*entry_, "");
+  EXPECT_FALSE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
+  EXPECT_EQ(entry_->Response()->GetError(), 105);
+  EXPECT_EQ(entry_->Response()->GetServerError(), "noprivilege");
+  EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_NO_SESSION);
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 0);
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "(unset)");
+}
+
+TEST_F(Permission, TokenMismatchIsLoggedForAnApiThatNeedsALogin) {
+  platform->authorized = -7;
+  EXPECT_FALSE(Check(kOpenToAll));
+  ASSERT_EQ(SyslogCapture::Messages().size(), 1U);
+  EXPECT_EQ(SyslogCapture::Messages()[0].text, "WebEntry:577 Token Authentication Fail.");
+  EXPECT_EQ(SyslogCapture::Messages()[0].priority, 3);
+}
+
+TEST_F(Permission, TokenMismatchIsNotLoggedForAnApiThatIsSkipped) {
+  platform->authorized = -7;
+  EXPECT_FALSE(Check(R"({"authLevel": 2})"));
+  EXPECT_EQ(SyslogCapture::Count("Token Authentication Fail."), 0);
+}
+
+TEST_F(Permission, OtherRefusalsAreNotLoggedAsTokenFailure) {
+  platform->authorized = -6;
+  EXPECT_FALSE(Check(kOpenToAll));
+  EXPECT_EQ(SyslogCapture::Count("Token Authentication Fail."), 0);
+}
+
+TEST_F(Permission, CgiLibraryIsToldTimeoutAddressAndWhereTheSessionCameFrom) {
+  Check(kOpenToAll);
+  EXPECT_EQ(platform->calls.back(), "QLIBGroupIsAdminGroupMem(ann)");
+  EXPECT_EQ(platform->calls[platform->calls.size() - 2], "QeloCgiIsAuthorizedEx(0, 0, 1)");
+
+  platform->calls.clear();
+  TestEntry entry;
+  Describe(kOpenToAll, R"({"allowTimeout": true, "skipCheckIP": true})");
+  MakeRequest(entry, "S", R"({"_sid": "S"})");
+  entry.CheckPermission(entry.Request(), entry.Response());
+  EXPECT_EQ(platform->calls[platform->calls.size() - 2], "QeloCgiIsAuthorizedEx(1, 1, 0)");
+}
+
+TEST_F(Permission, SecondCheckWithTheSameAllowanceAsksNobody) {
+  Describe(kOpenToAll);
+  MakeRequest(*entry_);
+  EXPECT_EQ(entry_->CheckPermission(false), 0);
+  platform->authorized = -1;
+  EXPECT_EQ(entry_->CheckPermission(false), 0);
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 1);
+  EXPECT_EQ(entry_->CheckPermission(true), 106);
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 2);
+  EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_TIMED_OUT);
+  EXPECT_EQ(entry_->CheckPermission(false), 0);
+  EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_YES);
+  EXPECT_EQ(entry_->CheckPermission(true), 106);
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 2);
+}
+
+TEST_F(Permission, AccessTokenServesWithoutASession) {
+  token = "T";
+  platform->tokenGrant = 0;
+  platform->tokenUser = "bob";
+  Describe(kOpenToAll);
+  MakeRequest(*entry_, "");
+  EXPECT_TRUE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 0);
+  EXPECT_EQ(platform->calls[platform->calls.size() - 2],
+            "QeloAccessTokenGrant(T, QELO.Test.Good, echo)");
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
+  EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_YES);
+}
+
+TEST_F(Permission, AccessTokenServesWhenTheSessionIsRefused) {
+  token = "T";
+  platform->authorized = -1;
+  platform->tokenGrant = 7;
+  platform->tokenUser = "bob";
+  EXPECT_TRUE(Check(kOpenToAll));
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
+}
+
+TEST_F(Permission, AccessTokenIsNotAskedWhenTheSessionIsGood) {
+  token = "T";
+  EXPECT_TRUE(Check(kOpenToAll));
+  EXPECT_EQ(Calls("QeloAccessTokenGrant"), 0);
+}
+
+TEST_F(Permission, RefusedAccessTokenIsNotAuthenticated) {
+  token = "T";
+  platform->authorized = -1;
+  platform->tokenUser = "bob";
+  EXPECT_FALSE(Check(kOpenToAll));
+  EXPECT_EQ(entry_->Response()->GetError(), 119);
+  EXPECT_EQ(entry_->Response()->GetServerError(), "unauth");
+  EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_UNAUTHENTICATED);
+}
+
+TEST_F(Permission, RefusedAccessTokenLeavesNoUserBehind) {
+  token = "T";
+  platform->authorized = -1;  // and names the user whose session it was
+  platform->tokenUser = "bob";
+  Check(kOpenToAll);
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "");
+  EXPECT_FALSE(entry_->Request()->IsAuthorized());
+  EXPECT_FALSE(entry_->Request()->IsAdmin());
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "");
+}
+
+TEST_F(Permission, RefusedSessionLeavesNoUserBehind) {
+  platform->authorized = -1;
+  Check(kOpenToAll);
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "");
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "(unset)");
+}
+
+TEST_F(Permission, SessionIsFilledFromTheCgiLibrary) {
+  platform->authorized = 2;
+  platform->isAdmin = 1;
+  platform->language = "fre";
+  platform->tokenEnable = 1;
+  platform->options = {{"sessfile", "/sessions/S"}, {"istimeout", "1"}, {"timeout", "900"},
+                       {"skipcheckip", "1"},        {"app", "Desk"},    {"webapi", "all"}};
+  EXPECT_TRUE(Check(R"({"allowUser": ["admin.local"], "appPriv": "Files"})"));
+  EXPECT_EQ(entry_->Request()->Serialize()["session"],
+            Parse(R"({"username": "ann", "isAdmin": true, "sessFile": "/sessions/S",
+                      "isTimeout": true, "timeout": 900, "isSkipCheckIP": true, "uiLang": "fre",
+                      "app": "Desk", "webapi": "all", "isAuthorized": true, "tokenEnable": true,
+                      "appPriv": "Files", "authResult": 2})"));
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "ann");
+}
+
+TEST_F(Permission, SessionWithoutOptionsTakesTheirDefaults) {
+  EXPECT_TRUE(Check(kOpenToAll));
+  EXPECT_EQ(entry_->Request()->Serialize()["session"],
+            Parse(R"({"username": "ann", "isAdmin": false, "sessFile": "", "isTimeout": false,
+                      "timeout": 0, "isSkipCheckIP": false, "uiLang": "enu", "app": "",
+                      "webapi": "", "isAuthorized": true, "tokenEnable": false, "appPriv": "",
+                      "authResult": 1})"));
+}
+
+TEST_F(Permission, HostThatCannotTellMakesNobodyAnAdministrator) {
+  platform->isAdmin = -1;
+  Check(kOpenToAll);
+  EXPECT_FALSE(entry_->Request()->IsAdmin());
+}
+
+TEST_F(Permission, ApiWithoutAllowUserRefusesEverybody) {
+  EXPECT_FALSE(Check("{}"));
+  EXPECT_EQ(entry_->Response()->GetError(), 105);
+  EXPECT_FALSE(entry_->Response()->HasServerError());
+}
+
+TEST_F(Permission, AllowUserThatIsEmptyOrNoListRefuses) {
+  for (const char* keys : {R"({"allowUser": []})", R"({"allowUser": "normal.local"})",
+                           R"({"allowUser": {"normal.local": true}})", R"({"allowUser": [5]})"}) {
+    EXPECT_FALSE(Check(keys)) << keys;
+    EXPECT_EQ(entry_->Response()->GetError(), 105) << keys;
+  }
+}
+
+TEST_F(Permission, AllowUserNamesTheCallersClass) {
+  EXPECT_TRUE(Check(R"({"allowUser": ["admin.local", "normal.local"]})"));
+}
+
+TEST_F(Permission, AdministratorIsNoNormalUser) {
+  platform->isAdmin = 1;
+  EXPECT_FALSE(Check(R"({"allowUser": ["normal.local"]})"));
+}
+
+TEST_F(Permission, AdministratorWithABackslashIsADomainAdministrator) {
+  platform->isAdmin = 1;
+  platform->authorizedUser = "CORP\\ann@x";
+  EXPECT_TRUE(Check(R"({"allowUser": ["admin.domain"]})"));
+}
+
+TEST_F(Permission, NormalUserWithAnAtSignIsAnLdapUser) {
+  platform->authorizedUser = "ann@corp";
+  EXPECT_TRUE(Check(R"({"allowUser": ["normal.ldap"]})"));
+}
+
+TEST_F(Permission, MethodsAllowUserTakesThePlaceOfTheApis) {
+  EXPECT_FALSE(Check(kOpenToAll, R"({"allowUser": ["admin.local"]})"));
+  EXPECT_TRUE(Check(R"({"allowUser": ["admin.local"]})", R"({"allowUser": ["normal.local"]})"));
+}
+
+TEST_F(Permission, SessionWithoutAUserNameIsRefused) {
+  platform->authorizedUser = "";
+  EXPECT_FALSE(Check(kOpenToAll));
+  EXPECT_EQ(entry_->Response()->GetError(), 105);
+}
+
+TEST_F(Permission, MissingApplicationPrivilegeSets160) {
+  platform->appPriv = 0;
+  EXPECT_FALSE(Check(R"({"allowUser": ["normal.local"], "appPriv": "Files"})"));
+  EXPECT_EQ(entry_->Response()->GetError(), 160);
+  EXPECT_FALSE(entry_->Response()->HasServerError());
+  EXPECT_EQ(platform->calls.back(), "QLIBAppPrivUserHas(ann, Files, 192.0.2.7)");
+}
+
+TEST_F(Permission, EmptyApplicationPrivilegeIsNotAskedFor) {
+  platform->appPriv = 0;
+  EXPECT_TRUE(Check(R"({"allowUser": ["normal.local"], "appPriv": ""})"));
+  EXPECT_EQ(Calls("QLIBAppPrivUserHas"), 0);
+}
+
+// A compound request's entries bring requests of their own, whose caller is the outer one's.
+TEST_F(Permission, RequestWithinTheRequestGetsTheCallersSession) {
+  Describe(kOpenToAll);
+  MakeRequest(*entry_);
+  APIRequest inner(*entry_->Request());
+  APIResponse response(&inner);
+  EXPECT_TRUE(entry_->CheckPermission(&inner, &response));
+  EXPECT_EQ(inner.GetLoginUserName(), "ann");
+  EXPECT_TRUE(inner.IsAuthorized());
+  EXPECT_EQ(inner.GetAuthResult(), AUTHORIZED_YES);
+}
+
+TEST_F(Permission, RequestWithinTheRequestKeepsNoSessionOfTheOneBefore) {
+  Describe(kOpenToAll);
+  MakeRequest(*entry_);
+  platform->authorized = -1;
+  APIRequest inner(*entry_->Request());
+  inner.InitSession(Parse(R"({"username": "ann", "isAuthorized": true, "isAdmin": true})"));
+  APIResponse response(&inner);
+  EXPECT_FALSE(entry_->CheckPermission(&inner, &response));
+  EXPECT_EQ(inner.GetLoginUserName(), "");
+  EXPECT_FALSE(inner.IsAuthorized());
+  EXPECT_FALSE(inner.IsAdmin());
+  EXPECT_EQ(inner.GetUILanguage(), "enu");
+}
+
+}  // namespace
+}  // namespace QELO
