@@ -1,5 +1,5 @@
 # What `cmake --install` puts where: library, headers, CMake package, pkg-config file, programs,
-# platform modules, bundled API libraries and their descriptions.
+# bundled API libraries and their descriptions. The platform installs its own modules.
 
 include(CMakePackageConfigHelpers)
 
@@ -41,19 +41,8 @@ install(FILES ${CMAKE_BINARY_DIR}/webapi-ARDO5.pc
 install(DIRECTORY ${WEBAPI_DESCRIPTION_DIR}/
         DESTINATION ${WEBAPI_ROOT_PREFIX}/usr/qelo/qeloman/webapi
         FILES_MATCHING PATTERN *.lib PATTERN lib.def)
-# webapi_install_modules(FOLDER DESTINATION): the loadable libraries that a folder builds.
-function(webapi_install_modules folder destination)
-  get_property(targets DIRECTORY ${folder} PROPERTY BUILDSYSTEM_TARGETS)
-  foreach(target ${targets})
-    get_target_property(type ${target} TYPE)
-    if(type STREQUAL MODULE_LIBRARY)
-      install(TARGETS ${target} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/${destination})
-    endif()
-  endforeach()
-endfunction()
-webapi_install_modules(platform modules)
-webapi_install_modules(apis apis)
-
+get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
+install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
 file(GLOB webapi_api_readmes RELATIVE ${PROJECT_SOURCE_DIR} apis/*/README.md)
 foreach(readme ${webapi_api_readmes})
   get_filename_component(folder ${readme} DIRECTORY)

@@ -71,11 +71,11 @@ def alice(client):
 @pytest.fixture
 def describe(root):
     """Describes an API for one test: describe(api, library, **members), or with text=..."""
-    made = []
+    before = {}
 
     def write(api, library="", text=None, **members):
         file = DESCRIPTIONS / f"{api}.lib"
-        made.append(file)
+        before.setdefault(file, file.read_text() if file.exists() else None)
         if text is None:
             description = {
                 "lib": str(PLUGINS / library) if library else "",
@@ -90,8 +90,11 @@ def describe(root):
         return file
 
     yield write
-    for file in made:
-        file.unlink(missing_ok=True)
+    for file, content in before.items():
+        if content is None:
+            file.unlink(missing_ok=True)
+        else:
+            file.write_text(content)
 
 
 def run_entry(query=None, body=None, length=None, **environment):

@@ -80,7 +80,7 @@ def test_IncompleteOrUnknownCall_GetsItsCode(client, query, code):
         "QELO.%2A",
         "QELO%0a.Test",
         "QELO.Test.Open.lib",
-        "A" * 5000,
+        pytest.param("A" * 5000, id="long"),
     ],
 )
 def test_ApiNameThatIsNoName_IsNoSuchApi(client, api):
@@ -143,7 +143,7 @@ def test_BodyLongerThanItsLength_IsCutThere(client):
 def test_LengthThatIsNoLength_IsRefusedByTheServer(client, length):
     received = client.raw(post_head(length) + OPEN.encode())
     assert is_http_answer(received)
-    assert received.split()[1] == b"400"
+    assert received.split()[1] in (b"400", b"411")
 
 
 @pytest.mark.parametrize("length", ["9" * 18, "9" * 19, "9" * 30])
@@ -188,7 +188,11 @@ def test_InvalidUtf8_InNamesOfTheCall_GivesAnAnswerInUtf8(client):
         assert answer.code in (101, 102, 103)
 
 
-@pytest.mark.parametrize("text", ["[" * 5000, "[" * 5000 + "]" * 5000, '{"a":' * 5000 + "1" + "}" * 5000])
+@pytest.mark.parametrize(
+    "text",
+    ["[" * 5000, "[" * 5000 + "]" * 5000, '{"a":' * 5000 + "1" + "}" * 5000],
+    ids=["open lists", "lists", "objects"],
+)
 def test_ParameterThatNestsDeeply_StaysText(client, text):
     assert parameters_of(client, f"x={text}")["x"] == text
 
@@ -219,7 +223,7 @@ def test_ParameterValues_BecomeJsonOnlyWhenTheyAreJsonWhole(client, text, value)
 
 
 @pytest.mark.parametrize(
-    "header", ["Cookie: " + "id=;" * 1000, "Cookie: =;;;=", "Cookie: id=%zz", "X-Qelo-Token: \xff"]
+    "header", [pytest.param("Cookie: " + "id=;" * 1000, id="many"), "Cookie: =;;;=", "Cookie: id=%zz", "X-Qelo-Token: \xff"]
 )
 def test_StrangeHeaders_AreAnswered(client, header):
     received = client.raw(
@@ -247,7 +251,7 @@ def test_OtherMethods_AreAnswered(client, verb):
     [
         "no json",
         "",
-        "[" * 5000,
+        pytest.param("[" * 5000, id="deep"),
         "[]",
         "null",
         "{}",

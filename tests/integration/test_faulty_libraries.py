@@ -54,9 +54,16 @@ def test_MethodThatCrashes_IsTheServersError(client, describe):
     assert call(client).status == 200
 
 
-def test_MethodThatSetsNothing_IsNoAnswer(client, describe):
-    describe("QELO.Test.Call", "state.so", methods={"1": ["stayIdle"]})
-    assert client.get("api=QELO.Test.Call&version=1&method=stayIdle").code == 117
+@pytest.mark.parametrize("method, code", [("echo", 0), ("fail", 400), ("silent", 117)])
+def test_Method_AnswersWhatItSet_OrNoAnswer(client, describe, method, code):
+    describe("QELO.Test.Good", "good.so", methods={"1": ["echo", "fail", "silent"]})
+    assert client.get(f"api=QELO.Test.Good&version=1&method={method}").code == code
+
+
+@pytest.mark.parametrize("priority", [5, 0])
+def test_Priority_IsTheDescriptions(client, describe, priority):
+    describe("QELO.Test.Call", "state.so", priority=priority)
+    assert call(client).data["priority"] == priority
 
 
 def test_LibraryThatPrints_DoesNotReachTheAnswer(client, describe):
@@ -91,7 +98,7 @@ def test_NullCheckTable_IsNoTable(client, describe):
 
 def test_EveryFaultyLibrary_IsCovered():
     tested = {
-        "checked", "crashing", "identity", "late", "no_table", "null_check_table", "null_table",
+        "checked", "crashing", "good", "identity", "late", "no_table", "null_check_table", "null_table",
         "printing", "reading", "state", "throwing", "throwing_table", "wandering",
     }
     assert {library.stem for library in PLUGINS.glob("*.so")} == tested

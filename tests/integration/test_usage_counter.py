@@ -2,6 +2,7 @@
 
 import json
 import random
+import re
 import subprocess
 import time
 
@@ -53,11 +54,15 @@ def test_KilledAtAnyMoment_LeavesValidJsonAndNoLock(tmp_path):
 
 
 @pytest.fixture
-def collecting(root):
-    """The administrator has allowed data collection."""
-    before = SETTINGS.read_text() if SETTINGS.exists() else ""
-    SETTINGS.write_text(before + 'enable_data_collect="yes"\n')
-    yield
+def allow_collecting(root):
+    """allow_collecting("yes") or ("no"): the administrator's choice, for one test."""
+    before = SETTINGS.read_text()
+
+    def choose(choice):
+        SETTINGS.write_text(re.sub(r'(?m)^enable_data_collect=.*$', "", before)
+                            + f'enable_data_collect="{choice}"\n')
+
+    yield choose
     SETTINGS.write_text(before)
 
 
@@ -67,7 +72,8 @@ def counts(api):
 
 
 @needs_root
-def test_Calls_AreCountedWhenCollectionIsAllowed(client, alice, collecting):
+def test_Calls_AreCountedWhenCollectionIsAllowed(client, alice, allow_collecting):
+    allow_collecting("yes")
     key = "QELO.Test.Identity_1_plain"
     before = counts("QELO.Test.Identity").get(key, {"count": 0})["count"]
     for _ in range(3):
@@ -78,12 +84,14 @@ def test_Calls_AreCountedWhenCollectionIsAllowed(client, alice, collecting):
 
 
 @needs_root
-def test_Calls_ThatAllowTimeout_AreNotCounted(client, alice, collecting):
+def test_Calls_ThatAllowTimeout_AreNotCounted(client, alice, allow_collecting):
+    allow_collecting("yes")
     client.call("QELO.Test.Identity", "patient", _sid=alice["sid"])
     assert "QELO.Test.Identity_1_patient" not in counts("QELO.Test.Identity")
 
 
-def test_Calls_AreNotCountedWhenCollectionIsNotAllowed(client, alice):
+def test_Calls_AreNotCountedWhenCollectionIsNotAllowed(client, alice, allow_collecting):
+    allow_collecting("no")
     before = counts("QELO.Access.Session")
     client.call("QELO.Access.Session", "current", _sid=alice["sid"])
     assert counts("QELO.Access.Session") == before

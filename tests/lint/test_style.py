@@ -1,0 +1,81 @@
+"""How files look."""
+
+import re
+import shutil
+
+import pytest
+
+from sources import SOURCE, cpp_files, files, name, run, scripts
+
+MAX_LINES = 400
+
+
+def test_Cpp_IsFormatted():
+    result = run("clang-format", "--dry-run", "--Werror", *map(str, cpp_files()), cwd=SOURCE)
+    assert result.returncode == 0, result.stderr[:4000]
+
+
+def test_Scripts_PassShellcheck():
+    assert scripts()
+    result = run("shellcheck", "-x", *map(name, scripts()), cwd=SOURCE)
+    assert result.returncode == 0, result.stdout
+
+
+def test_Files_AreShort():
+    checked = cpp_files() + files("*.py", "*.cmake", "CMakeLists.txt") + scripts()
+    lengths = {name(path): len(path.read_text().splitlines()) for path in checked}
+    assert {path: lines for path, lines in lengths.items() if lines > MAX_LINES} == {}
+
+
+def test_Headers_AreGuarded():
+    unguarded = [name(path) for path in files("*.h") if "#pragma once" not in path.read_text()]
+    assert unguarded == []
+
+
+def test_Texts_NameNoPathOfADeveloper():
+    """A path of the machine where something was written is wrong on every other."""
+    foreign = re.compile(r"/(home|root|work|Users)/[a-z]|/tmp/(build|brief)")
+    found = []
+    for path in files("*"):
+        if path == SOURCE / "tests" / "lint" / "test_style.py":
+            continue
+        text = path.read_bytes().decode("utf-8", errors="replace")
+        for number, line in enumerate(text.splitlines(), 1):
+            if foreign.search(line):
+                found.append(f"{name(path)}:{number}: {line.strip()}")
+    assert found == []
+
+
+def test_Texts_LeaveNothingForLater():
+    found = []
+    marks = re.compile(r"\b(TO" + r"DO|FIX" + r"ME|XX" + r"X)\b")
+    for path in files("*.cpp", "*.h", "*.py", "*.md", "*.cmake", "CMakeLists.txt") + scripts():
+        for number, line in enumerate(path.read_text().splitlines(), 1):
+            if marks.search(line):
+                found.append(f"{name(path)}:{number}: {line.strip()}")
+    assert found == []
+
+
+def test_Cpp_EndsLinesPlainly():
+    found = [
+        f"{name(path)}:{number}"
+        for path in cpp_files()
+        for number, line in enumerate(path.read_text().split("\n"), 1)
+        if "\t" in line or line.endswith((" ", "\r"))
+    ]
+    assert found == []
+
+
+def test_Commands_AreExecutable():
+    commands = ["run", "test", ".ci/run", "packaging/setup", "packaging/private-root", "bench/run"]
+    missing = [
+        command
+        for command in commands
+        if not (SOURCE / command).stat().st_mode & 0o111
+    ]
+    assert missing == []
+
+
+@pytest.mark.parametrize("tool", ["clang-format", "shellcheck"])
+def test_Tools_AreInstalled(tool):
+    assert shutil.which(tool)
