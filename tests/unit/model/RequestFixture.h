@@ -15,6 +15,14 @@ inline Json::Value json(const std::string& text) {
   return value;
 }
 
+/// A log message with its line number, the first number there is, written as "N".
+inline std::string lineAsN(const std::string& message) {
+  const size_t start = message.find_first_of("0123456789");
+  const size_t end = message.find_first_not_of("0123456789", start);
+  return start == std::string::npos ? message
+                                    : message.substr(0, start) + "N" + message.substr(end);
+}
+
 /// A request with these CGI variables: an object's text.
 inline QELO::APIRequest requestWithEnv(const std::string& variables) {
   Json::Value init;
