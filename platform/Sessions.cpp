@@ -3,6 +3,7 @@
 #include "platform/SessionStore.h"
 #include "platform/Settings.h"
 #include "platform/TextBuffer.h"
+#include "webapi/platform/Core.h"
 #include "webapi/platform/Session.h"
 
 using namespace QELO::Platform;
@@ -58,6 +59,10 @@ long QeloSessionSecondsLeft(const char* id) {
     return -1;
   }
   return session.SecondsLeft(Settings().SessionTimeout());
+}
+
+int QLIBCConfGetARDOTimeout() {
+  return Settings().SessionTimeout();
 }
 
 }  // extern "C"
