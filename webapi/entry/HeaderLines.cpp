@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "webapi/APIResponse.h"
+#include "webapi/JsonHelper.h"
 #include "webapi/model/Log.h"
 
 namespace QELO {
@@ -61,7 +62,7 @@ std::vector<std::string> HeaderLines(const APIResponse& response) {
     if (!isSendable(name, *it)) {
       continue;
     }
-    const std::string line = name + ": " + it->asString();
+    const std::string line = name + ": " + JsonHelper::asString(*it);
     if (!isContentType(name)) {
       lines.push_back(line);
     } else if (contentType.empty()) {
