@@ -3,7 +3,6 @@
 #include "platform/SessionStore.h"
 #include "platform/Settings.h"
 #include "platform/TextBuffer.h"
-#include "webapi/platform/Core.h"
 #include "webapi/platform/Session.h"
 
 using namespace QELO::Platform;
@@ -59,10 +58,6 @@ long QeloSessionSecondsLeft(const char* id) {
     return -1;
   }
   return session.SecondsLeft(Settings().SessionTimeout());
-}
-
-int QLIBCConfGetARDOTimeout() {
-  return Settings().SessionTimeout();
 }
 
 }  // extern "C"

@@ -5,6 +5,7 @@
 #include <charconv>
 
 #include "platform/PlatformPaths.h"
+#include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
 
@@ -33,3 +34,7 @@ bool Settings::GetSwitch(std::string_view key, bool fallback) const {
 }
 
 }  // namespace QELO::Platform
+
+extern "C" int QLIBCConfGetARDOTimeout(void) {
+  return QELO::Platform::Settings().SessionTimeout();
+}
