@@ -28,10 +28,11 @@ class WEBAPI_API Task {
   void beginUpdate();
   /// Outside of an update it is an update of its own. @return false when it was not stored
   bool setProperty(const std::string& name, const Json::Value& value);
-  /// @return false when nothing was stored
+  /// @return false when nothing was stored; a record that was removed is not made again
   bool endUpdate();
 
-  /// Null when there is no such property.
+  /// Null when there is no such property. The "body" of a task that ended without being finished is
+  /// an error body, whatever its process had set.
   Json::Value getProperty(const std::string& name) const;
   bool hasProperty(const std::string& name) const;
   bool getBoolProperty(const std::string& name, bool def) const;
@@ -53,9 +54,15 @@ class WEBAPI_API Task {
   std::string getTaskId() const;
 
   /// Waits for a property that another process sets, and reads the record.
-  /// @param limit  longest time in units of 10 ms
+  /// @param limit  longest time in units of 10 ms; it returns sooner when the task has ended or its
+  ///               record is removed meanwhile
   /// @return whether the property is there
   bool waitForDataReady(const std::string& name, int limit);
+  /// Waits until the record changes after its last read: by an update, its end or its removal.
+  /// Reads it anew; a record that was not read before is read first.
+  /// @param limit  longest time in units of 10 ms
+  /// @return false when the limit passed first
+  bool waitForChange(int limit);
 
  private:
   std::unique_ptr<TaskPrivate> private_;
@@ -75,7 +82,10 @@ class WEBAPI_API TaskMgr {
 
 class WEBAPI_API TaskUtil {
  public:
-  /// A new id that starts with `prefix` and cannot be guessed.
+  /// A new id that starts with `prefix` and cannot be guessed. Only the user that the process runs
+  /// as now, and root, can use it.
+  /// @param prefix  up to 128 letters, digits, '.', '_' and '-'
+  /// @return "" when the prefix holds something else (logged)
   static std::string getUniqueID(const std::string& owner, const std::string& prefix);
   static bool checkTaskExists(const std::string& owner, const std::string& taskId);
 };
