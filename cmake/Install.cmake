@@ -7,8 +7,9 @@ set(webapi_package_dir ${CMAKE_INSTALL_LIBDIR}/cmake/webapi)
 
 # Programs and libraries find each other by an absolute path, which a set-user-id program may use,
 # unless they stand where the dynamic loader looks anyway.
+get_property(webapi_programs DIRECTORY programs PROPERTY BUILDSYSTEM_TARGETS)
 if(NOT CMAKE_INSTALL_FULL_LIBDIR IN_LIST CMAKE_PLATFORM_IMPLICIT_LINK_DIRECTORIES)
-  set_target_properties(webapi webapi_platform entry.cgi
+  set_target_properties(webapi webapi_platform ${webapi_programs}
                         PROPERTIES INSTALL_RPATH ${CMAKE_INSTALL_FULL_LIBDIR})
 endif()
 

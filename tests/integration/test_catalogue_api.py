@@ -27,10 +27,11 @@ def test_List_LeavesOutMethodsThatTheCallerMayNotCall(client, alice, admin):
     assert "adminOnly" in listed(client, admin)["QELO.Test.Identity"]["methods"]["1"]
 
 
-def test_List_TellsAttributes(client, alice):
-    methods = listed(client, alice)["QELO.Test.Identity"]["methods"]["1"]
+def test_List_TellsAttributes(client, admin):
+    methods = listed(client, admin)["QELO.Test.Identity"]["methods"]["1"]
     assert methods["patient"] == {"allowTimeout": True}
-    assert methods["plain"]["allowTimeout"] is False
+    assert methods["adminOnly"] == {"allowUser": ["admin.local"]}
+    assert methods["plain"] == {}
     assert methods["asAlice"] == {}
 
 

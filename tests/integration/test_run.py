@@ -1,0 +1,138 @@
+"""The command that builds and serves, as root and as an ordinary user."""
+
+import os
+import pwd
+import re
+import shutil
+import signal
+import socket
+import subprocess
+import tempfile
+from pathlib import Path
+
+import pytest
+
+from conftest import SOURCE, needs_root
+from webserver import free_port
+
+ORDINARY_USER = "nobody"
+
+
+@pytest.fixture(scope="module")
+def checkout():
+    """A copy of the sources that belongs to an ordinary user, with a build tree of its own."""
+    if os.geteuid() != 0:
+        yield SOURCE
+        return
+    parent = Path(tempfile.mkdtemp(prefix="webapi-run-"))
+    copy = parent / "checkout"
+    unwanted = shutil.ignore_patterns("build", ".git", "__pycache__")
+    shutil.copytree(SOURCE, copy, ignore=unwanted)
+    account = pwd.getpwnam(ORDINARY_USER)
+    for path in (parent, copy, *copy.rglob("*")):
+        os.chown(path, account.pw_uid, account.pw_gid)
+    yield copy
+    shutil.rmtree(parent)
+
+
+def command(*arguments):
+    """./run as the ordinary user."""
+    words = ["./run", *map(str, arguments)]
+    return ["runuser", "-u", ORDINARY_USER, "--", *words] if os.geteuid() == 0 else words
+
+
+def run(checkout, *arguments):
+    # Without optimisation the build takes a third of the time.
+    environment = {**os.environ, "CMAKE_BUILD_TYPE": "Debug"}
+    return subprocess.run(
+        command(*arguments),
+        cwd=checkout,
+        env=environment,
+        stdin=subprocess.DEVNULL,
+        capture_output=True,
+        text=True,
+        timeout=400,
+        check=False,
+    )
+
+
+def is_free(port):
+    with socket.socket() as probe:
+        return probe.connect_ex(("127.0.0.1", port)) != 0
+
+
+def check_answers(result, port):
+    assert result.returncode == 0, result.stdout + result.stderr
+    for piece in ('"sid"', '"user":"alice"', '"api":"QELO.Catalog.API"', '"code":105'):
+        assert piece in result.stdout
+    assert "WRONG" not in result.stdout
+    assert is_free(port)
+
+
+def test_Check_AsAnOrdinaryUser_IsRight(checkout):
+    port = free_port()
+    check_answers(run(checkout, "--check", "--port", port), port)
+    owner = pwd.getpwuid((checkout / "build" / "dev" / "root").stat().st_uid).pw_name
+    assert owner != "root"
+
+
+@needs_root
+def test_Check_AsRoot_IsRight():
+    port = free_port()
+    result = subprocess.run(
+        ["./run", "--check", "--port", str(port)],
+        cwd=SOURCE, stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=400,
+        check=False,
+    )
+    check_answers(result, port)
+
+
+def test_Check_WithAWrongAnswer_Fails(checkout):
+    library = checkout / "build" / "dev" / "apis" / "QELO.Catalog.API.so"
+    content = library.read_bytes()
+    library.write_bytes(b"no library")
+    result = run(checkout, "--check", "--port", free_port())
+    library.write_bytes(content)
+    assert result.returncode == 1
+    assert "WRONG" in result.stdout
+    assert "Wrong answers: 1" in result.stderr
+
+
+def test_PortThatIsTaken_IsSaid(checkout):
+    with socket.socket() as taken:
+        taken.bind(("127.0.0.1", 0))
+        taken.listen()
+        port = taken.getsockname()[1]
+        result = run(checkout, "--port", port)
+    assert result.returncode == 1
+    assert f"Port {port} of 127.0.0.1 is taken" in result.stderr
+
+
+@pytest.mark.parametrize("arguments", [["--port"], ["--port", "x"], ["--port", "70000"], ["--no"]])
+def test_WrongArguments_AreRefused(checkout, arguments):
+    assert run(checkout, *arguments).returncode == 2
+
+
+def test_Serving_PrintsLinesThatWork_AndLeavesNothingBehind(checkout):
+    port = free_port()
+    process = subprocess.Popen(
+        command("--port", port), cwd=checkout, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
+        stderr=subprocess.STDOUT, text=True, start_new_session=True,
+    )
+    printed = ""
+    for line in process.stdout:
+        printed += line
+        if "Ctrl-C" in line:
+            break
+    lines = re.findall(r"^  ((?:SID=|curl ).*)$", printed, re.MULTILINE)
+    assert len(lines) == 3, printed
+    answers = subprocess.run(
+        ["bash", "-c", "\n".join(lines)], capture_output=True, text=True, check=True
+    ).stdout
+    assert '"user":"alice"' in answers and '"api":"QELO.Catalog.API"' in answers
+    for account in ("admin", "alice", "bob"):
+        assert re.search(rf"^ +{account} +{account}-pw", printed, re.MULTILINE)
+
+    os.killpg(process.pid, signal.SIGINT)
+    assert process.wait(timeout=20) != 0
+    assert is_free(port)
