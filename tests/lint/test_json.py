@@ -10,7 +10,10 @@ THROWING = re.compile(
     r"LargestInt|LargestUInt)|isMember|getMemberNames)\(\)?"
 )
 # What asks for the type of a value that is then converted.
-GUARD = re.compile(r"\bis(String|Int|Int64|UInt|UInt64|Bool|Double|Numeric|Object|Array|Null)\(")
+GUARD = re.compile(
+    r"\bis(String|Int|Int64|UInt|UInt64|Bool|Double|Numeric|Object|Array|Null)\(|"
+    r"\btype\(\) == Json::\w+Value"
+)
 GUARD_DISTANCE = 6  # lines
 
 # Files that may, and why.

@@ -11,7 +11,9 @@ MAX_LINES = 400
 
 
 def test_Cpp_IsFormatted():
-    result = run("clang-format", "--dry-run", "--Werror", *map(str, cpp_files()), cwd=SOURCE)
+    names = [name(path) for path in cpp_files()]
+    result = run("clang-format", "--dry-run", "--Werror", *names, cwd=SOURCE)
+    assert sorted(set(re.findall(r"^(\S+?):\d+:\d+: error", result.stderr, re.MULTILINE))) == []
     assert result.returncode == 0, result.stderr[:4000]
 
 
