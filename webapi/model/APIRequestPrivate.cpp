@@ -4,7 +4,6 @@
 
 #include <cstdint>
 #include <cstdlib>
-#include <utility>
 
 #include "webapi/JsonHelper.h"
 #include "webapi/platform/Cgi.h"
@@ -49,13 +48,13 @@ void APIRequestPrivate::InitEnv(const Json::Value& env) {
   InitSharing();
 }
 
-void APIRequestPrivate::InitParam(Json::Value params, bool replace) {
+void APIRequestPrivate::InitParam(const Json::Value& params, bool replace) {
   if (replace) {
     ClearData("param", "");
   }
   for (const char* source : {"getParam", "postParam"}) {
     if (JsonHelper::hasMember(params, source)) {
-      Json::Value& section = params[source];
+      Json::Value section = JsonHelper::member(params, source);
       DecryptParam(section);
       SetData("param", section, false);
       SetAPIDesc(section);

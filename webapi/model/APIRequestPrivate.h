@@ -23,7 +23,7 @@ class APIRequestPrivate : public APIBase {
   APIRequestPrivate(const APIRequestPrivate&) = default;
 
   void InitEnv(const Json::Value& env);
-  void InitParam(Json::Value params, bool replace);
+  void InitParam(const Json::Value& params, bool replace);
   void InitAPIInfo(const Json::Value& description);
   void InitSession(const Json::Value& session);
   /// Takes a deserialized store; what is kept beside the store is made anew from it.
