@@ -2,6 +2,8 @@
 
 #include <json/json.h>
 
+#include <cstddef>
+
 #include "webapi/Export.h"
 
 namespace QELO {
@@ -10,13 +12,14 @@ namespace QELO {
 /// writing to the reading side.
 ///
 /// A message is a 32-bit length in the machine's byte order and the JSON text, each written and
-/// read by one call. That needs room for all of it: the pipe is made large where the process may,
-/// and WriteJson() makes it larger when it must and can.
+/// read by one call. That needs room for all of it, which ordinary pipes have for 64 KiB. So a
+/// privileged process makes the pipe large from the start, and an ordinary one when a message asks
+/// for it, as far as the system lets it: up to /proc/sys/fs/pipe-max-size.
 class WEBAPI_API Pipe {
  public:
-  /// Room in bytes that a pipe made by a privileged process has, whatever its writer may do later.
-  /// A writer without privilege can raise a smaller pipe up to /proc/sys/fs/pipe-max-size.
-  static constexpr int kPrivilegedCapacity = 16 << 20;
+  /// Room in bytes that Init() gives a message when the process is root, whatever its writer is
+  /// allowed to do later.
+  static constexpr int kPrivilegedRoom = 16 << 20;
 
   Pipe();
   Pipe(const Pipe&) = delete;
@@ -24,8 +27,12 @@ class WEBAPI_API Pipe {
   /// Closes both ends.
   virtual ~Pipe();
 
-  /// Opens both ends. @return false, and the ends as they were, on failure
+  /// Opens both ends. Where root itself is kept to the system's limit for pipes, as in containers,
+  /// they are those of a local socket pair.
+  /// @return false, and the ends as they were, on failure
   bool Init();
+  /// As Init(), for any output rather than for messages: always a pipe, of the ordinary size.
+  bool InitStream();
   /// Keeps the read end alone. @param fd  0 or more: descriptor to put it on as well
   void ReadOnly(int fd);
   /// Keeps the write end alone. @param fd  0 or more: descriptor to put it on as well
@@ -41,6 +48,7 @@ class WEBAPI_API Pipe {
   bool ReadJson(Json::Value& value);
 
  private:
+  void Take(const int (&ends)[2]);
   bool HasRoomFor(size_t size);
 
   int readEnd_;

@@ -1,12 +1,15 @@
 #include "webapi/Pipe.h"
 
+#include <errno.h>
 #include <fcntl.h>
+#include <signal.h>
+#include <sys/socket.h>
 #include <unistd.h>
 
 #include <cstdint>
+#include <cstdlib>
 #include <cstring>
 #include <memory>
-#include <new>
 #include <string>
 
 #include "webapi/JsonHelper.h"
@@ -15,13 +18,72 @@
 namespace QELO {
 namespace {
 
-constexpr int kPageSize = 4096;
+/// More the kernel neither writes nor reads at once.
+constexpr size_t kLargestText = 0x7ffff000;
+
+/// While it lives, writing to a pipe that nobody reads any more fails instead of ending the
+/// process, which may have work left to do.
+class ToleratedBrokenPipe {
+ public:
+  ToleratedBrokenPipe() : former_(signal(SIGPIPE, SIG_IGN)) {}
+  ToleratedBrokenPipe(const ToleratedBrokenPipe&) = delete;
+  ToleratedBrokenPipe& operator=(const ToleratedBrokenPipe&) = delete;
+  ~ToleratedBrokenPipe() {
+    if (former_ != SIG_ERR) {
+      signal(SIGPIPE, former_);
+    }
+  }
+
+ private:
+  void (*former_)(int);
+};
 
 void closeEnd(int& end) {
   if (end >= 0) {
     close(end);
     end = -1;
   }
+}
+
+/// Opens a pipe away from the standard descriptors, which others replace, be they open or not.
+bool openPipe(int (&ends)[2]) {
+  if (pipe2(ends, O_CLOEXEC) != 0) {
+    return false;
+  }
+  for (int& end : ends) {
+    if (end <= STDERR_FILENO) {
+      const int low = end;
+      end = fcntl(low, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);
+      close(low);
+    }
+  }
+  if (ends[0] < 0 || ends[1] < 0) {
+    closeEnd(ends[0]);
+    closeEnd(ends[1]);
+    return false;
+  }
+  return true;
+}
+
+/// Puts a socket pair with that much room in the place of the descriptors of a pipe.
+bool replaceBySockets(const int (&ends)[2], int room) {
+  int sockets[2];
+  if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, sockets) != 0) {
+    return false;
+  }
+  // Refused to some: they wait for the reader when they write more than the default.
+  setsockopt(sockets[1], SOL_SOCKET, SO_SNDBUFFORCE, &room, sizeof room);
+  for (int i = 0; i < 2; ++i) {
+    dup3(sockets[i], ends[i], O_CLOEXEC);
+    close(sockets[i]);
+  }
+  return true;
+}
+
+/// One read of all the text: a pipe holds it, a socket is told to wait for it.
+ssize_t readText(int end, char* text, size_t length) {
+  const ssize_t count = TEMP_FAILURE_RETRY(recv(end, text, length, MSG_WAITALL));
+  return count < 0 && errno == ENOTSOCK ? TEMP_FAILURE_RETRY(read(end, text, length)) : count;
 }
 
 }  // namespace
@@ -34,16 +96,30 @@ Pipe::~Pipe() {
 
 bool Pipe::Init() {
   int ends[2];
-  if (pipe2(ends, O_CLOEXEC) != 0) {
+  if (!openPipe(ends)) {
     return false;
   }
+  // Now, since a child may give up the right to it before it knows how much it has to say.
+  if (geteuid() == 0 && fcntl(ends[1], F_SETPIPE_SZ, kPrivilegedRoom) < 0) {
+    replaceBySockets(ends, kPrivilegedRoom);  // else the pipe will do as it is
+  }
+  Take(ends);
+  return true;
+}
+
+bool Pipe::InitStream() {
+  int ends[2];
+  if (!openPipe(ends)) {
+    return false;
+  }
+  Take(ends);
+  return true;
+}
+
+void Pipe::Take(const int (&ends)[2]) {
+  Close();
   readEnd_ = ends[0];
   writeEnd_ = ends[1];
-  if (geteuid() == 0) {
-    // Now, since a child may give up the right to it before it knows how much it has to say.
-    fcntl(writeEnd_, F_SETPIPE_SZ, kPrivilegedCapacity);
-  }
-  return true;
 }
 
 void Pipe::ReadOnly(int fd) {
@@ -71,20 +147,22 @@ int Pipe::Read(char* buffer, int size) {
 }
 
 bool Pipe::HasRoomFor(size_t size) {
-  // The length may take a page of its own.
-  const size_t needed = size + 2 * kPageSize;
-  const int capacity = fcntl(writeEnd_, F_GETPIPE_SZ);
-  if (capacity < 0 || static_cast<size_t>(capacity) >= needed) {
-    return true;  // not a pipe: no limit to see to
+  const int room = fcntl(writeEnd_, F_GETPIPE_SZ);
+  if (room < 0) {
+    return size <= kLargestText;  // not a pipe
   }
-  return needed <= INT32_MAX && fcntl(writeEnd_, F_SETPIPE_SZ, static_cast<int>(needed)) >= 0;
+  const size_t page = static_cast<size_t>(sysconf(_SC_PAGESIZE));
+  const size_t needed = page + (size + page - 1) / page * page;  // the length has a page of its own
+  return static_cast<size_t>(room) >= needed ||
+         (needed <= kLargestText && fcntl(writeEnd_, F_SETPIPE_SZ, static_cast<int>(needed)) >= 0);
 }
 
 bool Pipe::WriteJson(const Json::Value& value) {
   const std::string text = JsonHelper::toString(value);
-  if (text.size() > UINT32_MAX || !HasRoomFor(text.size())) {
+  if (!HasRoomFor(text.size())) {
     return false;
   }
+  const ToleratedBrokenPipe tolerated;
   const uint32_t length = static_cast<uint32_t>(text.size());
   if (TEMP_FAILURE_RETRY(write(writeEnd_, &length, sizeof length)) != sizeof length) {
     return false;
@@ -103,14 +181,14 @@ bool Pipe::ReadJson(Json::Value& value) {
     WEBAPI_LOG(kSource, "error size=0");
     return false;
   }
-  // malloc'ed zero pages cost nothing until they are written: a child that lies about its length
-  // takes no memory.
+  // Zero pages cost nothing until they are written: a child that lies about its length takes no
+  // memory.
   const std::unique_ptr<char, void (*)(void*)> text(static_cast<char*>(calloc(length, 1)), free);
   if (text == nullptr) {
     WEBAPI_LOG(kSource, "new szBuf[%lu] failed", static_cast<unsigned long>(length));
     return false;
   }
-  const ssize_t count = TEMP_FAILURE_RETRY(read(readEnd_, text.get(), length));
+  const ssize_t count = readText(readEnd_, text.get(), length);
   if (count != static_cast<ssize_t>(length)) {
     WEBAPI_LOG(kSource, "read json %lu failed, got %lu", static_cast<unsigned long>(length),
                static_cast<unsigned long>(count));
