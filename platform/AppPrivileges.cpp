@@ -57,13 +57,14 @@ Match matchKey(const std::string& key, const Json::Value& value, const Caller& c
   if (!value.isString()) {
     return Match::kUnknown;
   }
+  const std::string text = JsonHelper::asString(value);
   if (key == "user") {
-    return value.asString() == caller.account.name ? Match::kYes : Match::kNo;
+    return text == caller.account.name ? Match::kYes : Match::kNo;
   }
   if (key == "group") {
-    return matchGroup(value.asString(), caller);
+    return matchGroup(text, caller);
   }
-  return key == "address" ? matchAddress(value.asString(), caller) : Match::kUnknown;
+  return key == "address" ? matchAddress(text, caller) : Match::kUnknown;
 }
 
 Match matchRule(const Json::Value& rule, const Caller& caller) {

@@ -5,6 +5,7 @@
 #include <charconv>
 #include <map>
 
+#include "platform/PlatformPaths.h"
 #include "platform/modules/tokens/TokenStore.h"
 #include "webapi/platform/Core.h"
 
@@ -50,6 +51,10 @@ bool parse(const std::string& text, T lowest, T highest, T& number) {
   const char* end = text.data() + text.size();
   const auto result = std::from_chars(text.data(), end, number);
   return result.ec == std::errc() && result.ptr == end && number >= lowest && number <= highest;
+}
+
+std::string databaseError(const TokenStore& store) {
+  return std::string(Paths::kTokenDatabase) + ": " + store.Error();
 }
 
 std::string timeText(int64_t seconds) {
@@ -106,8 +111,7 @@ std::string readEntry(const std::vector<std::string>& arguments, TokenStore::Ent
   return "";
 }
 
-ExitCode create(const std::vector<std::string>& arguments, const std::string& database,
-                const Streams& streams) {
+ExitCode create(const std::vector<std::string>& arguments, const Streams& streams) {
   TokenStore::Entry entry;
   const std::string wrong = readEntry(arguments, entry);
   if (!wrong.empty()) {
@@ -118,12 +122,12 @@ ExitCode create(const std::vector<std::string>& arguments, const std::string& da
   if (QELOUserGetUGID(entry.user.c_str(), &uid, &gid) != 0) {
     return failed(streams, "there is no user " + entry.user);
   }
-  QELOFSMkdirP(database.substr(0, database.rfind('/')).c_str(), 1, 0, static_cast<uid_t>(-1),
-               static_cast<gid_t>(-1), kStateDirMode);
+  QELOFSMkdirP(Paths::kStateDir, 1, 0, static_cast<uid_t>(-1), static_cast<gid_t>(-1),
+               kStateDirMode);
   TokenStore store;
   std::string token;
-  if (!store.Open(database.c_str(), true) || !store.Create(entry, token)) {
-    return failed(streams, database + ": " + store.Error());
+  if (!store.Open(Paths::kTokenDatabase, true) || !store.Create(entry, token)) {
+    return failed(streams, databaseError(store));
   }
   fprintf(streams.output, "%s\n", token.c_str());
   fprintf(streams.messages, "Token %lld of %s, good until: %s. It is not shown again.\n",
@@ -131,12 +135,12 @@ ExitCode create(const std::vector<std::string>& arguments, const std::string& da
   return kDone;
 }
 
-ExitCode list(const std::string& database, const Streams& streams) {
+ExitCode list(const Streams& streams) {
   TokenStore store;
   std::vector<TokenStore::Entry> entries;
-  const bool opened = store.Open(database.c_str(), false);
+  const bool opened = store.Open(Paths::kTokenDatabase, false);
   if ((!opened && !store.Missing()) || (opened && !store.List(entries))) {
-    return failed(streams, database + ": " + store.Error());
+    return failed(streams, databaseError(store));
   }
   for (const TokenStore::Entry& entry : entries) {
     fprintf(streams.output, "%lld\t%s\t%s\t%s\t%s\t%s\n", static_cast<long long>(entry.id),
@@ -146,24 +150,23 @@ ExitCode list(const std::string& database, const Streams& streams) {
   return kDone;
 }
 
-ExitCode revoke(const std::string& number, const std::string& database, const Streams& streams) {
+ExitCode revoke(const std::string& number, const Streams& streams) {
   int64_t id = 0;
   if (!parse<int64_t>(number, 1, INT64_MAX, id)) {
     return wrongUse(streams, "revoke takes the number of a token");
   }
   TokenStore store;
   bool found = false;
-  const bool opened = store.Open(database.c_str(), false);
+  const bool opened = store.Open(Paths::kTokenDatabase, false);
   if ((!opened && !store.Missing()) || (opened && !store.Revoke(id, found))) {
-    return failed(streams, database + ": " + store.Error());
+    return failed(streams, databaseError(store));
   }
   return found ? kDone : failed(streams, "there is no token " + number);
 }
 
 }  // namespace
 
-ExitCode run(const std::vector<std::string>& arguments, const std::string& database, FILE* output,
-             FILE* messages) {
+ExitCode run(const std::vector<std::string>& arguments, FILE* output, FILE* messages) {
   const Streams streams{output, messages};
   const std::string command = arguments.empty() ? "" : arguments[0];
   if (command == "--help" || command == "-h") {
@@ -171,13 +174,13 @@ ExitCode run(const std::vector<std::string>& arguments, const std::string& datab
     return kDone;
   }
   if (command == "create") {
-    return create(arguments, database, streams);
+    return create(arguments, streams);
   }
   if (command == "list" && arguments.size() == 1) {
-    return list(database, streams);
+    return list(streams);
   }
   if (command == "revoke" && arguments.size() == 2) {
-    return revoke(arguments[1], database, streams);
+    return revoke(arguments[1], streams);
   }
   return wrongUse(streams, command.empty() ? "a command is missing" : "wrong command");
 }

@@ -11,10 +11,8 @@ enum ExitCode : int { kDone = 0, kFailed = 1, kWrongUse = 2 };
 
 /// Runs one command of webapi-token.
 /// @param arguments  without the program's name
-/// @param database   absolute path of the token database; its directory is made when missing
 /// @param output     receives the token or the list
 /// @param messages   receives everything else
-ExitCode run(const std::vector<std::string>& arguments, const std::string& database, FILE* output,
-             FILE* messages);
+ExitCode run(const std::vector<std::string>& arguments, FILE* output, FILE* messages);
 
 }  // namespace QELO::TokenProgram

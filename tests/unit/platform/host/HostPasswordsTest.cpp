@@ -1,0 +1,106 @@
+#include <dlfcn.h>
+#include <gtest/gtest.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+
+#include <filesystem>
+#include <fstream>
+
+#include "platform/Passwords.h"
+#include "platform/modules/password_pam/PasswordPam.h"
+#include "tests/support/SyslogCapture.h"
+
+namespace {
+
+TEST(HostPasswords, MissingModuleCannotCheck) {
+  std::string name = "before";
+  SyslogCapture::Clear();
+  EXPECT_EQ(QELO::Platform::checkPassword("root", "x", name), -1);
+  EXPECT_EQ(name, "before");
+  EXPECT_EQ(SyslogCapture::Count("refused to load /nonexistent/password_pam.so"), 1);
+}
+
+/// The module with a PAM service of the test's own, so that the host's is not asked.
+class PamModule : public testing::Test {
+ protected:
+  void SetUp() override {
+    const std::string path = std::string(BUILT_MODULE_DIR) + "/" + kPasswordPamModule;
+    if (!std::filesystem::exists(path)) {
+      GTEST_SKIP() << "built without PAM";
+    }
+    void* module = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+    ASSERT_NE(module, nullptr) << dlerror();
+    check_ = reinterpret_cast<PasswordPamCheck>(dlsym(module, kPasswordPamCheck));
+    ASSERT_NE(check_, nullptr);
+    std::string pattern = (std::filesystem::temp_directory_path() / "pam-XXXXXX").string();
+    ASSERT_NE(mkdtemp(pattern.data()), nullptr);
+    dir_ = pattern;
+  }
+  void TearDown() override {
+    if (!dir_.empty()) {
+      std::filesystem::remove_all(dir_);
+    }
+  }
+
+  void Service(const std::string& text) { std::ofstream(dir_ + "/webapi") << text; }
+
+  /// A service whose authentication is a script that reads the password.
+  void ServiceByScript(const std::string& account) {
+    const std::string script = dir_ + "/check";
+    std::ofstream(script) << "#!/bin/sh\n[ \"$PAM_USER/$(tr -d '\\0')\" = anna/secret ]\n";
+    ASSERT_EQ(chmod(script.c_str(), 0700), 0);
+    // pam_exec's own failure is a system error, so it only decides which line comes next.
+    Service("auth [success=1 default=ignore] pam_exec.so expose_authtok quiet " + script +
+            "\nauth requisite pam_deny.so\nauth required pam_permit.so\n" + account);
+  }
+
+  int Check(const char* account, const char* password, int size = 64) {
+    user_[0] = '\0';
+    return check_(dir_.c_str(), account, password, user_, size);
+  }
+
+  PasswordPamCheck check_ = nullptr;
+  std::string dir_;
+  char user_[64] = "";
+};
+
+TEST_F(PamModule, PasswordReachesTheStackAndDecides) {
+  ServiceByScript("account required pam_permit.so\n");
+  EXPECT_EQ(Check("anna", "secret"), 1);
+  EXPECT_STREQ(user_, "anna");
+  EXPECT_EQ(Check("anna", "wrong"), 0);
+  EXPECT_EQ(Check("anna", ""), 0);
+  EXPECT_EQ(Check("otto", "secret"), 0);
+  EXPECT_STREQ(user_, "");
+}
+
+TEST_F(PamModule, AccountThatIsRefusedIsRefused) {
+  ServiceByScript("account required pam_deny.so\n");
+  EXPECT_NE(Check("anna", "secret"), 1);
+  ServiceByScript("account required pam_debug.so acct=acct_expired\n");
+  EXPECT_EQ(Check("anna", "secret"), 0);
+  ServiceByScript("account required pam_debug.so acct=new_authtok_reqd\n");
+  EXPECT_EQ(Check("anna", "secret"), 0);
+}
+
+TEST_F(PamModule, ServiceThatFailsCannotCheck) {
+  Service("auth required pam_debug.so auth=authinfo_unavail\naccount required pam_permit.so\n");
+  EXPECT_LT(Check("anna", "secret"), 0);
+}
+
+TEST_F(PamModule, UnknownUserIsRefused) {
+  Service("auth required pam_debug.so auth=user_unknown\naccount required pam_permit.so\n");
+  EXPECT_EQ(Check("anna", "secret"), 0);
+}
+
+TEST_F(PamModule, NameThatDoesNotFitCannotBeGiven) {
+  ServiceByScript("account required pam_permit.so\n");
+  EXPECT_LT(Check("anna", "secret", 4), 0);
+  EXPECT_EQ(Check("anna", "secret", 5), 1);
+}
+
+TEST_F(PamModule, MissingServiceLetsNobodyIn) {
+  EXPECT_NE(Check("anna", "secret"), 1);
+}
+
+}  // namespace
