@@ -1,0 +1,52 @@
+#include <unistd.h>
+
+#include <algorithm>
+#include <vector>
+
+#include "platform/PlatformLog.h"
+#include "platform/TaskAccess.h"
+#include "platform/TaskId.h"
+#include "webapi/platform/Task.h"
+
+using namespace QELO::Platform;
+
+namespace ARDO {
+
+TaskMgr::TaskMgr(const std::string& owner) : owner_(owner) {}
+
+Json::Value TaskMgr::getAllTaskId(const char* prefix) {
+  Json::Value ids(Json::arrayValue);
+  std::vector<ListedTask> tasks;
+  TaskStores* stores = openTaskStores();
+  if (stores == nullptr) {
+    return ids;
+  }
+  for (const uid_t store : stores->Stores()) {
+    if (mayHoldTasksOf(store, owner_)) {
+      stores->List(store, owner_, prefix != nullptr ? prefix : "", tasks);
+    }
+  }
+  std::stable_sort(tasks.begin(), tasks.end(), [](const ListedTask& left, const ListedTask& right) {
+    return left.created < right.created;
+  });
+  for (const ListedTask& task : tasks) {
+    ids.append(task.id);
+  }
+  return ids;
+}
+
+std::string TaskUtil::getUniqueID(const std::string&, const std::string& prefix) {
+  if (!isTaskPrefix(prefix)) {
+    PLATFORM_LOG("TaskMgr.cpp",
+                 "a task id's prefix holds up to %zu letters, digits, '.', '_' and '-'",
+                 kTaskPrefixLength);
+    return "";
+  }
+  return makeTaskId(prefix, geteuid());
+}
+
+bool TaskUtil::checkTaskExists(const std::string& owner, const std::string& taskId) {
+  return Task(owner, taskId).reload();
+}
+
+}  // namespace ARDO
