@@ -10,8 +10,8 @@
 
 extern "C" WEBAPI_API int webapiPasswordVerify(const char* hash, const char* password) {
   const auto work = std::make_unique<crypt_data>();  // 32 KiB, zeroed
-  const char* result = crypt_r(password, hash, work.get());
-  const bool known = result != nullptr && result[0] != '*';
+  const char* result = crypt_rn(password, hash, work.get(), sizeof *work);
+  const bool known = result != nullptr;
   const bool matches = known && QELO::Platform::equalSecrets(result, hash);
   explicit_bzero(work.get(), sizeof *work);
   return known ? static_cast<int>(matches) : -1;

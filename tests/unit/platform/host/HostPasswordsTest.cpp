@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 #include <stdlib.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <filesystem>
 #include <fstream>
@@ -100,7 +101,8 @@ TEST_F(PamModule, NameThatDoesNotFitCannotBeGiven) {
 }
 
 TEST_F(PamModule, MissingServiceLetsNobodyIn) {
-  EXPECT_NE(Check("anna", "secret"), 1);
+  // In a process of its own: libpam 1.5 loses memory when it finds no service.
+  EXPECT_EXIT(_exit(Check("anna", "secret") == 1 ? 1 : 0), testing::ExitedWithCode(0), "");
 }
 
 }  // namespace
