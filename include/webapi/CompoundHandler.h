@@ -58,7 +58,8 @@ class WEBAPI_API CompoundHandler {
  private:
   int RefuseEntry(int code, const char* message, unsigned index);
   int ForkEntry(unsigned index);
-  [[noreturn]] void RunChild(Pipe& pipe, int parent);
+  /// An exception must end the child here: the code around the caller is the parent's.
+  [[noreturn]] void RunChild(Pipe& pipe, int parent) noexcept;
   void SendAnswer(Pipe& pipe);
 
   APIRequest* request_;

@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -31,6 +32,19 @@ void note(const char* name, const Args&... args) {
   [[maybe_unused]] const char* separator = "";
   ((call += separator, call += args, separator = ", "), ...);
   fake().calls.push_back(call + ")");
+}
+
+pid_t forkAsTold() {
+  fflush(nullptr);
+  if (fake().forkResult != -2) {
+    return fake().forkResult;
+  }
+  if (fake().forksLeft == 0) {
+    errno = EAGAIN;
+    return -1;
+  }
+  fake().forksLeft -= fake().forksLeft > 0 ? 1 : 0;
+  return fork();
 }
 
 int fill(const std::string& text, char* buffer, int size) {
@@ -99,18 +113,21 @@ int QELOFSMkdirP(const char* path, int first, int second, uid_t uid, gid_t gid, 
 
 pid_t QLIBCProcFork(void) {
   note("QLIBCProcFork");
-  fflush(nullptr);
-  return fake().forkResult == -2 ? fork() : fake().forkResult;
+  return forkAsTold();
 }
 
 pid_t QLIBCProcForkEx(int flags) {
   note("QLIBCProcForkEx", std::to_string(flags));
-  fflush(nullptr);
-  return fake().forkResult == -2 ? fork() : fake().forkResult;
+  return forkAsTold();
 }
 
 int QELOUserGetUGID(const char* name, uid_t* uid, gid_t* gid) {
   return fake().userGetUGID ? fake().userGetUGID(name, uid, gid) : -1;
+}
+
+int QLIBCINFOSetKeyValue(const char* key, const char* value) {
+  note("QLIBCINFOSetKeyValue", key, value);
+  return fake().setKeyValue ? fake().setKeyValue(key, value) : 0;
 }
 
 int QLIBGroupIsAdminGroupMem(const char* user, int) {

@@ -21,11 +21,13 @@ struct FakePlatform {
   int lockResult = 0;
   int mkdirResult = 0;
   pid_t forkResult = -2;  ///< -2: really fork
+  int forksLeft = -1;     ///< after so many really made forks the next fail; -1: no limit
   std::function<int(const std::string&, uid_t*, gid_t*)> userGetUGID;
   int isAdmin = 0;
   int appPriv = 1;
   std::string preferenceDir = "/fake/preferences";  ///< "": the look-up fails
   int timeoutSetting = 900;
+  std::function<int(const std::string&, const std::string&)> setKeyValue;  ///< unset: 0
 
   // CGI library
   std::string language = "enu";

@@ -1,6 +1,7 @@
 #include "tests/support/SyslogCapture.h"
 
 #include <syslog.h>
+#include <unistd.h>
 
 #include <cstdarg>
 #include <cstdio>
@@ -13,6 +14,11 @@ std::vector<SyslogCapture::Message>& SyslogCapture::Messages() {
 std::string& SyslogCapture::Identity() {
   static std::string identity;
   return identity;
+}
+
+int& SyslogCapture::Copy() {
+  static int descriptor = -1;
+  return descriptor;
 }
 
 void SyslogCapture::Clear() {
@@ -33,6 +39,10 @@ void collect(int priority, const char* format, va_list args) {
   char text[4096];
   vsnprintf(text, sizeof text, format, args);  // NOLINT: "%m" is glibc's here as in syslog
   SyslogCapture::Messages().push_back({priority, text});
+  if (SyslogCapture::Copy() >= 0) {
+    const std::string line = std::string(text) + "\n";
+    [[maybe_unused]] const ssize_t count = write(SyslogCapture::Copy(), line.data(), line.size());
+  }
 }
 
 }  // namespace

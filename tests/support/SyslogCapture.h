@@ -13,6 +13,9 @@ struct SyslogCapture {
   /// The identity of the last openlog().
   static std::string& Identity();
   static void Clear();
+  /// Where messages are written as well, a line each, so that those of child processes are seen;
+  /// -1: nowhere.
+  static int& Copy();
   /// How many messages contain this text.
   static int Count(const std::string& part);
 };

@@ -27,8 +27,12 @@ constexpr useconds_t kParentPollMicroseconds = 200000;
 /// waits for the parent's end must not hold it.
 void releaseStandardDescriptors() {
   const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-  for (int descriptor = STDIN_FILENO; descriptor <= STDERR_FILENO && null >= 0; ++descriptor) {
-    dup2(null, descriptor);
+  for (int descriptor = STDIN_FILENO; descriptor <= STDERR_FILENO; ++descriptor) {
+    if (null < 0) {
+      close(descriptor);
+    } else {
+      dup2(null, descriptor);
+    }
   }
 }
 
@@ -53,6 +57,8 @@ int CompoundHandler::CompoundProcessEntry(const Json::Value& entry, unsigned ind
   Json::Value params;
   params["postParam"] = entry;
   entryRequest_->InitParam(params, true);
+  // An entry that ends without an answer must not show the one before it.
+  entryResponse_->SetError(WEBAPI_ERR_NO_ANSWER);
   if (stopWhenError_ && hasFail_) {
     return RefuseEntry(WEBAPI_ERR_COMPOUND_STOPPED, "compound stop when error.", index);
   }
@@ -86,7 +92,6 @@ int CompoundHandler::ForkEntry(unsigned index) {
   }
   if (parallel_) {
     // Stands until the child has answered, and for good when it never does.
-    entryResponse_->SetError(WEBAPI_ERR_NO_ANSWER);
     PrepareCompundResponse(index);
   } else {
     PrepareCompundResponseFromChild(child);
@@ -108,7 +113,7 @@ bool CompoundHandler::ProcessFork(Child& child) {
   const pid_t parent = getpid();
   const pid_t pid = QLIBCProcForkEx(kForkFlags);
   if (pid < 0) {
-    child.first->Close();
+    child.first->Close();  // with the write end open, reading would wait for ever
     return false;
   }
   if (pid == 0) {
@@ -118,7 +123,15 @@ bool CompoundHandler::ProcessFork(Child& child) {
   return true;
 }
 
-void CompoundHandler::RunChild(Pipe& pipe, pid_t parent) {
+void CompoundHandler::RunChild(Pipe& pipe, pid_t parent) noexcept {
+  // Other children's answers are none of ours, and neither are callbacks of entries that ran
+  // before the fork: the parent runs those.
+  for (const Child& child : children_) {
+    if (child.first != &pipe) {
+      child.first->Close();
+    }
+  }
+  entryResponse_->GetCallbackFuncs()->clear();
   pipe.WriteOnly(-1);
   runner_->Process(entryRequest_.get(), entryResponse_.get());
   SendAnswer(pipe);
@@ -148,9 +161,10 @@ void CompoundHandler::SendAnswer(Pipe& pipe) {
 
 void CompoundHandler::PrepareCompundResponseFromChild(Child& child) {
   Json::Value message;
-  if (child.first->ReadJson(message)) {
-    data_["result"][child.second] = JsonHelper::member(message, "result");
-    info_[child.second] = JsonHelper::member(message, "info");
+  if (child.first->ReadJson(message) && JsonHelper::member(message, "result").isObject() &&
+      JsonHelper::member(message, "info").isObject()) {
+    data_["result"][child.second].swap(message["result"]);
+    info_[child.second].swap(message["info"]);
     if (JsonHelper::asInt(JsonHelper::member(info_[child.second], "error")) != 0) {
       hasFail_ = true;
     }

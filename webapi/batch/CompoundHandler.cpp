@@ -11,6 +11,7 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/Pipe.h"
 #include "webapi/model/Log.h"
+#include "webapi/runner/ProcessGuards.h"
 
 namespace QELO {
 namespace {
@@ -71,10 +72,13 @@ int CompoundHandler::PrepareNewCompReqResp() {
     return WEBAPI_ERR_NO_ANSWER;
   }
   Json::Value environment = request_->GetEnv("");
-  if (environment.isObject()) {
-    environment.removeMember("QUERY_STRING");
+  if (!environment.isObject()) {
+    environment = Json::Value(Json::objectValue);
   }
+  environment.removeMember("QUERY_STRING");
   environment["REQUEST_METHOD"] = "POST";
+  // The copy has the outer request's environment, into which this would only be merged.
+  entryRequest_->Serialize()["environ"] = Json::Value(Json::objectValue);
   entryRequest_->InitEnv(environment);
   entryRequest_->InitParam(asPostParameters(Json::Value(Json::objectValue)), false);
   entryResponse_.reset(new (std::nothrow) APIResponse(entryRequest_.get()));
@@ -86,6 +90,9 @@ int CompoundHandler::PrepareNewCompReqResp() {
 }
 
 void CompoundHandler::PreloadLibs() {
+  // A library's constructors are foreign code.
+  const WorkingDirectory directory;
+  const StandardStreams shut(true, true);
   PreloadLibs(*entries_, true);
 }
 

@@ -21,6 +21,11 @@ WEBAPI_API int QLIBCFileUnlockByFile(int fd);
 /// Whether a file of `key="value"` lines gives `key` this value. @return 1 yes, 0 no
 WEBAPI_API int QLIBCFileCheckKeyValue(const char* file, const char* key, const char* value,
                                       int ignoreCase);
+/// Sets a key of the system information file, /etc/qeloinfo.conf, which keeps its other lines.
+/// @param key    letters, digits and "_" "-" "."
+/// @param value  one line of text that does not hold both kinds of quotes
+/// @return 0 on success, a negative value on failure
+WEBAPI_API int QLIBCINFOSetKeyValue(const char* key, const char* value);
 /// Creates a directory and its parents.
 /// @param uid, gid  owner of what is created, -1: as it comes
 /// @param mode      search permission is added wherever it grants reading
