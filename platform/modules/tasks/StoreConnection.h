@@ -39,8 +39,6 @@ class StoreConnection {
     TaskDatabase& Database() { return *connection_.database_; }
     /// Tells those who watch the store that it has changed.
     void Announce();
-    /// The next use opens the store anew.
-    void GiveUp() { connection_.Drop(); }
     const std::string& Error() const { return error_; }
 
    private:

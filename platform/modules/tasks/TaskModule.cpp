@@ -47,11 +47,7 @@ class DatabaseStores final : public TaskStores {
   TaskResult Change(uid_t store, bool create,
                     const std::function<TaskResult(TaskDatabase&)>& operation);
   /// What a use of the store came to; failures are logged.
-  TaskResult End(Use& use, uid_t store, TaskResult result);
-  void Log(uid_t store, const std::string& error) {
-    PLATFORM_LOG(kSource, "cannot use the task store %s/%u [%s]", settings_.directory, store,
-                 error.c_str());
-  }
+  TaskResult End(Use& use, uid_t store, TaskResult result) const;
 
   TaskStoreSettings settings_;
 };
@@ -128,13 +124,11 @@ TaskResult DatabaseStores::Change(uid_t store, bool create,
   return End(use, store, result);
 }
 
-TaskResult DatabaseStores::End(Use& use, uid_t store, TaskResult result) {
+TaskResult DatabaseStores::End(Use& use, uid_t store, TaskResult result) const {
   if (result == TaskResult::kFailed) {
     const bool opened = use.State() == TaskResult::kDone;
-    Log(store, opened ? use.Database().Error() : use.Error());
-    if (opened) {
-      use.GiveUp();
-    }
+    PLATFORM_LOG(kSource, "cannot use the task store %s/%u [%s]", settings_.directory, store,
+                 opened ? use.Database().Error().c_str() : use.Error().c_str());
   }
   return result;
 }

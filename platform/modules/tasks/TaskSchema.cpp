@@ -139,6 +139,9 @@ bool hasOurSchema(sqlite3* database, std::string& error) {
 bool prepare(sqlite3* database, std::string& error) {
   sqlite3_db_config(database, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
   sqlite3_db_config(database, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
+  // The tables are looked at once; code that is slipped in later must not run.
+  sqlite3_db_config(database, SQLITE_DBCONFIG_ENABLE_TRIGGER, 0, nullptr);
+  sqlite3_db_config(database, SQLITE_DBCONFIG_ENABLE_VIEW, 0, nullptr);
   // The last one to leave would wait for the disk; who comes next finds the log as it is.
   sqlite3_db_config(database, SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
   return execute(database,
@@ -171,7 +174,7 @@ sqlite3* openTaskDatabase(const StoreDirectory& directory, uid_t store, bool cre
 
 DatabaseFile findDatabaseFile(const StoreDirectory& directory) {
   struct stat info {};
-  return fstatat(directory.Fd(), kTaskDatabase, &info, AT_SYMLINK_NOFOLLOW) == 0
+  return lstat((directory.Path() + "/" + kTaskDatabase).c_str(), &info) == 0
              ? DatabaseFile{info.st_dev, info.st_ino}
              : DatabaseFile{};
 }

@@ -19,7 +19,7 @@ inline constexpr char kTaskDatabase[] = "tasks.db";
 sqlite3* openTaskDatabase(const StoreDirectory& directory, uid_t store, bool create, bool& missing,
                           std::string& error);
 
-/// Which file stands there now; two that are equal are one file.
+/// Which file has the database's path now; two that are equal are one file.
 struct DatabaseFile {
   dev_t device = 0;
   ino_t inode = 0;
