@@ -5,8 +5,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <array>
 #include <filesystem>
-#include <vector>
 
 #include "tests/support/SyslogCapture.h"
 #include "tests/unit/platform/PrivateRoot.h"
@@ -208,13 +208,12 @@ TEST_F(LoginLimiter, CountThatCannotBeWrittenDoesNotGoOn) {
 
 TEST_F(LoginLimiter, ProcessesTogetherGetNoMoreThanTheLimit) {
   Set({{"login_attempts", "50"}, {"login_attempts_per_address", "1000"}});
-  std::vector<pid_t> children;
-  for (int i = 0; i < 16; ++i) {
-    const pid_t child = fork();
+  std::array<pid_t, 16> children{};
+  for (pid_t& child : children) {
+    child = fork();
     if (child == 0) {
       _exit(Allowed(10, kAddress, "alice"));
     }
-    children.push_back(child);
   }
   int allowed = 0;
   for (const pid_t child : children) {

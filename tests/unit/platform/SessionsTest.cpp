@@ -1,6 +1,8 @@
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <filesystem>
 #include <set>
 
@@ -12,7 +14,31 @@
 
 namespace {
 
+bool noRandomBytes = false;
+
+}  // namespace
+
+// Takes the place of the C library's for the whole test program.
+extern "C" __attribute__((visibility("default"))) ssize_t getrandom(void* bytes, size_t size,
+                                                                    unsigned flags) noexcept {
+  if (noRandomBytes) {
+    errno = ENOSYS;
+    return -1;
+  }
+  return syscall(SYS_getrandom, bytes, size, flags);
+}
+
+namespace {
+
 using Sessions = SessionFixture;
+
+TEST_F(Sessions, CreateFailsAndLogsWithoutRandomBytes) {
+  noRandomBytes = true;
+  EXPECT_EQ(TryCreate("alice", kAddress), -1);
+  noRandomBytes = false;
+  EXPECT_EQ(SyslogCapture::Count("no random bytes [Function not implemented]"), 1);
+  EXPECT_EQ(CountFiles("run/webapi/sessions"), 0);
+}
 
 TEST_F(Sessions, CreateGivesTwoSecretsOf43Characters) {
   char id[QELO_SESSION_ID_LENGTH + 1];

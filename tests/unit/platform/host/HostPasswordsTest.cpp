@@ -1,5 +1,6 @@
 #include <dlfcn.h>
 #include <gtest/gtest.h>
+#include <pwd.h>
 #include <stdlib.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -13,12 +14,74 @@
 
 namespace {
 
-TEST(HostPasswords, MissingModuleCannotCheck) {
-  std::string name = "before";
-  SyslogCapture::Clear();
-  EXPECT_EQ(QELO::Platform::checkPassword("root", "x", name), -1);
-  EXPECT_EQ(name, "before");
-  EXPECT_EQ(SyslogCapture::Count("refused to load /nonexistent/password_pam.so"), 1);
+class HostPasswords : public testing::Test {
+ protected:
+  void SetUp() override {
+    SyslogCapture::Clear();
+    ASSERT_EQ(chmod(Module().c_str(), 0755), 0);
+  }
+
+  static std::string Module() { return std::string(FAKE_MODULE_DIR) + "/" + kPasswordPamModule; }
+
+  /// The check's result when PAM answers like this.
+  int Check(int result, const char* user) {
+    setenv("FAKE_PAM_RESULT", std::to_string(result).c_str(), 1);
+    setenv("FAKE_PAM_USER", user, 1);
+    name_ = "before";
+    return QELO::Platform::checkPassword("any", "password", name_);
+  }
+
+  /// An account of the host that may log in, or "".
+  static std::string UserWithShell() {
+    setpwent();
+    const passwd* entry = getpwent();
+    while (entry != nullptr && std::string(entry->pw_shell).find("sh") == std::string::npos) {
+      entry = getpwent();
+    }
+    return entry != nullptr ? entry->pw_name : "";
+  }
+
+  std::string name_;
+};
+
+TEST_F(HostPasswords, NameIsTheOneThatPamGives) {
+  const std::string user = UserWithShell();
+  if (user.empty()) {
+    GTEST_SKIP() << "no account of this host has a shell";
+  }
+  EXPECT_EQ(Check(1, user.c_str()), 1);
+  EXPECT_EQ(name_, user);
+}
+
+TEST_F(HostPasswords, RefusalIsARefusal) {
+  EXPECT_EQ(Check(0, "root"), 0);
+  EXPECT_EQ(name_, "before");
+  EXPECT_EQ(SyslogCapture::Count(""), 0);
+}
+
+TEST_F(HostPasswords, NameThatTheHostDoesNotKnowIsRefused) {
+  EXPECT_EQ(Check(1, "nobody-of-this-name"), 0);
+  EXPECT_EQ(Check(1, ""), 0);
+}
+
+TEST_F(HostPasswords, AccountWithoutShellIsRefusedThoughPamLetsItIn) {
+  if (getpwnam("daemon") == nullptr) {
+    GTEST_SKIP() << "the host has no account without a shell that is known here";
+  }
+  EXPECT_EQ(Check(1, "daemon"), 0);
+  EXPECT_EQ(name_, "before");
+}
+
+TEST_F(HostPasswords, FailureOfPamIsLogged) {
+  EXPECT_EQ(Check(-5, "root"), -1);
+  EXPECT_EQ(name_, "before");
+  EXPECT_EQ(SyslogCapture::Count("PAM cannot check a password [-5]"), 1);
+}
+
+TEST_F(HostPasswords, ModuleThatOthersMayWriteCannotCheck) {
+  ASSERT_EQ(chmod(Module().c_str(), 0757), 0);
+  EXPECT_EQ(Check(1, "root"), -1);
+  EXPECT_EQ(SyslogCapture::Count("refused to load " + Module()), 1);
 }
 
 /// The module with a PAM service of the test's own, so that the host's is not asked.
