@@ -36,6 +36,23 @@ else()
 endif()
 set(WEBAPI_DESCRIPTION_DIR ${CMAKE_BINARY_DIR}/descriptions)
 
+# A shared library of a private root is known by its absolute path: whoever links it finds it at
+# once. A search path would make the loader try two dozen directories for each library, which costs
+# a tenth of a CGI process. Installed libraries have ordinary names, which the loader has cached.
+if(WEBAPI_ROOT_PREFIX)
+  set(CMAKE_SKIP_RPATH ON)
+endif()
+function(webapi_shared_library target)
+  # Calls within a library are bound when it is linked, not looked up when it is loaded.
+  target_link_options(${target} PRIVATE -Wl,-Bsymbolic-functions)
+  set_target_properties(${target} PROPERTIES VERSION ${PROJECT_VERSION}
+                                             SOVERSION ${PROJECT_VERSION_MAJOR})
+  if(WEBAPI_ROOT_PREFIX)
+    set_target_properties(${target} PROPERTIES NO_SONAME ON)
+    target_link_options(${target} PRIVATE -Wl,-soname,$<TARGET_FILE:${target}>)
+  endif()
+endfunction()
+
 # webapi_folder(NAME FOLDER): the folder's sources as one OBJECT library, from which both the
 # shared library and the unit tests are linked.
 function(webapi_folder name folder)

@@ -26,6 +26,9 @@ enum class Lookup {
 /// An output is unchanged unless the result is kFound.
 Lookup findAccount(const std::string& name, Account& account);
 Lookup findGroup(const std::string& name, gid_t& gid);
+/// Whether the group is the account's primary one or lists it. @return kFound, kAbsent (also when
+/// there is no such group) or kFailed
+Lookup findMembership(const Account& account, const std::string& groupName);
 /// The primary group and the supplementary ones. @return kFound or kFailed
 Lookup findGroupsOf(const Account& account, std::vector<gid_t>& groups);
 

@@ -1,24 +1,19 @@
 #include "platform/Accounts.h"
 
-#include <algorithm>
-
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
 
 int isAdministrator(const Settings& settings, const Account& account) {
-  gid_t administrators = 0;
-  const std::string name = settings.Get("admin_group", "administrators");
-  const Lookup lookup = findGroup(name, administrators);
-  if (lookup != Lookup::kFound) {
-    return lookup == Lookup::kAbsent ? 0 : -1;
+  switch (findMembership(account, settings.Get("admin_group", "administrators"))) {
+    case Lookup::kFound:
+      return 1;
+    case Lookup::kAbsent:
+      return 0;
+    default:
+      return -1;
   }
-  std::vector<gid_t> groups;
-  if (findGroupsOf(account, groups) != Lookup::kFound) {
-    return -1;
-  }
-  return std::find(groups.begin(), groups.end(), administrators) != groups.end() ? 1 : 0;
 }
 
 bool isBarredFromLogin(const Account& account) {

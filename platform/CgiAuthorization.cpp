@@ -68,23 +68,50 @@ bool hasToken(const Session& session) {
   return token != nullptr && equalSecrets(token, session.token);
 }
 
-/// @return whether the session has this option
-bool sessionOption(const std::string& name, const std::string& id, const Session& session,
-                   std::string& value) {
-  if (name == "timeout") {
-    value = std::to_string(Settings().SessionTimeout());
-  } else if (name == "istimeout") {
-    value = session.SecondsLeft(Settings().SessionTimeout()) < 0 ? "1" : "0";
-  } else if (name == "skipcheckip") {
-    value = session.skipCheckIp ? "1" : "0";
-  } else if (name == "sessfile") {
-    value = std::string(Paths::kSessionDir) + "/" + id;
-  } else if (name == "app") {
-    value = session.application;
-  } else if (name == "webapi") {
-    value = session.webApi;
+/// Keeps in the context what callers ask next, so that the record is read once.
+void remember(const Session& session, bool timedOut, QeloCgiContext& context) {
+  ContextArea area = loadArea(context);
+  area.known = 1;
+  area.timedOut = timedOut ? 1 : 0;
+  area.skipCheckIp = session.skipCheckIp ? 1 : 0;
+  area.hasMore = session.application.empty() && session.webApi.empty() ? 0 : 1;
+  storeArea(area, context);
+}
+
+/// Reads the flags of a context whose session was not checked yet.
+bool learn(const std::string& id, QeloCgiContext& context) {
+  Session session;
+  if (SessionStore().Read(id, session) != SessionStore::Result::kGood) {
+    return false;
   }
-  return !value.empty();
+  remember(session, session.SecondsLeft(Settings().SessionTimeout()) < 0, context);
+  return true;
+}
+
+std::string storedOption(const std::string& name, const std::string& id) {
+  Session session;
+  if (SessionStore().Read(id, session) != SessionStore::Result::kGood) {
+    return "";
+  }
+  return name == "app" ? session.application : session.webApi;
+}
+
+/// An option of the session; "" when it has no such option.
+std::string sessionOption(const std::string& name, const std::string& id, const ContextArea& area) {
+  if (name == "timeout") {
+    return std::to_string(Settings().SessionTimeout());
+  }
+  if (name == "istimeout") {
+    return area.timedOut != 0 ? "1" : "0";
+  }
+  if (name == "skipcheckip") {
+    return area.skipCheckIp != 0 ? "1" : "0";
+  }
+  if (name == "sessfile") {
+    return std::string(Paths::kSessionDir) + "/" + id;
+  }
+  const bool isStored = name == "app" || name == "webapi";
+  return isStored && area.hasMore != 0 ? storedOption(name, id) : "";
 }
 
 }  // namespace
@@ -112,6 +139,7 @@ int QeloCgiIsAuthorizedEx(QeloCgiContext* context, const QeloCgiAuthFlags* flags
     return kOtherAddress;
   }
   const bool timedOut = session.SecondsLeft(settings.SessionTimeout()) < 0;
+  remember(session, timedOut, *context);
   if (timedOut && allowTimeout == 0) {
     return kTimedOut;
   }
@@ -129,13 +157,14 @@ int QeloCgiGetOption(QeloCgiContext* context, const char* name, char* value, int
   if (context == nullptr) {
     return 0;
   }
-  const ContextArea area = loadArea(*context);
+  ContextArea area = loadArea(*context);
   const std::string id(area.id, strnlen(area.id, sizeof area.id));
-  Session session;
-  std::string text;
-  const bool found = SessionStore().Read(id, session) == SessionStore::Result::kGood &&
-                     sessionOption(name, id, session, text) && fillBuffer(text, value, size);
-  return found ? 1 : 0;
+  if (area.known == 0 && !learn(id, *context)) {
+    return 0;
+  }
+  area = loadArea(*context);
+  const std::string text = sessionOption(name, id, area);
+  return !text.empty() && fillBuffer(text, value, size) ? 1 : 0;
 }
 
 }  // extern "C"

@@ -15,7 +15,11 @@ struct ContextArea {
   char id[kSecretLength + 1];
   State state;
   unsigned char language;  ///< number in the table of languages, counted from 1; 0: none asked for
-  unsigned char reserved[6];
+  unsigned char known;     ///< the flags below tell of the session, whose record was read
+  unsigned char timedOut;
+  unsigned char skipCheckIp;
+  unsigned char hasMore;  ///< the record has options that stand nowhere but there
+  unsigned char reserved[2];
 };
 
 inline constexpr size_t kContextAreaOffset = sizeof(void*);

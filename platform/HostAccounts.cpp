@@ -1,6 +1,7 @@
 #include <grp.h>
 #include <pwd.h>
 
+#include <algorithm>
 #include <cerrno>
 
 #include "platform/AccountDatabase.h"
@@ -42,6 +43,20 @@ Lookup findAccount(const std::string& name, Account& account) {
 
 Lookup findGroup(const std::string& name, gid_t& gid) {
   return askByName<group>(name, getgrnam_r, [&](const group& entry) { gid = entry.gr_gid; });
+}
+
+Lookup findMembership(const Account& account, const std::string& groupName) {
+  gid_t gid = 0;
+  const Lookup lookup = findGroup(groupName, gid);
+  if (lookup != Lookup::kFound) {
+    return lookup;
+  }
+  std::vector<gid_t> groups;
+  if (findGroupsOf(account, groups) != Lookup::kFound) {
+    return Lookup::kFailed;
+  }
+  return std::find(groups.begin(), groups.end(), gid) != groups.end() ? Lookup::kFound
+                                                                      : Lookup::kAbsent;
 }
 
 Lookup findGroupsOf(const Account& account, std::vector<gid_t>& groups) {

@@ -6,6 +6,17 @@
 #include "platform/PlatformPaths.h"
 
 namespace QELO::Platform {
+namespace {
+
+bool lists(const group& entry, const std::string& name) {
+  char** member = entry.gr_mem;
+  while (*member != nullptr && name != *member) {
+    ++member;
+  }
+  return *member != nullptr;
+}
+
+}  // namespace
 
 Lookup findAccount(const std::string& name, Account& account) {
   bool found = false;
@@ -37,14 +48,26 @@ Lookup findGroup(const std::string& name, gid_t& gid) {
   return found ? Lookup::kFound : Lookup::kAbsent;
 }
 
+Lookup findMembership(const Account& account, const std::string& groupName) {
+  bool found = false;
+  const bool readable = readDatabaseFile<group>(Paths::kGroup, fgetgrent_r, [&](group& entry) {
+    if (groupName != entry.gr_name) {
+      return false;
+    }
+    found = entry.gr_gid == account.gid || lists(entry, account.name);
+    return true;
+  });
+  if (!readable) {
+    return Lookup::kFailed;
+  }
+  return found ? Lookup::kFound : Lookup::kAbsent;
+}
+
 Lookup findGroupsOf(const Account& account, std::vector<gid_t>& groups) {
   std::vector<gid_t> found{account.gid};
   const bool readable = readDatabaseFile<group>(Paths::kGroup, fgetgrent_r, [&](group& entry) {
-    for (char** member = entry.gr_mem; *member != nullptr; ++member) {
-      if (account.name == *member && entry.gr_gid != account.gid) {
-        found.push_back(entry.gr_gid);
-        break;
-      }
+    if (entry.gr_gid != account.gid && lists(entry, account.name)) {
+      found.push_back(entry.gr_gid);
     }
     return false;
   });

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <memory>
 #include <string>
 #include <string_view>
 
@@ -8,7 +9,10 @@
 namespace QELO::Platform {
 
 /// The platform's settings: /etc/qeloinfo.conf, and for a key that is not there
-/// /etc.defaults/qeloinfo.conf. Read at construction.
+/// /etc.defaults/qeloinfo.conf.
+///
+/// A process keeps what it read of a file until the file changes: one request asks for settings a
+/// dozen times. Each object sees one state of the first file.
 class Settings {
  public:
   Settings();
@@ -24,8 +28,7 @@ class Settings {
   bool TokenEnabled() const { return GetSwitch("enable_token", true); }
 
  private:
-  KeyValueFile own_;
-  KeyValueFile defaults_;
+  std::shared_ptr<const KeyValueFile> own_;
 };
 
 }  // namespace QELO::Platform

@@ -34,6 +34,10 @@ WEBAPI_API bool fromFile(const std::string& path, Json::Value& value);
 /// and a failure leaves the old file. The file keeps the mode of the one replaced, else 0600.
 WEBAPI_API bool toFile(const std::string& path, const Json::Value& value);
 
+/// The member `key`, or null when `value` is no object or has no such member. It lives as long as
+/// `value` is unchanged.
+WEBAPI_API const Json::Value* find(const Json::Value& value, const std::string& key);
+
 /// The member `key`, or a null value when `value` is no object or has no such member. The
 /// reference lives as long as `value` is unchanged.
 WEBAPI_API const Json::Value& member(const Json::Value& value, const std::string& key);

@@ -9,7 +9,6 @@
 #include <cstdlib>
 #include <exception>
 #include <limits>
-#include <memory>
 #include <utility>
 
 #include "webapi/json/JsonSyntax.h"
@@ -21,14 +20,16 @@ bool parse(const std::string& text, bool comments, Json::Value& value) {
   if (!isJsonText(text, comments, kMaxDepth)) {
     return false;
   }
-  Json::CharReaderBuilder builder;
-  builder["collectComments"] = false;
-  builder["allowComments"] = comments;
-  builder["stackLimit"] = kMaxDepth + 1;  // the innermost value counts there, too
+  // The newer reader wants its settings as a JSON object, which costs more to make than a request's
+  // texts cost to read. What this one is laxer in, the check above has refused.
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
+  Json::Reader reader(Json::Features::all());
+#pragma GCC diagnostic pop
+  const size_t start = text.starts_with(kByteOrderMark) ? kByteOrderMark.size() : 0;
   try {
-    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
     Json::Value parsed;
-    if (!reader->parse(text.data(), text.data() + text.size(), &parsed, nullptr)) {
+    if (!reader.parse(text.data() + start, text.data() + text.size(), parsed, false)) {
       return false;
     }
     value.swap(parsed);
@@ -109,14 +110,6 @@ T integerForm(const Json::Value& value, T fallback) {
 
 }  // namespace
 
-std::string toString(const Json::Value& value) {
-  Json::StreamWriterBuilder builder;
-  builder["indentation"] = "";
-  builder["emitUTF8"] = true;
-  builder["commentStyle"] = "None";
-  return Json::writeString(builder, value);
-}
-
 bool fromString(const std::string& text, Json::Value& value) {
   return parse(text, false, value);
 }
@@ -143,17 +136,17 @@ bool toFile(const std::string& path, const Json::Value& value) {
   return true;
 }
 
+const Json::Value* find(const Json::Value& value, const std::string& key) {
+  return value.isObject() ? value.find(key.data(), key.data() + key.size()) : nullptr;
+}
+
 const Json::Value& member(const Json::Value& value, const std::string& key) {
-  static const Json::Value null;
-  if (!value.isObject()) {
-    return null;
-  }
-  const Json::Value* found = value.find(key.data(), key.data() + key.size());
-  return found != nullptr ? *found : null;
+  const Json::Value* found = find(value, key);
+  return found != nullptr ? *found : Json::Value::nullSingleton();
 }
 
 bool hasMember(const Json::Value& value, const std::string& key) {
-  return value.isObject() && value.find(key.data(), key.data() + key.size()) != nullptr;
+  return find(value, key) != nullptr;
 }
 
 std::string asString(const Json::Value& value, const std::string& fallback) {

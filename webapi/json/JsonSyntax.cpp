@@ -3,7 +3,6 @@
 namespace QELO::JsonHelper {
 namespace {
 
-constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
 
 bool isDigit(char c) {
   return c >= '0' && c <= '9';

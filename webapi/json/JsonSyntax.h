@@ -4,6 +4,9 @@
 
 namespace QELO::JsonHelper {
 
+/// Some editors put it before a file's text.
+inline constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+
 /// Whether a text is one JSON value (RFC 8259) with nothing but blanks around it.
 ///
 /// Needed because the JSON library lets through, whatever its settings: "-" and "01" as numbers,

@@ -9,11 +9,9 @@ APIBase::APIBase() : store_(Json::objectValue) {}
 APIBase::~APIBase() = default;
 
 Json::Value* APIBase::FindSection(const std::string& section) {
-  if (!JsonHelper::hasMember(store_, section)) {
-    return nullptr;
-  }
-  Json::Value& found = store_[section];
-  return found.isObject() || found.isNull() ? &found : nullptr;
+  // The store is ours to change; the JSON library finds members of constant values only.
+  Json::Value* found = const_cast<Json::Value*>(JsonHelper::find(store_, section));
+  return found != nullptr && (found->isObject() || found->isNull()) ? found : nullptr;
 }
 
 bool APIBase::HasData(const std::string& section, const std::string& key) const {
@@ -45,14 +43,15 @@ bool APIBase::SetData(const std::string& section, const std::string& key, const 
 
 const Json::Value& APIBase::GetData(const std::string& section, const std::string& key,
                                     const Json::Value& defaultValue) const {
-  if (!JsonHelper::hasMember(store_, section)) {
+  const Json::Value* found = JsonHelper::find(store_, section);
+  if (found == nullptr) {
     return defaultValue;
   }
-  const Json::Value& found = JsonHelper::member(store_, section);
   if (key.empty()) {
-    return found;
+    return *found;
   }
-  return JsonHelper::hasMember(found, key) ? JsonHelper::member(found, key) : defaultValue;
+  const Json::Value* member = JsonHelper::find(*found, key);
+  return member != nullptr ? *member : defaultValue;
 }
 
 bool APIBase::ClearData(const std::string& section, const std::string& key) {

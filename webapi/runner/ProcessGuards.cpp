@@ -52,8 +52,7 @@ StandardStreams::~StandardStreams() {
 }
 
 void StandardStreams::ShutInput() {
-  nullInput_.open(kNull, std::ios::in);
-  inputBuffer_ = std::cin.rdbuf(nullInput_.rdbuf());
+  inputBuffer_ = std::cin.rdbuf(&null_);
   // A stream of its own: the former one may hold input that was read ahead.
   inputFile_ = stdin;
   std::FILE* null = std::fopen(kNull, "re");
@@ -73,8 +72,7 @@ void StandardStreams::GiveBackInput() {
 void StandardStreams::ShutOutput() {
   std::cout.flush();
   std::fflush(stdout);
-  nullOutput_.open(kNull, std::ios::out | std::ios::trunc);
-  outputBuffer_ = std::cout.rdbuf(nullOutput_.rdbuf());
+  outputBuffer_ = std::cout.rdbuf(&null_);
   outputDescriptor_ = replaceByNull(STDOUT_FILENO, O_WRONLY | O_TRUNC);
 }
 

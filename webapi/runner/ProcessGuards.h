@@ -1,8 +1,7 @@
 #pragma once
 
 #include <cstdio>
-#include <fstream>
-#include <ios>
+#include <streambuf>
 
 namespace QELO {
 
@@ -24,8 +23,14 @@ class StandardStreams {
   void GiveBackInput();
   void GiveBackOutput();
 
-  std::ifstream nullInput_;
-  std::ofstream nullOutput_;
+  /// Nothing to read, and nothing kept of what is written: what /dev/null is to a stream.
+  class NullBuffer : public std::streambuf {
+   protected:
+    int_type overflow(int_type c) override { return traits_type::not_eof(c); }
+    std::streamsize xsputn(const char*, std::streamsize count) override { return count; }
+  };
+
+  NullBuffer null_;
   std::streambuf* inputBuffer_ = nullptr;
   std::streambuf* outputBuffer_ = nullptr;
   std::FILE* inputFile_ = nullptr;
