@@ -14,6 +14,7 @@ namespace QELO {
 class APIRequest;
 class APIResponse;
 class APIRunnerPrivate;
+class ExecParam;
 
 /// The engine that turns one prepared request into one API call.
 ///
@@ -51,6 +52,22 @@ class WEBAPI_API APIRunner {
   /// Checks a request and runs it: as a compound request, through a daemon, or in process.
   /// @return whether the call was made; else the response has the error
   bool Process(APIRequest* request, APIResponse* response);
+  /// Calls an API as a given user, for programs that are not serving a request: no permission is
+  /// checked, so the caller answers for the user. Working directory, environment and process name
+  /// change for the time of the call. Callbacks that the method registers are not run.
+  /// @return the answer's body with "httpd_restart", or {"success": false, "error": {"code"}} with
+  ///         101 when API, method or user is missing and 117 when a child process came to nothing
+  static Json::Value Exec(const ExecParam& param);
+  /// @param result    receives the answer
+  /// @param outputFd  receives the body of what a downloading method prints; below 0: none
+  /// @param params, attributes  objects, or null
+  static void Exec(Json::Value& result, int outputFd, const char* api, int version,
+                   const char* method, const Json::Value& params, const Json::Value& attributes,
+                   const char* runner);
+  static void Exec(Json::Value& result, const char* api, int version, const char* method,
+                   const Json::Value& params, const Json::Value& attributes, const char* runner);
+  static void Exec(Json::Value& result, const char* api, int version, const char* method,
+                   const Json::Value& params, const char* runner);
   /// The answer's body with "httpd_restart" added; null without a response.
   Json::Value GetResponse() const;
   /// Hands over main()'s arguments, whose area shows the process name.

@@ -1,0 +1,51 @@
+#pragma once
+
+#include <json/json.h>
+
+#include "webapi/APIRunner.h"
+#include "webapi/Export.h"
+
+namespace QELO {
+
+class ExecParam;
+class Pipe;
+
+/// Carries out one API call for a program that is not serving a request; see APIRunner::Exec().
+class WEBAPI_API ExecHandler {
+ public:
+  /// @param param  outlives the handler
+  explicit ExecHandler(const ExecParam& param);
+  ExecHandler(const ExecHandler&) = delete;
+  ExecHandler& operator=(const ExecHandler&) = delete;
+  virtual ~ExecHandler();
+
+  /// The whole call. A method whose credentials can be given back runs in this process, all others
+  /// and those with an output descriptor in a forked child.
+  /// @return the answer's body with "httpd_restart", or {"success": false, "error": {"code"}} with
+  ///         101 when API, method or user is missing and 117 when the child came to nothing
+  Json::Value Process();
+
+  /// The steps of Process().
+  /// @return false, with the result set, when the call lacks something
+  bool CheckParams();
+  void PrepareReq();
+  /// @param inChild  the process is a child made for the call, so nothing is given back. Else the
+  ///                 variables USERNAME and QELO_WEBAPI_USERNAME get the former value of the
+  ///                 latter when it had one, and otherwise keep the call's user.
+  void Run(bool inChild);
+  void RunFork();
+  void RunForkForStdout();
+
+ private:
+  void Fail(int code);
+  /// An exception must end the child here: the code around the caller is the parent's.
+  [[noreturn]] void RunChild(Pipe& result) noexcept;
+  void ReceiveResult(Pipe& result, int child);
+
+  const ExecParam* param_;
+  APIRunner runner_;
+  Json::Value request_;
+  Json::Value result_;
+};
+
+}  // namespace QELO
