@@ -21,7 +21,8 @@ struct QeloCgiAuthFlags {
 
 /// Starts the context. @return 1 on success
 WEBAPI_API int QeloCgiInit(const char* program, QeloCgiContext* context);
-/// As QeloCgiInit for a named user store. @return 1 on success
+/// As QeloCgiInit for a named user store, with its cookies taken as by QeloCgiLoadInCookies.
+/// @return 1 on success, 0 when there is no such store; login sessions are in "current.users"
 WEBAPI_API int QeloCgiInitEx(const char* userStore, QeloCgiContext* context);
 /// Takes the cookies from the process environment's HTTP_COOKIE; of two "id" the last counts.
 WEBAPI_API int QeloCgiLoadInCookies(QeloCgiContext* context);

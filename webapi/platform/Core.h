@@ -27,6 +27,7 @@ WEBAPI_API int QLIBCFileCheckKeyValue(const char* file, const char* key, const c
 /// @return 0 on success, a negative value on failure
 WEBAPI_API int QLIBCINFOSetKeyValue(const char* key, const char* value);
 /// Creates a directory and its parents.
+/// @param keepExistingOwner  0: a directory that exists is given to the owner too
 /// @param uid, gid  owner of what is created, -1: as it comes
 /// @param mode      search permission is added wherever it grants reading
 /// @return 0 on success, also when it exists
