@@ -12,7 +12,8 @@ add_compile_options(-Wall -Wextra -Wshadow -Wnon-virtual-dtor -Wformat=2 -Werror
 add_compile_definitions(_FILE_OFFSET_BITS=64)
 # A CGI process lives for two milliseconds, nearly all of it in the dynamic loader: no library
 # that is not needed, and symbols bound at the first call.
-add_link_options(-Wl,--as-needed -Wl,-O1 -Wl,-z,lazy)
+# Few, large segments, too: each is a mapping and a page to be faulted in.
+add_link_options(-Wl,--as-needed -Wl,-O1 -Wl,-z,lazy -Wl,-z,noseparate-code)
 
 if(WEBAPI_SANITIZE)
   add_compile_options(-fsanitize=${WEBAPI_SANITIZE} -fno-omit-frame-pointer

@@ -1,8 +1,18 @@
 #include "webapi/model/APIBase.h"
 
+#include <algorithm>
+
 #include "webapi/JsonHelper.h"
 
 namespace QELO {
+namespace {
+
+bool holdsStringsAlone(const Json::Value& members) {
+  return std::all_of(members.begin(), members.end(),
+                     [](const Json::Value& member) { return member.isString(); });
+}
+
+}  // namespace
 
 APIBase::APIBase() : store_(Json::objectValue) {}
 
@@ -22,6 +32,10 @@ bool APIBase::SetData(const std::string& section, const Json::Value& members, bo
   Json::Value* target = FindSection(section);
   if (target == nullptr || members.empty() || !members.isObject()) {
     return false;
+  }
+  if (target->empty() && (!stringOnly || holdsStringsAlone(members))) {
+    *target = members;  // as the loop below, without a look-up for each
+    return true;
   }
   for (auto it = members.begin(); it != members.end(); ++it) {
     if (!stringOnly || it->isString()) {

@@ -25,7 +25,7 @@ APIRunner::APIRunner()
   setsid();
   Json::Value defaults;
   if (WebAPIUtil::ReadJsonFile(Paths::kLibDef, defaults) && defaults.isObject()) {
-    libDef = defaults;
+    libDef.swap(defaults);
   }
 }
 

@@ -83,7 +83,8 @@ void APIRunner::AddDescriptions(Json::Value& target, const Json::Value& file) co
       continue;
     }
     Json::Value description = *it;
-    target[it.name()] = ApplyLibDef(description);
+    ApplyLibDef(description);
+    target[it.name()] = std::move(description);
   }
 }
 
