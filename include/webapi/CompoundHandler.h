@@ -56,6 +56,7 @@ class WEBAPI_API CompoundHandler {
   void Output(_tag_WEBAPI_ERR code);
 
  private:
+  void TakeEntry(const Json::Value& entry);
   int RefuseEntry(int code, const char* message, unsigned index);
   int ForkEntry(unsigned index);
   /// An exception must end the child here: the code around the caller is the parent's.

@@ -54,9 +54,7 @@ int CompoundHandler::RefuseEntry(int code, const char* message, unsigned index) 
 }
 
 int CompoundHandler::CompoundProcessEntry(const Json::Value& entry, unsigned index) {
-  Json::Value params;
-  params["postParam"] = entry;
-  entryRequest_->InitParam(params, true);
+  TakeEntry(entry);
   // An entry that ends without an answer must not show the one before it.
   entryResponse_->SetError(WEBAPI_ERR_NO_ANSWER);
   if (stopWhenError_ && hasFail_) {

@@ -89,6 +89,15 @@ int CompoundHandler::PrepareNewCompReqResp() {
   return WEBAPI_ERR_NONE;
 }
 
+/// What an entry does not name must not come from the one before it, which would run again.
+void CompoundHandler::TakeEntry(const Json::Value& entry) {
+  Json::Value& call = entryRequest_->Serialize()["private"];
+  for (const char* key : {"api", "version", "method"}) {
+    call.removeMember(key);
+  }
+  entryRequest_->InitParam(asPostParameters(entry), true);
+}
+
 void CompoundHandler::PreloadLibs() {
   // A library's constructors are foreign code.
   const WorkingDirectory directory;
@@ -106,7 +115,7 @@ void CompoundHandler::PreloadLibs(const Json::Value& value, bool top) {
     }
     return;
   }
-  entryRequest_->InitParam(asPostParameters(value), true);
+  TakeEntry(value);
   runner_->GetMethod(entryRequest_->GetAPIClass(), entryRequest_->GetAPIVersion(),
                      entryRequest_->GetAPIMethod());
   void* handle = nullptr;
