@@ -7,6 +7,7 @@
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/model/Log.h"
+#include "webapi/platform/Task.h"
 
 namespace QELO {
 
@@ -33,6 +34,9 @@ void APIResponsePrivate::SetError(int code, const Json::Value& data) {
   }
   store_["code"] = code;
   store_["body"] = std::move(body);
+  if (request_ != nullptr && request_->IsPollingTask()) {
+    UpdateTask();
+  }
 }
 
 bool APIResponsePrivate::SetStatus(int code, const std::string& message) {

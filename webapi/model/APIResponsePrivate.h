@@ -1,9 +1,16 @@
 #pragma once
 
+#include <sys/types.h>
+
+#include <memory>
 #include <string>
 
 #include "webapi/APIResponse.h"
 #include "webapi/model/APIBase.h"
+
+namespace ARDO {
+class Task;
+}
 
 namespace QELO {
 
@@ -17,6 +24,7 @@ class APIResponsePrivate : public APIBase {
   APIResponsePrivate(APIRequest* request, APIResponse* owner);
   APIResponsePrivate(const APIResponsePrivate&) = delete;
   APIResponsePrivate& operator=(const APIResponsePrivate&) = delete;
+  ~APIResponsePrivate() override;
 
   void SetError(int code, const Json::Value& data);
   bool AddCookie(const std::string& name, const std::string& value, const std::string& path,
@@ -32,9 +40,14 @@ class APIResponsePrivate : public APIBase {
   /// "; expires=..." of a cookie, or "".
   std::string CookieExpiry(long minutes) const;
   bool AppendCookie(const std::string& line);
+  /// Makes the body the result of the background task that the request is.
+  void UpdateTask();
 
   APIRequest* request_;
   APIResponse* owner_;
+  std::unique_ptr<ARDO::Task> task_;  ///< null until a background task sets a result
+  std::string taskUser_;
+  pid_t taskProcess_ = 0;  ///< the one that made the handle
   APIResponse::CallbackList callbacks_;
 };
 

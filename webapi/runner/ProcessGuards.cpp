@@ -33,7 +33,10 @@ void restoreDescriptor(int descriptor, int former) {
 
 }  // namespace
 
-StandardStreams::StandardStreams(bool shutInput, bool shutOutput) {
+StandardStreams* StandardStreams::innermost_ = nullptr;
+
+StandardStreams::StandardStreams(bool shutInput, bool shutOutput) : outer_(innermost_) {
+  innermost_ = this;
   if (shutInput) {
     ShutInput();
   }
@@ -43,11 +46,23 @@ StandardStreams::StandardStreams(bool shutInput, bool shutOutput) {
 }
 
 StandardStreams::~StandardStreams() {
+  innermost_ = outer_;
   if (inputBuffer_ != nullptr) {
     GiveBackInput();
   }
   if (outputBuffer_ != nullptr) {
     GiveBackOutput();
+  }
+}
+
+void StandardStreams::LetGo() {
+  for (StandardStreams* guard = innermost_; guard != nullptr; guard = guard->outer_) {
+    for (int* descriptor : {&guard->inputDescriptor_, &guard->outputDescriptor_}) {
+      if (*descriptor >= 0) {
+        close(*descriptor);
+        *descriptor = -1;
+      }
+    }
   }
 }
 

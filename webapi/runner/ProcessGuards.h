@@ -17,6 +17,10 @@ class StandardStreams {
   StandardStreams& operator=(const StandardStreams&) = delete;
   ~StandardStreams();
 
+  /// For a forked child that outlives the request and never returns to the guard's owner: closes
+  /// the former descriptors, whose last holder the web server waits for.
+  static void LetGo();
+
  private:
   void ShutInput();
   void ShutOutput();
@@ -36,6 +40,8 @@ class StandardStreams {
   std::FILE* inputFile_ = nullptr;
   int inputDescriptor_ = -1;
   int outputDescriptor_ = -1;
+  StandardStreams* outer_;  ///< the guard around this one: calls nest
+  static StandardStreams* innermost_;
 };
 
 /// Runs at another scheduling priority, and goes back to the former at the end.
