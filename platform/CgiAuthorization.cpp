@@ -149,7 +149,7 @@ int QeloCgiIsAuthorizedEx(QeloCgiContext* context, const QeloCgiAuthFlags* flags
   if (timedOut) {
     return kAuthorizedTimedOut;  // not counted as a use, which would revive the session
   }
-  return session.Refresh() ? kAuthorized : kBrokenRecord;
+  return flags->keepIdle != 0 || session.Refresh() ? kAuthorized : kBrokenRecord;
 }
 
 int QeloCgiGetOption(QeloCgiContext* context, const char* name, char* value, int size) {

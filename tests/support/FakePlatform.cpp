@@ -190,7 +190,8 @@ int QeloCgiGetRemoteIP(char* address, int size) {
 int QeloCgiIsAuthorizedEx(QeloCgiContext*, const QeloCgiAuthFlags* flags, char* user, int size,
                           int allowTimeout, int checkAddress) {
   note("QeloCgiIsAuthorizedEx", std::to_string(flags->sessionFromParameter),
-       std::to_string(allowTimeout), std::to_string(checkAddress));
+       std::to_string(allowTimeout),
+       std::to_string(checkAddress) + (flags->keepIdle != 0 ? ", idle" : ""));
   fill(fake().authorizedUser, user, size);
   return fake().authorized;
 }

@@ -170,7 +170,8 @@ int WebEntry::Authorise(bool allowTimeout) {
   int result = AUTHORIZED_NO_SESSION;
   char user[kUserNameSize] = {};
   if (!request->GetSessionID().empty()) {
-    const QeloCgiAuthFlags flags{request->HasParam("_sid") ? 1U : 0U, 0};
+    const QeloCgiAuthFlags flags{request->HasParam("_sid") ? 1U : 0U,
+                                 GetMethodAttr(request, "keepIdle") ? 1U : 0U};
     result = QeloCgiIsAuthorizedEx(Context(), &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
                                    GetMethodAttr(request, "skipCheckIP") ? 0 : 1);
   }

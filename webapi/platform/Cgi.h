@@ -16,7 +16,7 @@ struct QeloCgiContext {
 struct QeloCgiAuthFlags {
   unsigned int sessionFromParameter;  ///< 1: the session id was a parameter, which another site
                                       ///< cannot know: no anti-forgery token is asked for
-  unsigned int reserved;              ///< 0
+  unsigned int keepIdle;              ///< 1: the check does not count as use of the session
 };
 
 /// Starts the context. @return 1 on success
@@ -32,7 +32,8 @@ WEBAPI_API const char* QeloCgiGetLang(QeloCgiContext* context);
 WEBAPI_API int QeloCgiIsTokenEnable(QeloCgiContext* context);
 /// The client's address. @return 0 on success
 WEBAPI_API int QeloCgiGetRemoteIP(char* address, int size);
-/// Checks the login session of the context's cookie "id" and counts the use.
+/// Checks the login session of the context's cookie "id" and counts the use, unless it is to be
+/// kept idle.
 /// @param user          receives the login name, "" when there is no session
 /// @param allowTimeout  non-zero: a session past its idle time-out is accepted
 /// @param checkAddress  non-zero: the session's address binding is checked

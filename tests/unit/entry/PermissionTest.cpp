@@ -169,6 +169,14 @@ TEST_F(Permission, CgiLibraryIsToldTimeoutAddressAndWhereTheSessionCameFrom) {
   EXPECT_EQ(platform->calls[platform->calls.size() - 2], "QeloCgiIsAuthorizedEx(1, 1, 0)");
 }
 
+TEST_F(Permission, CgiLibraryIsToldThatTheMethodKeepsTheSessionIdle) {
+  Describe(kOpenToAll, R"({"keepIdle": true})");
+  MakeRequest(*entry_);
+  EXPECT_TRUE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 1);
+  EXPECT_EQ(platform->calls[platform->calls.size() - 2], "QeloCgiIsAuthorizedEx(0, 0, 1, idle)");
+}
+
 TEST_F(Permission, SecondCheckWithTheSameAllowanceAsksNobody) {
   Describe(kOpenToAll);
   MakeRequest(*entry_);

@@ -199,6 +199,16 @@ TEST_F(Authorization, TimedOutIsTwoWithAllowanceAndDoesNotRevive) {
   EXPECT_EQ(Check(ticket.id), -1);
 }
 
+TEST_F(Authorization, IdleCheckIsNotCountedAsUse) {
+  const Ticket ticket = Create();
+  Age(File(ticket), 800);
+  const auto before = Status(File(ticket)).st_mtim.tv_sec;
+  EXPECT_EQ(Check(ticket.id, {.flags = {1, 1}}), 1);
+  EXPECT_EQ(Status(File(ticket)).st_mtim.tv_sec, before);
+  Age(File(ticket), 902);
+  EXPECT_EQ(Check(ticket.id, {.flags = {1, 1}}), -1);
+}
+
 TEST_F(Authorization, UseIsCountedOnSuccessOnly) {
   const Ticket ticket = Create();
   Age(File(ticket), 800);
