@@ -1,0 +1,207 @@
+"""QELO.Work.Checksum: digests of a directory's files as a background task."""
+
+import hashlib
+import os
+import shutil
+import subprocess
+
+import pytest
+
+from conftest import ROOT, needs_root
+from tasks import TASK, User, started  # noqa: F401  (a fixture)
+
+API = "QELO.Work.Checksum"
+
+
+@pytest.fixture
+def alice(client, started):  # noqa: F811
+    return User(client, "alice", started)
+
+
+@pytest.fixture
+def home(root):
+    """A directory that belongs to alice, on her home."""
+    directory = root / "home" / "alice" / "checksum"
+    shutil.rmtree(directory, ignore_errors=True)
+    directory.mkdir()
+    give_to_alice(directory)
+    yield directory
+    shutil.rmtree(directory, ignore_errors=True)
+
+
+def give_to_alice(path):
+    owner = (ROOT / "home" / "alice").stat()
+    os.chown(path, owner.st_uid, owner.st_gid, follow_symlinks=False)
+
+
+def put(path, content, mode=0o644):
+    path.parent.mkdir(parents=True, exist_ok=True)
+    path.write_bytes(content)
+    give_to_alice(path.parent)
+    give_to_alice(path)
+    path.chmod(mode)
+    return path
+
+
+def run(user, **parameters):
+    """The data of a task that has ended."""
+    full_id = user.call(API, "start", **parameters).data["task_id"]
+    user.started.append((user, full_id))
+    status = user.wait_for_end(full_id)
+    assert status["success"], status
+    assert status["data"]["state"] == "done"
+    return status["data"]
+
+
+def test_Checksum_OfADirectory_IsWhatSha256sumChecks(alice, home):
+    put(home / "b.bin", os.urandom(3_000_000))
+    put(home / "a" / "deep" / "empty", b"")
+    put(home / "a" / "blank in name", b"x")
+    put(home / "back\\slash\nand line", b"y")
+    put(home / "größe", b"z")
+    data = run(alice, path=home)
+    lines = data["manifest"].splitlines()
+    assert len(lines) == 5
+    assert data["manifest_complete"] is True
+    assert data["files"] == {"done": 5, "total": 5}
+    assert data["bytes"] == {"done": 3_000_003, "total": 3_000_003}
+    assert (data["error_count"], data["errors"], data["current"]) == (0, [], "")
+    assert data["path"] == str(home)
+    check = subprocess.run(
+        ["sha256sum", "--check", "--strict"],
+        input=data["manifest"].encode(),
+        cwd=home,
+        capture_output=True,
+        check=False,
+    )
+    assert check.returncode == 0, check
+
+
+def test_Checksum_OrdersFilesByName(alice, home):
+    for name in ("c", "a", "b/z", "b/y"):
+        put(home / name, b"")
+    names = [line.split("  ", 1)[1] for line in run(alice, path=home)["manifest"].splitlines()]
+    assert names == ["a", "b/y", "b/z", "c"]
+
+
+def test_Checksum_OfAnEmptyDirectory_IsEmpty(alice, home):
+    data = run(alice, path=home)
+    assert data["manifest"] == ""
+    assert data["files"] == {"done": 0, "total": 0}
+
+
+def test_Checksum_FollowsNoLinksAndOpensNoPipes(alice, home):
+    put(home / "file", b"x")
+    (home / "link").symlink_to(home / "file")
+    (home / "up").symlink_to(home.parent)
+    os.mkfifo(home / "pipe")
+    data = run(alice, path=home)
+    assert data["manifest"] == f"{hashlib.sha256(b'x').hexdigest()}  file\n"
+
+
+def test_Checksum_OfALinkToADirectory_IsTheDirectorys(alice, home):
+    put(home / "real" / "file", b"x")
+    (home / "link").symlink_to("real")
+    data = run(alice, path=home / "link")
+    assert data["path"] == str(home / "real")
+    assert data["files"]["done"] == 1
+
+
+def test_Checksum_OfAForeignCharacterSet_ReplacesBytes(alice, home):
+    path = os.path.join(os.fsencode(home), b"na\xefve")
+    with open(path, "wb") as file:
+        file.write(b"x")
+    give_to_alice(path)
+    data = run(alice, path=home)
+    assert data["manifest"].endswith("  na�ve\n")
+
+
+@needs_root
+def test_Checksum_OfUnreadableFiles_TellsEach(alice, home):
+    put(home / "locked", b"x", 0o000)
+    put(home / "locked-dir" / "inner", b"x")
+    os.chown(home / "locked-dir", 0, 0)
+    (home / "locked-dir").chmod(0o700)
+    put(home / "open", b"x")
+    data = run(alice, path=home)
+    assert data["errors"] == [
+        {"path": "locked", "reason": "Permission denied"},
+        {"path": "locked-dir", "reason": "Permission denied"},
+    ]
+    assert data["error_count"] == 2
+    assert data["files"] == {"done": 1, "total": 1}
+
+
+def test_Checksum_OfManyFiles_BoundsTheManifest(alice, home):
+    directory = home / ("d" * 200)
+    directory.mkdir()
+    for number in range(3000):
+        (directory / ("f" * 200 + str(number))).touch()
+    data = run(alice, path=home)
+    assert data["files"]["done"] == 3000
+    assert data["manifest_complete"] is False
+    assert 1_000_000 < len(data["manifest"]) <= 1 << 20
+    assert data["manifest"].endswith("\n")
+
+
+@pytest.mark.parametrize(
+    "parameters",
+    [{}, {"path": ""}, {"path": "home"}, {"path": "7"}, {"path": "/", "one_file_system": "x"}],
+)
+def test_Checksum_OfMalformedParameters_IsBadInput(alice, parameters):
+    assert alice.call(API, "start", **parameters).code == 101
+
+
+def refusal(answer):
+    error = answer.json["error"]
+    return error["code"], error["errors"]["reason"]
+
+
+def test_Checksum_OfNoDirectory_TellsWhy(alice, home):
+    put(home / "file", b"x")
+    assert refusal(alice.call(API, "start", path=home / "none")) == (
+        400, "No such file or directory")
+    assert refusal(alice.call(API, "start", path=home / "file")) == (400, "Not a directory")
+
+
+@needs_root
+def test_Checksum_OfAnotherUsersDirectory_IsDenied(alice, root):
+    for path in (root / "home" / "bob", "/root"):
+        assert refusal(alice.call(API, "start", path=path)) == (400, "Permission denied")
+
+
+def test_Checksum_WhileItReads_TellsHowFarItIs(alice, home):
+    with open(home / "large", "wb") as file:
+        file.truncate(20 << 30)  # a hole: nothing on the disk, minutes of work
+    give_to_alice(home / "large")
+    full_id = alice.call(API, "start", path=home).data["task_id"]
+    alice.started.append((alice, full_id))
+    state = ""
+    for _ in range(30):
+        status = alice.call(TASK, "wait", task_id=full_id, state=state, timeout=5).data
+        state = status["state"]
+        if status["data"].get("seconds_left") is not None:
+            break
+    data = status["data"]
+    assert data["state"] == "reading"
+    assert data["current"] == "large"
+    assert data["files"] == {"done": 0, "total": 1}
+    assert 0 < data["bytes"]["done"] < data["bytes"]["total"] == 20 << 30
+    assert data["seconds_left"] > 0
+    assert alice.call(TASK, "stop", task_id=full_id).code == 0
+    assert alice.status(full_id).data["finish"] is True
+
+
+def test_Checksum_FiveAtOnce_IsRefused(alice, home):
+    with open(home / "large", "wb") as file:
+        file.truncate(20 << 30)
+    give_to_alice(home / "large")
+    ids = []
+    for _ in range(4):
+        ids.append(alice.call(API, "start", path=home).data["task_id"])
+        alice.started.append((alice, ids[-1]))
+    assert alice.call(API, "start", path=home).code == 401
+    assert alice.call(TASK, "stop", task_id=ids[0]).code == 0
+    again = alice.call(API, "start", path=home)
+    assert again.code == 0
+    alice.started.append((alice, again.data["task_id"]))

@@ -1,0 +1,53 @@
+// A well-behaved library whose method goes on in the background, as its parameters ask. One
+// function serves several methods, which their description gives different credentials.
+
+#include <unistd.h>
+#include <webapi/APIPolling.h>
+#include <webapi/JsonHelper.h>
+
+#include "PluginTable.h"
+
+using QELO::APIPolling;
+using QELO::APIRequest;
+using QELO::APIResponse;
+using QELO::JsonHelper::asBool;
+using QELO::JsonHelper::asInt;
+using QELO::JsonHelper::asString;
+
+static void tell(APIResponse* response, int step) {
+  Json::Value data;
+  data["pid"] = getpid();
+  data["uid"] = getuid();
+  data["step"] = step;
+  response->SetSuccess(data);
+}
+
+/// "silent" tenths of a second without a result, then "steps" results, "pause" milliseconds each.
+static void work(APIRequest* request, APIResponse* response, void*) {
+  usleep(static_cast<useconds_t>(asInt(request->GetParam("silent"))) * 100000);
+  const int steps = asInt(request->GetParam("steps"), 1);
+  for (int step = 1; step <= steps; ++step) {
+    tell(response, step);
+    usleep(static_cast<useconds_t>(asInt(request->GetParam("pause"))) * 1000);
+  }
+}
+
+static void start(APIRequest* request, APIResponse* response) {
+  APIPolling polling(request);
+  polling.SetPrefixAttr(asString(request->GetParam("prefix")));
+  polling.SetRemoveAttr(!asBool(request->GetParam("keep"), true));
+  if (!polling.SetGroupAttr(asString(request->GetParam("group")))) {
+    response->SetError(105);
+    return;
+  }
+  polling.Start(response, work, nullptr);
+}
+
+static QELO::_tag_API_TABLE table[] = {{"QELO.Test.Background", 1, "start", start},
+                                       {"QELO.Test.Background", 1, "asUser", start},
+                                       {"QELO.Test.Background", 1, "asRoot", start},
+                                       {nullptr, 0, nullptr, nullptr}};
+
+PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
+  return table;
+}
