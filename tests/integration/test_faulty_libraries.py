@@ -98,7 +98,8 @@ def test_NullCheckTable_IsNoTable(client, describe):
 
 def test_EveryFaultyLibrary_IsCovered():
     tested = {
-        "checked", "crashing", "good", "identity", "late", "no_table", "null_check_table", "null_table",
-        "printing", "reading", "state", "throwing", "throwing_table", "wandering",
+        "background", "checked", "crashing", "entries", "good", "identity", "late", "losing",
+        "no_table", "null_check_table", "null_table", "printing", "reading", "state", "throwing",
+        "throwing_table", "wandering",
     }
     assert {library.stem for library in PLUGINS.glob("*.so")} == tested
