@@ -1,0 +1,71 @@
+#include "programs/webapi-exec-call.h"
+
+#include <fcntl.h>
+#include <pwd.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+#include "webapi/APIRunner.h"
+#include "webapi/ExecParam.h"
+#include "webapi/platform/Core.h"
+
+namespace QELO::ExecProgram {
+namespace {
+
+constexpr char kBatchAPI[] = "QELO.Entry.Request";
+constexpr char kBatchMethod[] = "request";
+constexpr mode_t kOutputMode = 0666;  // less the umask, as files that programs make are
+
+/// The name of the calling account, "" when it has none.
+std::string ownName() {
+  const passwd* account = getpwuid(geteuid());
+  return account != nullptr ? account->pw_name : "";
+}
+
+/// Whether the caller may call as this user. No permission is checked behind this.
+/// @return why not, or ""
+std::string checkUser(const std::string& user) {
+  uid_t uid = 0;
+  gid_t gid = 0;
+  if (user.empty()) {
+    return "the calling account has no name; --user takes one";
+  }
+  if (QELOUserGetUGID(user.c_str(), &uid, &gid) != 0) {
+    return "there is no user " + user + "; --user names another";
+  }
+  return geteuid() == 0 || uid == geteuid() ? "" : "only root may call as another user";
+}
+
+/// What a downloading method prints is never mixed with the answer.
+int openOutput(const std::string& file) {
+  return open(file.empty() ? "/dev/null" : file.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC,
+              kOutputMode);
+}
+
+}  // namespace
+
+std::string makeCall(const Options& options, Json::Value& answer) {
+  const std::string user = options.user.empty() ? ownName() : options.user;
+  const std::string wrong = checkUser(user);
+  if (!wrong.empty()) {
+    return wrong;
+  }
+  const int output = openOutput(options.output);
+  if (output < 0) {
+    return options.output + ": " + strerror(errno);
+  }
+  const bool isBatch = !options.batch.empty();
+  ExecParam param;
+  param.SetParams(options.params)
+      .SetAPI(isBatch ? kBatchAPI : options.api)
+      .SetVersion(options.version != 0 ? options.version : 1)
+      .SetMethod(isBatch ? kBatchMethod : options.method)
+      .SetRunner(user)
+      .SetOutputFd(output);
+  answer = APIRunner::Exec(param);
+  return close(output) == 0 ? "" : options.output + ": " + strerror(errno);
+}
+
+}  // namespace QELO::ExecProgram

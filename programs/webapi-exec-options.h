@@ -1,0 +1,32 @@
+#pragma once
+
+#include <json/json.h>
+
+#include <string>
+
+namespace QELO::ExecProgram {
+
+/// The exit codes of webapi-exec.
+enum ExitCode : int { kDone = 0, kFailed = 1, kWrongUse = 2 };
+
+extern const char kHelp[];
+
+/// What the command line asks for.
+struct Options {
+  bool help = false;
+  bool list = false;  ///< names instead of a call: of APIs, or of the methods of `api`
+  std::string api;
+  int version = 0;  ///< 0: not given
+  std::string method;
+  std::string user;
+  Json::Value params{Json::objectValue};
+  std::string output;  ///< file for what the method prints, "" for none
+  std::string batch;   ///< file of calls, "" for a single call
+  Json::Value calls;   ///< the batch's calls
+};
+
+/// Reads the command line, and the files that give parameters; "-" is standard input.
+/// @return what is wrong, or ""
+std::string readOptions(int argc, char** argv, Options& options);
+
+}  // namespace QELO::ExecProgram

@@ -1,0 +1,446 @@
+"""webapi-exec: calls from the command line."""
+
+import json
+import os
+import pty
+import stat
+import subprocess
+
+import pytest
+
+from conftest import BUILD, DESCRIPTIONS, needs_root
+from test_credentials import account
+from webserver import SOURCE
+
+EXEC = BUILD / "programs" / "webapi-exec"
+COMPLETION = SOURCE / "packaging" / "completion" / "webapi-exec.bash"
+ENTRIES = "QELO.Test.Entries"
+IDENTITY = "QELO.Test.Identity"
+DOWNLOAD = "QELO.Test.Download"
+
+pytestmark = pytest.mark.usefixtures("described")
+
+
+@pytest.fixture
+def described(describe):
+    describe(ENTRIES, "entries.so", methods={"1": ["echo", "fail", "large"], "2": ["process"]})
+    printing = [{name: {"allowDownload": True}} for name in ("print", "bytes", "bare", "broken")]
+    describe(DOWNLOAD, "downloads.so", methods={"1": printing})
+    describe("QELO.Test.Losing", "losing.so", methods={"1": ["killed"]})
+
+
+def run(*arguments, text=None, **options):
+    return subprocess.run(
+        [EXEC, *map(str, arguments)],
+        input=text,
+        capture_output=True,
+        text=True,
+        timeout=60,
+        check=False,
+        **options,
+    )
+
+
+def call(api, method, *arguments, user="alice", **options):
+    return run("--api", api, "--method", method, "--user", user, *arguments, **options)
+
+
+def data_of(process):
+    assert process.returncode == 0, process
+    return json.loads(process.stdout)["data"]
+
+
+def on_terminal(*arguments):
+    """What the program prints to a terminal, and its exit status."""
+    leader, terminal = pty.openpty()
+    with subprocess.Popen(
+        [EXEC, *map(str, arguments)], stdin=subprocess.DEVNULL, stdout=terminal, stderr=terminal
+    ) as process:
+        os.close(terminal)
+        printed = b""
+        while True:
+            try:
+                piece = os.read(leader, 65536)
+            except OSError:
+                break
+            if not piece:
+                break
+            printed += piece
+    os.close(leader)
+    return printed.decode().replace("\r\n", "\n"), process.returncode
+
+
+# Answers
+
+
+def test_Success_IsOneLineOfJsonInAPipe():
+    process = call(ENTRIES, "echo", "--param", "a=ä")
+    assert process.stdout == (
+        '{"data":{"a":"ä","api":"QELO.Test.Entries","method":"echo","version":1},'
+        '"httpd_restart":false,"success":true}\n'
+    )
+    assert (process.returncode, process.stderr) == (0, "")
+
+
+def test_Success_IsIndentedOnATerminal():
+    text, status = on_terminal(
+        "--api", ENTRIES, "--method", "echo", "--user", "alice", "--param", "a=ä"
+    )
+    assert status == 0
+    assert '\n    "a" : "ä",\n' in text
+    assert json.loads(text)["data"]["a"] == "ä"
+
+
+def test_ControlCharacters_DoNotReachATerminal():
+    text, status = on_terminal(
+        "--api", ENTRIES, "--method", "echo", "--user", "alice", "--param", "a=\x1b[31m\x7f\x9b5n"
+    )
+    assert status == 0
+    assert not set(text) & {"\x1b", "\x7f", "\x9b"}
+    assert json.loads(text)["data"]["a"] == "\x1b[31m\x7f\x9b5n"
+
+
+@pytest.mark.parametrize(
+    "arguments, code, meaning",
+    [
+        (("--api", "QELO.Test.Nowhere", "--method", "x"), 102, "no such API"),
+        (("--api", ENTRIES, "--method", "x"), 103, "the API's version has no such method"),
+        (
+            ("--api", ENTRIES, "--method", "echo", "--version", "9"),
+            104,
+            "the API has no such version",
+        ),
+        (("--api", ENTRIES, "--method", "fail"), 400, "an error of the API's own"),
+        (
+            ("--api", "QELO.Test.Losing", "--method", "killed"),
+            117,
+            "the method could not be run or gave no answer",
+        ),
+    ],
+)
+def test_Error_FailsAndSaysWhatItMeans(arguments, code, meaning):
+    process = run(*arguments, "--user", "alice")
+    assert process.returncode == 1
+    assert json.loads(process.stdout)["error"]["code"] == code
+    assert process.stderr == f"webapi-exec: error {code}: {meaning}\n"
+
+
+def test_AnswerThatCannotBePrinted_IsAFailure():
+    with open("/dev/full", "w", encoding="ascii") as full:
+        process = subprocess.run(
+            [EXEC, "--api", ENTRIES, "--method", "echo", "--user", "alice"],
+            stdout=full,
+            stderr=subprocess.PIPE,
+            check=False,
+        )
+    assert process.returncode == 1
+
+
+def test_BundledAPI_Answers():
+    assert "hostName" in data_of(call("QELO.Host.Info", "get", user="admin"))
+
+
+# Parameters
+
+
+@pytest.mark.parametrize(
+    "text, value",
+    [
+        ("5", 5),
+        ("-1.5", -1.5),
+        ("true", True),
+        ("null", None),
+        ('"5"', "5"),
+        ("[1,2]", [1, 2]),
+        ('{"a":"b"}', {"a": "b"}),
+        ("", ""),
+        ("five", "five"),
+        ("a=b&c=d%20+e", "a=b&c=d%20+e"),
+        ("123456789012345678901234567890", "123456789012345678901234567890"),
+        ("[1,", "[1,"),
+    ],
+)
+def test_Param_IsReadLikeOnTheWire(text, value):
+    assert data_of(call(ENTRIES, "echo", "--param", f"name={text}"))["name"] == value
+
+
+def test_Param_NameMayHoldAnything():
+    assert data_of(call(ENTRIES, "echo", "--param", "a&b%41 ä=1"))["a&b%41 ä"] == 1
+
+
+def test_Json_GivesParameters_AndParamCountsBefore(tmp_path):
+    file = tmp_path / "params.json"
+    file.write_text('{"a": 1, "b": [1, 2], "method": "fail"}')
+    for arguments in (("--json", file, "--param", "a=2"), ("--param", "a=2", "--json", file)):
+        data = data_of(call(ENTRIES, "echo", *arguments))
+        assert (data["a"], data["b"], data["method"]) == (2, [1, 2], "echo")
+
+
+def test_Json_ComesFromStandardInput():
+    assert data_of(call(ENTRIES, "echo", "--json", "-", text='{"a": "x"}'))["a"] == "x"
+
+
+@pytest.mark.parametrize("text", ["", "{", "[1]", "5", '{"a": 1} x'])
+def test_Json_ThatIsNoObject_IsWrongUse(tmp_path, text):
+    file = tmp_path / "params.json"
+    file.write_text(text)
+    for arguments in (("--json", file), ("--json", "-")):
+        process = call(ENTRIES, "echo", *arguments, text=text)
+        assert (process.returncode, process.stdout) == (2, "")
+        assert process.stderr.startswith("webapi-exec: ")
+
+
+# What a method prints
+
+
+def test_Output_GetsTheBodyAlone(tmp_path):
+    file = tmp_path / "body"
+    file.write_text("what was there before, and longer")
+    arguments = ("--param", "body=first\r\n\r\nsecond", "--output", file)
+    assert data_of(call(DOWNLOAD, "print", *arguments)) == "printed"
+    assert file.read_bytes() == b"first\r\n\r\nsecond"
+
+
+def test_Output_OfManyBytesIsWhole(tmp_path):
+    file = tmp_path / "body"
+    data_of(call(DOWNLOAD, "bytes", "--param", "size=3000000", "--output", file))
+    assert file.read_bytes() == (bytes(range(256)) * 11719)[:3000000]
+
+
+def test_Output_NotAskedFor_IsDropped():
+    process = call(DOWNLOAD, "print", "--param", "body=text")
+    assert process.stdout == '{"data":"printed","httpd_restart":false,"success":true}\n'
+
+
+def test_Output_ThatCannotBeWritten_Fails(tmp_path):
+    process = call(DOWNLOAD, "print", "--output", tmp_path / "no" / "body")
+    assert (process.returncode, process.stdout) == (1, "")
+    assert "No such file or directory" in process.stderr
+
+
+# Batches
+
+CALLS = [
+    {"api": ENTRIES, "version": 1, "method": "echo"},
+    {"api": ENTRIES, "version": 1, "method": "fail", "code": 444},
+    {"api": "QELO.Test.Losing", "version": 1, "method": "killed"},
+    {"api": ENTRIES, "version": 2, "method": "process"},
+    {"api": "\x1b[31m", "method": "x\ny"},
+]
+
+
+def table(*outcomes):
+    rows = [
+        ("#", "API", "VERSION", "METHOD", "RESULT"),
+        ("1", ENTRIES, "1", "echo", outcomes[0]),
+        ("2", ENTRIES, "1", "fail", outcomes[1]),
+        ("3", "QELO.Test.Losing", "1", "killed", outcomes[2]),
+        ("4", ENTRIES, "2", "process", outcomes[3]),
+        ("5", " [31m", "-", "x y", outcomes[4]),
+    ]
+    return "".join(f"{a:1}  {b:17}  {c:7}  {d:7}  {e}\n" for a, b, c, d, e in rows)
+
+
+def test_Batch_ShowsTheResultsInTheOrderOfTheCalls(tmp_path):
+    file = tmp_path / "calls.json"
+    file.write_text(json.dumps(CALLS))
+    process = run("--batch", file, "--user", "alice")
+    assert process.returncode == 1
+    assert process.stdout == table(
+        "ok",
+        "error 444: an error of the API's own",
+        "no answer",
+        "ok",
+        "error 101: bad or missing input",
+    )
+    assert process.stderr == "webapi-exec: 3 of 5 calls failed\n"
+
+
+def test_Batch_InParallel_AndFromStandardInput():
+    process = run(
+        "--batch", "-", "--user", "alice", "--param", "mode=parallel", text=json.dumps(CALLS)
+    )
+    assert process.stdout == table(
+        "ok",
+        "error 444: an error of the API's own",
+        "error 117: the method could not be run or gave no answer",
+        "ok",
+        "error 101: bad or missing input",
+    )
+
+
+def test_Batch_ThatStopsWhenACallFails(tmp_path):
+    file = tmp_path / "calls.json"
+    stopped = "error 112: not run, since a call before it failed"
+    expected = table("ok", "error 444: an error of the API's own", stopped, stopped, stopped)
+    for text, arguments in (
+        (json.dumps(CALLS), ("--param", "stop_when_error=true")),
+        (json.dumps({"compound": CALLS, "stop_when_error": True}), ()),
+    ):
+        file.write_text(text)
+        assert run("--batch", file, "--user", "alice", *arguments).stdout == expected
+
+
+def test_Batch_ThatAllSucceeds_IsASuccess(tmp_path):
+    file = tmp_path / "calls.json"
+    for calls in (CALLS[:1] * 3, []):
+        file.write_text(json.dumps(calls))
+        process = run("--batch", file, "--user", "alice")
+        assert (process.returncode, process.stderr) == (0, "")
+        assert len(process.stdout.splitlines()) == 1 + len(calls)
+
+
+@pytest.mark.parametrize("text", ["", "{}", "5", '{"compound": {}}'])
+def test_Batch_WithoutAList_IsWrongUse(text):
+    process = run("--batch", "-", "--user", "alice", text=text)
+    assert (process.returncode, process.stdout) == (2, "")
+
+
+# Users
+
+
+@needs_root
+def test_User_IsRootWhenRootCalls():
+    assert data_of(run("--api", ENTRIES, "--method", "process", "--version", 2))["user"] == "root"
+
+
+@needs_root
+@pytest.mark.parametrize("user", ["alice", "admin"])
+def test_User_IsWhomRootNames(user):
+    data = data_of(call(IDENTITY, "asUser", user=user))
+    assert data["user"] == user
+    assert (data["euid"], data["egid"]) == account(user)
+    assert data["isAdmin"] == (user == "admin")
+
+
+def test_User_WhoDoesNotExist_IsAFailure():
+    process = call(ENTRIES, "echo", user="nobody-here")
+    assert (process.returncode, process.stdout) == (1, "")
+    assert process.stderr == "webapi-exec: there is no user nobody-here; --user names another\n"
+
+
+def reachable(path):
+    """Whether everybody may look up and read a file."""
+    folders = all(folder.stat().st_mode & stat.S_IXOTH for folder in path.parents)
+    return folders and bool(path.stat().st_mode & stat.S_IROTH)
+
+
+@needs_root
+def test_User_OtherThanOneself_IsForRootAlone():
+    if not reachable(EXEC):
+        pytest.skip("the build tree cannot be read by others")
+    uid, gid = account("alice")
+    identity = {"user": uid, "group": gid, "extra_groups": []}
+
+    def as_alice(method, *arguments):
+        return run("--api", IDENTITY, "--method", method, *arguments, cwd="/", **identity)
+
+    own = as_alice("asUser", "--user", "alice")
+    assert (data_of(own)["user"], data_of(own)["euid"]) == ("alice", uid)
+    other = as_alice("asUser", "--user", "bob")
+    assert (other.returncode, other.stdout) == (1, "")
+    assert other.stderr == "webapi-exec: only root may call as another user\n"
+    # The rights are the operating system's: what runs as another account cannot be run.
+    plain = as_alice("plain", "--user", "alice")
+    assert json.loads(plain.stdout)["error"]["code"] == 117
+    # The private root's accounts are none of the host, so the caller's own has no name here.
+    assert as_alice("asUser").returncode == 1
+
+
+# Names and help
+
+
+def test_List_PrintsTheNamesOfAPIsAndMethods():
+    names = run("--list").stdout.splitlines()
+    assert names == sorted(names)
+    assert {"QELO.Host.Info", ENTRIES, IDENTITY, "QELO.Entry.Request"} <= set(names)
+    assert run("--list", "--api", ENTRIES).stdout == "echo\nfail\nlarge\nprocess\n"
+    assert run("--list", "--api", ENTRIES, "--version", "2").stdout == "process\n"
+    assert "asUser" in run("--list", "--api", IDENTITY).stdout.splitlines()
+
+
+def test_List_OfAnUnknownAPI_Fails():
+    process = run("--list", "--api", "QELO.Test.Nowhere")
+    assert process.returncode == 1
+    assert process.stderr == "webapi-exec: there is no API QELO.Test.Nowhere\n"
+
+
+def test_List_WithoutDescriptions_Fails():
+    moved = DESCRIPTIONS.with_name("webapi.moved")
+    DESCRIPTIONS.rename(moved)
+    try:
+        process = run("--list")
+    finally:
+        moved.rename(DESCRIPTIONS)
+    assert process.returncode == 1
+    assert "there are no APIs" in process.stderr
+
+
+def test_Help_NamesEveryOption():
+    process = run("--help")
+    assert (process.returncode, process.stderr) == (0, "")
+    for option in ("api", "method", "version", "user", "param", "json", "output", "batch", "list"):
+        assert f"--{option}" in process.stdout
+    assert all(len(line) <= 100 for line in process.stdout.splitlines())
+
+
+@pytest.mark.parametrize(
+    "arguments",
+    [
+        (),
+        ("--api", ENTRIES),
+        ("--method", "echo"),
+        ("--nonsense",),
+        ("--api",),
+        ("word",),
+        ("--api", ENTRIES, "--method", "echo", "word"),
+        ("--api", ENTRIES, "--method", "echo", "--version", "0"),
+        ("--api", ENTRIES, "--method", "echo", "--version", "1x"),
+        ("--api", ENTRIES, "--method", "echo", "--param", "novalue"),
+        ("--api", ENTRIES, "--method", "echo", "--param", "=x"),
+        ("--api", ENTRIES, "--method", "echo", "--json", "/no/such/file"),
+        ("--api", ENTRIES, "--method", "echo", "--json", ""),
+        ("--api", ENTRIES, "--method", "echo", "--output", ""),
+        ("--batch", ""),
+        ("--batch", "/no/such/file"),
+        ("--batch", "/dev/null", "--api", ENTRIES),
+        ("--batch", "/dev/null", "--output", "x"),
+        ("--batch", "/dev/null", "--json", "x"),
+        ("--batch", "/dev/null", "--list"),
+        ("--list", "--method", "echo"),
+        ("--list", "--version", "1"),
+    ],
+)
+def test_WrongUse_SaysSo(arguments):
+    process = run(*arguments)
+    assert (process.returncode, process.stdout) == (2, "")
+    assert process.stderr.endswith("see webapi-exec --help\n")
+
+
+def completions(*words):
+    """What bash offers for the last of the words."""
+    script = f"""
+        . {COMPLETION}
+        COMP_WORDS=({EXEC} {' '.join(f"'{word}'" for word in words)})
+        COMP_CWORD=$((${{#COMP_WORDS[@]}} - 1))
+        _webapi_exec
+        printf '%s\\n' "${{COMPREPLY[@]}}"
+    """
+    process = subprocess.run(["bash", "-c", script], capture_output=True, text=True, check=True)
+    assert process.stderr == ""
+    return process.stdout.split()
+
+
+def test_Completion_OffersOptionsAndNamesOfTheCatalogue(tmp_path):
+    assert completions("--ba") == ["--batch"]
+    assert "--method" in completions("")
+    assert completions("--api", "QELO.Host.I") == ["QELO.Host.Info"]
+    assert set(completions("--api", "QELO.Test.E")) == {ENTRIES}
+    assert completions("--api", ENTRIES, "--method", "e") == ["echo"]
+    methods = {"echo", "fail", "large", "process"}
+    assert set(completions("--api", ENTRIES, "--method", "")) == methods
+    assert completions("--method", "e") == []
+    assert "root" in completions("--user", "roo")
+    (tmp_path / "calls.json").touch()
+    assert completions("--batch", f"{tmp_path}/ca") == [f"{tmp_path}/calls.json"]
+    assert completions("--param", "x") == []
