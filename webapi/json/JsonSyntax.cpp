@@ -3,7 +3,6 @@
 namespace QELO::JsonHelper {
 namespace {
 
-
 bool isDigit(char c) {
   return c >= '0' && c <= '9';
 }
