@@ -1,0 +1,81 @@
+#include <fcntl.h>
+
+#include <iostream>
+
+#include "tests/unit/runner/RunnerFixture.h"
+
+namespace QELO {
+namespace {
+
+class Streams : public RunnerTest {
+ protected:
+  /// What a call of the plugin leaves on descriptor 1 when "input" can be read from descriptor 0.
+  std::string Output(const std::string& plugin, const std::string& attributes) {
+    const std::string path = (directory / "output").string();
+    const int output = open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC, 0600);
+    Write((directory / "input").string(), "input input");
+    const int input = open((directory / "input").c_str(), O_RDONLY);
+    std::cout.flush();
+    fflush(stdout);
+    const int formerOutput = dup(1);
+    const int formerInput = dup(0);
+    dup2(output, 1);
+    dup2(input, 0);
+    printf("before ");
+    ProcessPlugin(plugin, attributes);
+    printf(" after");
+    fflush(stdout);
+    dup2(formerOutput, 1);
+    dup2(formerInput, 0);
+    for (const int fd : {output, input, formerOutput, formerInput}) {
+      close(fd);
+    }
+    std::ifstream file(path);
+    return std::string(std::istreambuf_iterator<char>(file), {});
+  }
+};
+
+TEST_F(Streams, WhatAMethodPrintsGoesNowhere) {
+  EXPECT_EQ(Output("printing", "{}"), "before  after");
+  EXPECT_EQ(Data(), Json::Value("printed"));
+}
+
+TEST_F(Streams, DownloadMethodPrints) {
+  const std::string output = Output("printing", R"({"allowDownload": true})");
+  for (const char* way : {"<C++ stream>", "<C stream>", "<descriptor>"}) {
+    EXPECT_NE(output.find(way), std::string::npos) << way << " in " << output;
+  }
+}
+
+TEST_F(Streams, MethodReadsEndOfFileAtOnce) {
+  Output("reading", "{}");
+  EXPECT_EQ(Data(), Parse(R"({"stream": "", "file": 0, "descriptor": 0})"));
+}
+
+TEST_F(Streams, UploadMethodReadsTheInput) {
+  Output("reading", R"({"allowUpload": true})");
+  EXPECT_EQ(Data()["stream"], Json::Value("input"));
+}
+
+TEST_F(Streams, InputReadAheadStaysUnread) {
+  int ends[2];
+  ASSERT_EQ(pipe(ends), 0);
+  ASSERT_EQ(write(ends[1], "abc", 3), 3);
+  close(ends[1]);
+  const int former = dup(0);
+  dup2(ends[0], 0);
+  clearerr(stdin);
+  EXPECT_EQ(getchar(), 'a');
+  ProcessPlugin("reading");
+  EXPECT_EQ(Data()["file"], Json::Value(0));
+  EXPECT_EQ(getchar(), 'b');
+  EXPECT_EQ(getchar(), 'c');
+  EXPECT_EQ(getchar(), EOF);
+  clearerr(stdin);
+  dup2(former, 0);
+  close(former);
+  close(ends[0]);
+}
+
+}  // namespace
+}  // namespace QELO
