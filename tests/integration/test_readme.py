@@ -11,9 +11,9 @@ README = (SOURCE / "README.md").read_text()
 PORT = "127.0.0.1:8080"
 
 
-def block(name):
+def block(name, text=README):
     """The code blocks that are marked for a test, joined."""
-    found = re.findall(rf"<!-- test: {name} -->\n```\w+\n(.*?)```", README, re.DOTALL)
+    found = re.findall(rf"<!-- test: {name} -->\n```\w+\n(.*?)```", text, re.DOTALL)
     assert found, name
     return "".join(found)
 
@@ -40,6 +40,14 @@ def test_FirstCalls_Work(server, tmp_path):
     assert set(login) == {"sid", "token", "user"}
     assert current["user"] == "alice"
     assert "QELO.Catalog.API" in {api["api"] for api in catalogue["apis"]}
+
+
+def test_CompoundExample_Works(server, alice, tmp_path):
+    text = (SOURCE / "docs" / "compound.md").read_text()
+    preamble = f"URL=http://{PORT}/webapi/entry.cgi\nSID={alice['sid']}\n"
+    answer = json.loads(run(preamble + block("compound", text), tmp_path, server.port))
+    assert not answer["data"]["has_fail"]
+    assert [result["method"] for result in answer["data"]["result"]] == ["current", "list"]
 
 
 def test_FirstApiLibrary_IsBuiltAndAnswers(server, tmp_path):
