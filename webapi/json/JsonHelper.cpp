@@ -150,6 +150,9 @@ bool hasMember(const Json::Value& value, const std::string& key) {
 }
 
 std::string asString(const Json::Value& value, const std::string& fallback) {
+  if (value.type() == Json::realValue) {
+    return toString(value);  // the library's own form has digits that no one wrote
+  }
   return value.isConvertibleTo(Json::stringValue) ? value.asString() : fallback;
 }
 

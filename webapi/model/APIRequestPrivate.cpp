@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <cstdlib>
+#include <vector>
 
 #include "webapi/JsonHelper.h"
 #include "webapi/platform/Cgi.h"
@@ -49,16 +50,20 @@ void APIRequestPrivate::InitEnv(const Json::Value& env) {
 }
 
 void APIRequestPrivate::InitParam(const Json::Value& params, bool replace) {
+  // Copied before anything changes: `params` may lie in the section that is cleared and filled.
+  std::vector<Json::Value> sections;
+  for (const char* source : {"getParam", "postParam"}) {
+    if (JsonHelper::hasMember(params, source)) {
+      sections.push_back(JsonHelper::member(params, source));
+    }
+  }
   if (replace) {
     ClearData("param", "");
   }
-  for (const char* source : {"getParam", "postParam"}) {
-    if (JsonHelper::hasMember(params, source)) {
-      Json::Value section = JsonHelper::member(params, source);
-      DecryptParam(section);
-      SetData("param", section, false);
-      SetAPIDesc(section);
-    }
+  for (Json::Value& section : sections) {
+    DecryptParam(section);
+    SetData("param", section, false);
+    SetAPIDesc(section);
   }
 }
 

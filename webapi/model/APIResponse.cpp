@@ -1,6 +1,8 @@
 #include "webapi/APIResponse.h"
 
-#include <charconv>
+#include <cerrno>
+#include <cstdlib>
+#include <utility>
 
 #include "webapi/JsonHelper.h"
 #include "webapi/model/APIResponsePrivate.h"
@@ -68,9 +70,9 @@ bool APIResponse::SetStatus(_tag_HTTP_STATUS_CODE code, const std::string& messa
 int APIResponse::GetStatus() const {
   // Only the front is read: a method may set the header with a reason behind the code.
   const std::string text = GetHeader("Status", "200");
-  int code = 0;
-  std::from_chars(text.data(), text.data() + text.size(), code);
-  return code;
+  errno = 0;
+  const long code = std::strtol(text.c_str(), nullptr, 10);
+  return errno == 0 && std::in_range<int>(code) ? static_cast<int>(code) : 0;
 }
 
 bool APIResponse::Redirect(const std::string& path) {

@@ -21,6 +21,7 @@ APIResponsePrivate::APIResponsePrivate(APIRequest* request, APIResponse* owner)
 }
 
 void APIResponsePrivate::SetError(int code, const Json::Value& data) {
+  PrepareTask();
   Json::Value body(Json::objectValue);
   body["success"] = code == 0;
   if (code != 0) {
@@ -34,9 +35,7 @@ void APIResponsePrivate::SetError(int code, const Json::Value& data) {
   }
   store_["code"] = code;
   store_["body"] = std::move(body);
-  if (request_ != nullptr && request_->IsPollingTask()) {
-    UpdateTask();
-  }
+  UpdateTask();
 }
 
 bool APIResponsePrivate::SetStatus(int code, const std::string& message) {

@@ -40,14 +40,15 @@ class APIResponsePrivate : public APIBase {
   /// "; expires=..." of a cookie, or "".
   std::string CookieExpiry(long minutes) const;
   bool AppendCookie(const std::string& line);
-  /// Makes the body the result of the background task that the request is.
+  /// Makes the handle of the background task that the request is, unless this process has one.
+  void PrepareTask();
+  /// Makes the body the result of the task, if there is a handle of one.
   void UpdateTask();
 
   APIRequest* request_;
   APIResponse* owner_;
   std::unique_ptr<ARDO::Task> task_;  ///< null until a background task sets a result
-  std::string taskUser_;
-  pid_t taskProcess_ = 0;  ///< the one that made the handle
+  pid_t taskProcess_ = 0;             ///< the one that made the handle
   APIResponse::CallbackList callbacks_;
 };
 

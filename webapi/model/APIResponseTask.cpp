@@ -11,18 +11,25 @@ namespace QELO {
 
 APIResponsePrivate::~APIResponsePrivate() = default;
 
-void APIResponsePrivate::UpdateTask() {
-  const std::string user = JsonHelper::asString(request_->GetEnv("task_user"));
-  const std::string id = JsonHelper::asString(request_->GetEnv("task_id"));
+void APIResponsePrivate::PrepareTask() {
   if (task_ != nullptr && taskProcess_ != getpid()) {
-    // A task that a task started: the handle is its parent's, whose process still uses what it
-    // holds open, and must not be closed here.
-    static_cast<void>(task_.release());
+    // A process that the task forked may be a task of its own, so it must not write into its
+    // parent's. A handle keeps nothing but memory, of which a fork has its own copy: deleting it
+    // here takes nothing from the parent.
+    task_.reset();
   }
-  if (task_ == nullptr || user != taskUser_ || id != task_->getTaskId()) {
-    task_ = std::make_unique<ARDO::Task>(user, id);
-    taskUser_ = user;
+  if (task_ == nullptr && request_ != nullptr && request_->IsPollingTask()) {
+    task_ = std::make_unique<ARDO::Task>(JsonHelper::asString(request_->GetEnv("task_user")),
+                                         JsonHelper::asString(request_->GetEnv("task_id")));
     taskProcess_ = getpid();
+  }
+}
+
+void APIResponsePrivate::UpdateTask() {
+  // The handle alone decides: a method may replace the request's environment, and whoever polls
+  // must see its later results all the same.
+  if (task_ == nullptr) {
+    return;
   }
   task_->beginUpdate();
   task_->setProperty("body", store_["body"]);

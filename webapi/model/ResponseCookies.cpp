@@ -74,7 +74,7 @@ std::string APIResponsePrivate::CookieExpiry(long minutes) const {
 }
 
 bool APIResponsePrivate::AppendCookie(const std::string& line) {
-  if (!store_.isObject()) {
+  if (!JsonHelper::hasMember(store_, "setCookie")) {
     return false;
   }
   Json::Value& cookies = store_["setCookie"];
