@@ -41,8 +41,8 @@ class WEBAPI_API APIRunner {
   /// Prepares the runner's request. @return false with the response's error set
   virtual bool Initialize(const Json::Value& param);
 
-  /// Permission and upload hooks, asked by an execution in this order. Here they let every
-  /// request pass: true, false, true, true, true.
+  /// Permission and upload hooks; IsPermitted() says in which order they are asked. Here they let
+  /// every request pass: true, false, true, true, true.
   virtual bool CheckSharingPermission(APIRequest* request, APIResponse* response);
   virtual bool NeedPermission(APIRequest* request);
   virtual bool CheckPermission(APIRequest* request, APIResponse* response);
@@ -124,6 +124,8 @@ class WEBAPI_API APIRunner {
   void CloseLib();
 
  private:
+  /// GetMethod(), or the defaults where a description gives the method no object.
+  const Json::Value& GetAttributes(const std::string& api, int version, const std::string& method);
   void AddDescriptions(Json::Value& catalogue, const Json::Value& file) const;
 
   Json::Value libDef;

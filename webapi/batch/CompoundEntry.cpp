@@ -60,10 +60,8 @@ int CompoundHandler::CompoundProcessEntry(const Json::Value& entry, unsigned ind
   if (stopWhenError_ && hasFail_) {
     return RefuseEntry(WEBAPI_ERR_COMPOUND_STOPPED, "compound stop when error.", index);
   }
-  const Json::Value& method = runner_->GetMethod(
-      entryRequest_->GetAPIClass(), entryRequest_->GetAPIVersion(), entryRequest_->GetAPIMethod());
-  if (JsonHelper::asBool(JsonHelper::member(method, "allowUpload")) ||
-      JsonHelper::asBool(JsonHelper::member(method, "allowDownload"))) {
+  if (runner_->GetMethodAttr(entryRequest_.get(), "allowUpload") ||
+      runner_->GetMethodAttr(entryRequest_.get(), "allowDownload")) {
     return RefuseEntry(WEBAPI_ERR_COMPOUND_TRANSFER, "not allow upload or download API.", index);
   }
   if (parallel_ || (!runner_->GetMethodAttr(entryRequest_.get(), "grantable") &&

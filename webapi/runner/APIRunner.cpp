@@ -100,6 +100,9 @@ Json::Value APIRunner::GetResponse() const {
     return Json::Value();
   }
   Json::Value body = response_->GetBody();
+  if (!body.isObject()) {  // a method may change the record in place
+    body = Json::Value(Json::objectValue);
+  }
   body["httpd_restart"] = response_->GetHttpdRestart();
   return body;
 }
@@ -120,8 +123,8 @@ bool APIRunner::SetProcessName(APIRequest* request, APIResponse* response) {
   APIRunnerPrivate::SetLogIdentity(full);
   private_->SetArgv0(full);
   if (prctl(PR_SET_NAME, call.substr(0, 16).c_str()) != 0) {
-    response->SetError(WEBAPI_ERR_PROCESS_NAME);
     WEBAPI_LOG("APIRunner.cpp", "Set process name fail[%m]");
+    response->SetError(WEBAPI_ERR_PROCESS_NAME);
     return false;
   }
   return true;

@@ -157,12 +157,15 @@ const Json::Value& APIRunner::GetMethod(const std::string& api, int version,
   return defaults;
 }
 
+const Json::Value& APIRunner::GetAttributes(const std::string& api, int version,
+                                            const std::string& method) {
+  const Json::Value& attributes = GetMethod(api, version, method);
+  return attributes.isObject() ? attributes : JsonHelper::member(libDef, "methods");
+}
+
 bool APIRunner::GetMethodAttr(const std::string& api, int version, const std::string& method,
                               const std::string& attribute) {
-  const Json::Value& attributes = GetMethod(api, version, method);
-  const Json::Value& from =
-      attributes.isObject() ? attributes : JsonHelper::member(libDef, "methods");
-  return JsonHelper::asBool(JsonHelper::member(from, attribute));
+  return JsonHelper::asBool(JsonHelper::member(GetAttributes(api, version, method), attribute));
 }
 
 bool APIRunner::GetMethodAttr(APIRequest* request, const std::string& attribute) {

@@ -113,7 +113,9 @@ bool APIRunner::HandleCallback(APIResponse* response) {
     return child > 0;
   }
   setsid();
-  sleep(kCallbackDelaySeconds);
+  for (unsigned left = kCallbackDelaySeconds; left > 0;) {
+    left = sleep(left);  // shortened by signals
+  }
   for (const auto& [function, argument] : *response->GetCallbackFuncs()) {
     Fence("callback", [call = function, value = argument] { call(value); });
   }

@@ -28,8 +28,8 @@ const Entry& findEntry(const Entry* table, const APIRequest& request) {
   const std::string api = request.GetAPIClass();
   const int version = request.GetAPIVersion();
   const std::string method = request.GetAPIMethod();
-  while (table->api != nullptr &&
-         (table->version != version || api != table->api || method != table->method)) {
+  while (table->api != nullptr && (table->version != version || api != table->api ||
+                                   table->method == nullptr || method != table->method)) {
     ++table;
   }
   return *table;
@@ -128,7 +128,7 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
     return false;
   }
   const Json::Value attributes =
-      GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
+      GetAttributes(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
   const bool allowUpload = isSet(attributes, "allowUpload");
   if (JsonHelper::asBool(Request()->GetAttr("_collector_count_webapi")) &&
       !isSet(attributes, "allowTimeout") &&
@@ -144,6 +144,11 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
   const WorkingDirectory directory;
   Priority priority;
   const StandardStreams streams(!allowUpload, !isSet(attributes, "allowDownload"));
+  if (!streams.IsShut()) {
+    WEBAPI_LOG("APIRunner.cpp", "cannot shut the standard streams. [%m]");
+    response->SetError(WEBAPI_ERR_NO_ANSWER);
+    return false;
+  }
   _tag_API_TABLE* table = nullptr;
   _tag_API_CHECK_TABLE* checkTable = nullptr;
   if (!OpenLib(request, &table, &checkTable) || table == nullptr) {
@@ -155,7 +160,7 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
     return false;
   }
   const _tag_API_TABLE& entry = findEntry(table, *request);
-  if (entry.api == nullptr) {
+  if (entry.api == nullptr || entry.function == nullptr) {
     response->SetError(WEBAPI_ERR_METHOD_MISSING);
     return false;
   }

@@ -63,7 +63,9 @@ bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {
     return false;
   }
   *table = nullptr;
-  Fence("GetAPITable", [&] { *table = reinterpret_cast<_tag_API_TABLE* (*)()>(symbol)(); });
+  if (symbol != nullptr) {
+    Fence("GetAPITable", [&] { *table = reinterpret_cast<_tag_API_TABLE* (*)()>(symbol)(); });
+  }
   if (*table == nullptr) {
     WEBAPI_LOG("APIRunner.cpp", "cannot get api table");
     return false;

@@ -4,98 +4,104 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <cstdio>
 #include <iostream>
 
 namespace QELO {
 namespace {
 
-constexpr char kNull[] = "/dev/null";
+constexpr int kFirstOther = 3;  // the descriptors below are the standard ones
 
-/// Puts /dev/null in a descriptor's place. @return the former one, or -1
-int replaceByNull(int descriptor, int flags) {
-  const int former = fcntl(descriptor, F_DUPFD_CLOEXEC, 3);
-  const int null = open(kNull, flags | O_CLOEXEC);
-  if (null >= 0) {
-    dup2(null, descriptor);
-    close(null);
+/// A method may have closed a C stream; the framework goes on using it.
+std::FILE* revived(std::FILE* stream, int descriptor, const char* mode) {
+  if (fileno(stream) < 0) {
+    std::FILE* fresh = fdopen(descriptor, mode);
+    return fresh != nullptr ? fresh : stream;
   }
-  return former;
-}
-
-void restoreDescriptor(int descriptor, int former) {
-  if (former < 0) {
-    close(descriptor);  // it was closed before
-    return;
-  }
-  dup2(former, descriptor);
-  close(former);
+  clearerr(stream);
+  return stream;
 }
 
 }  // namespace
+
+bool NullDescriptor::Replace(int descriptor) {
+  const int former = fcntl(descriptor, F_DUPFD_CLOEXEC, kFirstOther);
+  if (former < 0 && errno != EBADF) {
+    return false;
+  }
+  const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
+  // The lowest number is free when the descriptor was closed before: then it is in place already.
+  const bool replaced = null == descriptor ? fcntl(null, F_SETFD, 0) == 0
+                                           : null >= 0 && dup2(null, descriptor) == descriptor;
+  if (null >= 0 && null != descriptor) {
+    close(null);
+  }
+  if (!replaced) {
+    if (former >= 0) {
+      close(former);
+    }
+    return false;
+  }
+  descriptor_ = descriptor;
+  former_ = former;
+  return true;
+}
+
+NullDescriptor::~NullDescriptor() {
+  if (descriptor_ < 0) {
+    return;
+  }
+  if (former_ < 0) {
+    close(descriptor_);
+    return;
+  }
+  dup2(former_, descriptor_);
+  close(former_);
+}
+
+void NullDescriptor::LetGo() {
+  if (former_ >= 0) {
+    close(former_);
+    former_ = -1;
+  }
+}
 
 StandardStreams* StandardStreams::innermost_ = nullptr;
 
 StandardStreams::StandardStreams(bool shutInput, bool shutOutput) : outer_(innermost_) {
   innermost_ = this;
   if (shutInput) {
-    ShutInput();
+    inputBuffer_ = std::cin.rdbuf(&null_);
+    isShut_ = input_.Replace(STDIN_FILENO);
   }
   if (shutOutput) {
-    ShutOutput();
+    std::cout.flush();
+    std::fflush(stdout);
+    outputBuffer_ = std::cout.rdbuf(&null_);
+    isShut_ = output_.Replace(STDOUT_FILENO) && isShut_;
   }
 }
 
 StandardStreams::~StandardStreams() {
   innermost_ = outer_;
-  if (inputBuffer_ != nullptr) {
-    GiveBackInput();
-  }
   if (outputBuffer_ != nullptr) {
-    GiveBackOutput();
+    std::cout.flush();
+    std::fflush(stdout);  // what a method left in the buffer ends in /dev/null
+    std::cout.rdbuf(outputBuffer_);
+    stdout = revived(stdout, STDOUT_FILENO, "w");
+  }
+  if (inputBuffer_ != nullptr) {
+    std::cin.rdbuf(inputBuffer_);
+    stdin = revived(stdin, STDIN_FILENO, "r");
   }
 }
 
 void StandardStreams::LetGo() {
   for (StandardStreams* guard = innermost_; guard != nullptr; guard = guard->outer_) {
-    for (int* descriptor : {&guard->inputDescriptor_, &guard->outputDescriptor_}) {
-      if (*descriptor >= 0) {
-        close(*descriptor);
-        *descriptor = -1;
-      }
-    }
+    guard->input_.LetGo();
+    guard->output_.LetGo();
   }
-}
-
-void StandardStreams::ShutInput() {
-  inputBuffer_ = std::cin.rdbuf(&null_);
-  // A stream of its own: the former one may hold input that was read ahead.
-  inputFile_ = stdin;
-  std::FILE* null = std::fopen(kNull, "re");
-  stdin = null != nullptr ? null : inputFile_;
-  inputDescriptor_ = replaceByNull(STDIN_FILENO, O_RDONLY);
-}
-
-void StandardStreams::GiveBackInput() {
-  if (stdin != inputFile_) {
-    std::fclose(stdin);
-    stdin = inputFile_;
-  }
-  restoreDescriptor(STDIN_FILENO, inputDescriptor_);
-  std::cin.rdbuf(inputBuffer_);
-}
-
-void StandardStreams::ShutOutput() {
-  std::cout.flush();
-  std::fflush(stdout);
-  outputBuffer_ = std::cout.rdbuf(&null_);
-  outputDescriptor_ = replaceByNull(STDOUT_FILENO, O_WRONLY | O_TRUNC);
-}
-
-void StandardStreams::GiveBackOutput() {
-  std::cout.flush();
-  std::fflush(stdout);
-  restoreDescriptor(STDOUT_FILENO, outputDescriptor_);
-  std::cout.rdbuf(outputBuffer_);
 }
 
 Priority::~Priority() {

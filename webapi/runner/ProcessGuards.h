@@ -1,15 +1,33 @@
 #pragma once
 
-#include <cstdio>
 #include <streambuf>
 
 namespace QELO {
+
+/// Puts /dev/null in the place of one standard descriptor, and gives the former one back at the
+/// end.
+class NullDescriptor {
+ public:
+  NullDescriptor() = default;
+  NullDescriptor(const NullDescriptor&) = delete;
+  NullDescriptor& operator=(const NullDescriptor&) = delete;
+  ~NullDescriptor();
+
+  /// @return false, and the descriptor as it was, when it cannot be kept or replaced
+  bool Replace(int descriptor);
+  /// Closes the former one, which then is not given back.
+  void LetGo();
+
+ private:
+  int descriptor_ = -1;
+  int former_ = -1;  ///< -1: it was closed before
+};
 
 /// Shuts foreign code off from standard input and output, and gives them back at the end.
 ///
 /// Each stream exists three times, and an API library may use any of them: the C++ stream, the C
 /// stream and the descriptor. All three lead to /dev/null meanwhile. What was written before goes
-/// out before; what was read ahead stays unread.
+/// out before.
 class StandardStreams {
  public:
   StandardStreams(bool shutInput, bool shutOutput);
@@ -17,16 +35,14 @@ class StandardStreams {
   StandardStreams& operator=(const StandardStreams&) = delete;
   ~StandardStreams();
 
+  /// Whether all that was to be shut is. Otherwise no foreign code may run.
+  bool IsShut() const { return isShut_; }
+
   /// For a forked child that outlives the request and never returns to the guard's owner: closes
   /// the former descriptors, whose last holder the web server waits for.
   static void LetGo();
 
  private:
-  void ShutInput();
-  void ShutOutput();
-  void GiveBackInput();
-  void GiveBackOutput();
-
   /// Nothing to read, and nothing kept of what is written: what /dev/null is to a stream.
   class NullBuffer : public std::streambuf {
    protected:
@@ -35,11 +51,11 @@ class StandardStreams {
   };
 
   NullBuffer null_;
+  NullDescriptor input_;
+  NullDescriptor output_;
   std::streambuf* inputBuffer_ = nullptr;
   std::streambuf* outputBuffer_ = nullptr;
-  std::FILE* inputFile_ = nullptr;
-  int inputDescriptor_ = -1;
-  int outputDescriptor_ = -1;
+  bool isShut_ = true;
   StandardStreams* outer_;  ///< the guard around this one: calls nest
   static StandardStreams* innermost_;
 };

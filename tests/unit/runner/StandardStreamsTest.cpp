@@ -57,25 +57,5 @@ TEST_F(Streams, UploadMethodReadsTheInput) {
   EXPECT_EQ(Data()["stream"], Json::Value("input"));
 }
 
-TEST_F(Streams, InputReadAheadStaysUnread) {
-  int ends[2];
-  ASSERT_EQ(pipe(ends), 0);
-  ASSERT_EQ(write(ends[1], "abc", 3), 3);
-  close(ends[1]);
-  const int former = dup(0);
-  dup2(ends[0], 0);
-  clearerr(stdin);
-  EXPECT_EQ(getchar(), 'a');
-  ProcessPlugin("reading");
-  EXPECT_EQ(Data()["file"], Json::Value(0));
-  EXPECT_EQ(getchar(), 'b');
-  EXPECT_EQ(getchar(), 'c');
-  EXPECT_EQ(getchar(), EOF);
-  clearerr(stdin);
-  dup2(former, 0);
-  close(former);
-  close(ends[0]);
-}
-
 }  // namespace
 }  // namespace QELO

@@ -1,0 +1,163 @@
+// What a careless or unlucky method must not do to the process around it.
+
+#include <fcntl.h>
+#include <sys/prctl.h>
+#include <sys/resource.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+
+#include <cerrno>
+#include <cstdarg>
+
+#include "tests/unit/runner/RunnerFixture.h"
+
+namespace {
+bool failPrctl = false;
+int priorityCalls = 0;
+}  // namespace
+
+// These take the place of the C library's for the whole test program.
+extern "C" __attribute__((visibility("default"))) int prctl(int option, ...) {
+  if (failPrctl) {
+    errno = EFAULT;
+    return -1;
+  }
+  va_list args;
+  va_start(args, option);
+  const unsigned long argument = va_arg(args, unsigned long);
+  va_end(args);
+  return static_cast<int>(syscall(SYS_prctl, option, argument, 0, 0, 0));
+}
+
+extern "C" __attribute__((visibility("default"))) int setpriority(__priority_which_t which,
+                                                                  id_t who, int value) noexcept {
+  ++priorityCalls;
+  return static_cast<int>(syscall(SYS_setpriority, which, who, value));
+}
+
+namespace QELO {
+namespace {
+
+class Hardening : public RunnerTest {
+ protected:
+  void TearDown() override {
+    failPrctl = false;
+    RunnerTest::TearDown();
+  }
+  /// Runs the body in a child. @return whether it ended with true
+  template <typename Body>
+  static bool InChild(Body body) {
+    fflush(nullptr);
+    const pid_t child = fork();
+    if (child == 0) {
+      _exit(body() ? 0 : 1);
+    }
+    int status = -1;
+    return waitpid(child, &status, 0) == child && status == 0;
+  }
+};
+
+TEST_F(Hardening, ProcessThatCannotBeNamedIs118) {
+  MakeRequest("QELO.Test.Call", 1, "run");
+  TestRunner tested;
+  failPrctl = true;
+  EXPECT_FALSE(tested.SetProcessName(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 118);
+  EXPECT_EQ(SyslogCapture::Count("Set process name fail["), 1);
+}
+
+TEST_F(Hardening, PriorityThatIsTheCurrentOneIsNotSet) {
+  priorityCalls = 0;
+  Json::Value description = Description("state");
+  description["priority"] = getpriority(PRIO_PROCESS, 0);
+  WriteDescription(description);
+  MakeRequest("QELO.Test.Call", 1, "run");
+  EXPECT_TRUE(TestRunner().Process(request.get(), response.get()));
+  EXPECT_EQ(priorityCalls, 0);
+}
+
+TEST_F(Hardening, PriorityComesBackAfterARefusedCheck) {
+  Json::Value description = Description("checked");
+  description["priority"] = 7;
+  WriteDescription(description);
+  MakeRequest("QELO.Test.Call", 1, "run");
+  const int former = getpriority(PRIO_PROCESS, 0);
+  priorityCalls = 0;
+  EXPECT_FALSE(TestRunner().Process(request.get(), response.get()));
+  EXPECT_EQ(priorityCalls, 2);
+  EXPECT_TRUE(geteuid() != 0 || getpriority(PRIO_PROCESS, 0) == former);
+}
+
+TEST_F(Hardening, MethodThatClosesTheCStreamsDoesNotSilenceTheProcess) {
+  EXPECT_TRUE(InChild([&] {
+    const std::string path = (directory / "output").string();
+    dup2(open(path.c_str(), O_RDWR | O_CREAT, 0600), STDOUT_FILENO);
+    const bool called = ProcessPlugin("closing") && ProcessPlugin("closing");
+    printf("still here");
+    fflush(stdout);
+    std::ifstream file(path);
+    return called && std::string(std::istreambuf_iterator<char>(file), {}).find("still here") == 0;
+  }));
+}
+
+TEST_F(Hardening, NoDescriptorLeftStopsTheCallAndKeepsTheStreams) {
+  EXPECT_TRUE(InChild([&] {
+    ProcessPlugin("state");  // everything is loaded
+    rlimit limit{};
+    getrlimit(RLIMIT_NOFILE, &limit);
+    limit.rlim_cur = static_cast<rlim_t>(open("/dev/null", O_RDONLY));
+    setrlimit(RLIMIT_NOFILE, &limit);
+    response->SetSuccess();
+    const bool called = runner->ProcessLib(request.get(), response.get());
+    return !called && response->GetError() == 117 && fcntl(0, F_GETFD) >= 0 &&
+           fcntl(1, F_GETFD) >= 0 &&
+           SyslogCapture::Count("cannot shut the standard streams. [") == 1;
+  }));
+}
+
+TEST_F(Hardening, ClosedStandardDescriptorsStayClosed) {
+  EXPECT_TRUE(InChild([&] {
+    close(0);
+    close(1);
+    return ProcessPlugin("printing") && fcntl(0, F_GETFD) < 0 && fcntl(1, F_GETFD) < 0;
+  }));
+}
+
+TEST_F(Hardening, TableEntryWithoutNameIsSkippedAndWithoutFunctionIs121) {
+  EXPECT_TRUE(ProcessPlugin("holed_table", "{}", 1));
+  EXPECT_FALSE(ProcessPlugin("holed_table", "{}", 2));
+  EXPECT_EQ(response->GetError(), 121);
+}
+
+TEST_F(Hardening, AttributesThatAreNoObjectGiveTheDefaultsThroughout) {
+  WriteLibDef(R"({"methods": {"grantable": true, "runAs": "backup"}})");
+  EXPECT_TRUE(ProcessPlugin("state", "null"));
+  EXPECT_EQ(platform->calls.back(), "ResetCredentialsByName(backup, keep)");
+}
+
+TEST_F(Hardening, BodyThatIsNoObjectIsReplacedInTheAnswer) {
+  TestRunner tested;
+  tested.Response()->Serialize()["body"] = "text";
+  EXPECT_EQ(tested.GetResponse(), Parse(R"({"httpd_restart": false})"));
+}
+
+TEST_F(Hardening, RestartOfTheWebServerIsInTheAnswer) {
+  TestRunner tested;
+  tested.Response()->SetHttpdRestart(true);
+  EXPECT_EQ(tested.GetResponse()["httpd_restart"], Json::Value(true));
+}
+
+TEST_F(Hardening, CountingNeedsTheRunnersOwnAttribute) {
+  platform->settings["enable_data_collect"] = "yes";
+  EXPECT_TRUE(InChild([&] {
+    std::filesystem::remove_all(Paths::kCounterDir);
+    WriteDescription(Description("state"));
+    MakeRequest("QELO.Test.Call", 1, "run");
+    request->SetAttr("_collector_count_webapi", true);
+    return TestRunner().Process(request.get(), response.get()) &&
+           !std::filesystem::exists(Paths::kCounterDir);
+  }));
+}
+
+}  // namespace
+}  // namespace QELO
