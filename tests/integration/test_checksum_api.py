@@ -4,6 +4,7 @@ import hashlib
 import os
 import shutil
 import subprocess
+import time
 
 import pytest
 
@@ -41,6 +42,13 @@ def put(path, content, mode=0o644):
     give_to_alice(path)
     path.chmod(mode)
     return path
+
+
+def put_large(directory):
+    """A file that takes a minute to read and no room on the disk."""
+    with open(directory / "large", "wb") as file:
+        file.truncate(20 << 30)
+    give_to_alice(directory / "large")
 
 
 def run(user, **parameters):
@@ -171,9 +179,7 @@ def test_Checksum_OfAnotherUsersDirectory_IsDenied(alice, root):
 
 
 def test_Checksum_WhileItReads_TellsHowFarItIs(alice, home):
-    with open(home / "large", "wb") as file:
-        file.truncate(20 << 30)  # a hole: nothing on the disk, minutes of work
-    give_to_alice(home / "large")
+    put_large(home)
     full_id = alice.call(API, "start", path=home).data["task_id"]
     alice.started.append((alice, full_id))
     state = ""
@@ -192,10 +198,20 @@ def test_Checksum_WhileItReads_TellsHowFarItIs(alice, home):
     assert alice.status(full_id).data["finish"] is True
 
 
+def test_Checksum_IsRenewedAtMostFiveTimesASecond(alice, home):
+    put_large(home)
+    full_id = alice.call(API, "start", path=home).data["task_id"]
+    alice.started.append((alice, full_id))
+    states = {}
+    begin = time.monotonic()
+    while time.monotonic() - begin < 1.5:
+        data = alice.status(full_id).data["data"]
+        states[data["bytes"]["done"]] = data
+    assert 3 <= len(states) <= 9
+
+
 def test_Checksum_FiveAtOnce_IsRefused(alice, home):
-    with open(home / "large", "wb") as file:
-        file.truncate(20 << 30)
-    give_to_alice(home / "large")
+    put_large(home)
     ids = []
     for _ in range(4):
         ids.append(alice.call(API, "start", path=home).data["task_id"])

@@ -3,11 +3,13 @@
 import json
 import os
 import signal
+import subprocess
 import time
+from urllib.parse import urlencode
 
 import pytest
 
-from conftest import SESSIONS, needs_root
+from conftest import ENTRY, SESSIONS, needs_root
 from tasks import LONG, TASK, WORK, User, assert_ends, is_running, started  # noqa: F401
 
 
@@ -86,6 +88,21 @@ def test_Start_WithinACompoundRequest_AnswersWhileTheWorkGoesOn(alice):
             full_id = result["data"]["task_id"]
             alice.started.append((alice, full_id))
             assert alice.status(full_id).data["finish"] is False
+
+
+def test_Start_WhoseOwnProcessIsKilled_GoesOn(alice):
+    query = urlencode({"api": WORK, "version": 1, "method": "start", "prefix": "orphan_",
+                       "silent": 5, "steps": 3, "pause": 100, "_sid": alice.sid})
+    environment = {"REQUEST_METHOD": "GET", "QUERY_STRING": query, "REMOTE_ADDR": "127.0.0.1"}
+    process = subprocess.Popen([ENTRY], env=environment, stdout=subprocess.DEVNULL)
+    deadline = time.monotonic() + 10
+    while not (found := alice.call(TASK, "list", prefix="orphan_").data["user"]):
+        assert time.monotonic() < deadline
+    time.sleep(0.05)  # the record comes before the background process
+    process.kill()
+    assert process.wait() == -signal.SIGKILL, "it had answered before"
+    alice.started.append((alice, found[0]))
+    assert alice.wait_for_end(found[0])["data"]["step"] == 3
 
 
 def test_Start_IsNoChildOfTheWebServersSession(alice):
