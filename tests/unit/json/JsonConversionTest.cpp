@@ -99,8 +99,16 @@ TEST(JsonAsString, WritesNumbersAndBooleansAsJsonDoes) {
   EXPECT_EQ(JsonHelper::asString(-12), "-12");
   EXPECT_EQ(JsonHelper::asString(Json::Value::maxLargestUInt), "18446744073709551615");
   EXPECT_EQ(JsonHelper::asString(1.5), "1.5");
+  EXPECT_EQ(JsonHelper::asString(3.0), "3.0");
   EXPECT_EQ(JsonHelper::asString(true), "true");
   EXPECT_EQ(JsonHelper::asString(std::string("a\0b", 3)), std::string("a\0b", 3));
+}
+
+TEST(JsonAsString, WritesARealWithTheDigitsOfTheTextForm) {
+  for (const double real : {0.1, -2.3, 1e100, 1.0 / 3}) {
+    EXPECT_EQ(JsonHelper::asString(real), JsonHelper::toString(real));
+  }
+  EXPECT_EQ(JsonHelper::asString(0.1), "0.1");
 }
 
 TEST(JsonAsString, GivesNullAsEmptyAndTheFallbackForListsAndObjects) {

@@ -249,3 +249,15 @@ TEST(FieldStore, TakesKeysInANullSectionAsInAnEmptyOne) {
   EXPECT_TRUE(base.SetData("s", "a", 1, false));
   EXPECT_EQ(content(base), R"({"s":{"a":1}})");
 }
+
+TEST(FieldStoreMerge, KeepsTheOldValueOfANameThatIsLeftOut) {
+  APIBase base = storeOf(R"({"s":{"a":"old","b":"old"}})");
+  EXPECT_TRUE(base.SetData("s", json(R"({"a":1,"b":"new","c":[]})"), true));
+  EXPECT_EQ(content(base), R"({"s":{"a":"old","b":"new"}})");
+}
+
+TEST(FieldStoreClearData, EmptiesANullSection) {
+  APIBase base = storeOf(R"({"s":null})");
+  EXPECT_TRUE(base.ClearData("s", ""));
+  EXPECT_EQ(content(base), R"({"s":null})");
+}

@@ -16,6 +16,15 @@ bool isShort(const std::string& text) {
 bool isEven(const long long& value) {
   return value % 2 == 0;
 }
+bool isZero(const int& value) {
+  return value == 0;
+}
+bool isFalse(const bool& value) {
+  return !value;
+}
+bool isNegative(const double& value) {
+  return value < 0;
+}
 bool hasTwo(const Json::Value& value) {
   return value.size() == 2;
 }
@@ -63,6 +72,8 @@ TEST(RequestParameter, OptionalAndMissingIsUnsetForEveryGetter) {
   EXPECT_FALSE(request.GetAndCheckUnitArray("n", kOptional).IsInvalid());
   EXPECT_FALSE(request.GetAndCheckUnitArray("n", kOptional).IsSet());
   EXPECT_FALSE(request.GetAndCheckIntegral<long long>("n", kOptional).IsInvalid());
+  EXPECT_FALSE(request.GetAndCheckIntegral<unsigned int>("n", kOptional).IsInvalid());
+  EXPECT_FALSE(request.GetAndCheckIntegral<unsigned long long>("n", kOptional).IsInvalid());
 }
 
 TEST(RequestParameter, AnyNecessityButZeroIsOptional) {
@@ -109,7 +120,11 @@ TEST(RequestParameter, SentAsNullIsResetAndKeepsItsInitialValue) {
 }
 
 TEST(RequestParameter, IsCheckedByTheValidator) {
-  const APIRequest request = requestWithParams(R"({"s":"abc","l":3,"a":[1],"o":{"x":1}})");
+  const APIRequest request =
+      requestWithParams(R"({"s":"abc","l":3,"a":[1],"o":{"x":1},"i":1,"b":true,"r":0.5})");
+  EXPECT_TRUE(request.GetAndCheckInt("i", kOptional, isZero).IsInvalid());
+  EXPECT_TRUE(request.GetAndCheckBool("b", kOptional, isFalse).IsInvalid());
+  EXPECT_TRUE(request.GetAndCheckReal("r", kOptional, isNegative).IsInvalid());
   EXPECT_TRUE(request.GetAndCheckString("s", kOptional, isShort).IsInvalid());
   EXPECT_TRUE(request.GetAndCheckIntegral<long long>("l", kOptional, isEven).IsInvalid());
   EXPECT_TRUE(request.GetAndCheckArray("a", kOptional, hasTwo).IsInvalid());
@@ -180,4 +195,6 @@ TEST(ParameterFactory, WrongTypeAndRefusingValidatorMakeInvalid) {
                   .IsInvalid());
   EXPECT_TRUE(
       APIParameterFactory::ArrayFromJson(container, "a", PARAM_OPTIONAL, hasTwo).IsInvalid());
+  EXPECT_TRUE(
+      APIParameterFactory::ObjectFromJson(container, "o", PARAM_OPTIONAL, hasTwo).IsInvalid());
 }

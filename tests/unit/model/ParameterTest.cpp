@@ -216,6 +216,17 @@ TEST(ParameterValue, OfTheUnsignedKindSuitsEveryIntegerButInt) {
   EXPECT_EQ(natural.Get(), 5u);
 }
 
+TEST(ParameterValue, OfTheSignedKindKeepsTheUpperBounds) {
+  APIParameter<int> number;
+  EXPECT_TRUE(number.ParseValue(Json::Int64(2147483647), Json::intValue));
+  EXPECT_FALSE(number.ParseValue(Json::Int64(2147483648), Json::intValue));
+  EXPECT_EQ(number.Get(), INT32_MAX);
+  APIParameter<unsigned int> natural;
+  EXPECT_TRUE(natural.ParseValue(Json::Int64(4294967295), Json::intValue));
+  EXPECT_FALSE(natural.ParseValue(Json::Int64(4294967296), Json::intValue));
+  EXPECT_EQ(natural.Get(), UINT32_MAX);
+}
+
 TEST(ParameterValue, OfBoolIsABooleanOnly) {
   EXPECT_TRUE(accepts<bool>("true", true));
   EXPECT_TRUE(accepts<bool>("false", false));

@@ -131,3 +131,12 @@ TEST_F(RequestDecrypt, FailureLeavesTheRequestItsOtherParameters) {
   EXPECT_EQ(request.GetAPIClass(), "A");
   EXPECT_EQ(request.GetParam(""), json(R"({"api":"A"})"));
 }
+
+TEST_F(RequestDecrypt, IsAppliedToPostedParametersToo) {
+  Json::Value params;
+  params["postParam"]["__cIpHeRtExT"] = "c:api=A&x=secret";
+  APIRequest request;
+  request.InitParam(params, false);
+  EXPECT_EQ(request.GetAPIClass(), "A");
+  EXPECT_EQ(request.GetParam("x"), Json::Value("secret"));
+}

@@ -288,3 +288,74 @@ TEST(RequestCopy, HasAStoreOfItsOwn) {
   copy.SetAttr("only", "here");
   EXPECT_FALSE(request.HasAttr("only"));
 }
+
+TEST(RequestConstruction, TakesPostParametersAlone) {
+  const APIRequest request(json(R"({"postParam":{"api":"A","x":1}})"));
+  EXPECT_EQ(request.GetAPIClass(), "A");
+  EXPECT_EQ(request.GetParam("x"), Json::Value(1));
+}
+
+TEST(RequestConstruction, TakesTheEnvironmentBeforeTheParameters) {
+  FakePlatform::Reset().sharingGood = true;
+  Json::Value init = json(R"({"getParam":{"__cIpHeRtExT":"broken"}})");
+  init["environ"][SZ_X_SHARING_HEADER] = "link";
+  const APIRequest request(init);
+  EXPECT_EQ(
+      FakePlatform::Get().calls,
+      (std::vector<std::string>{"EntryDB::GetByHash(link)", "SessionDB::GetBySessionId()",
+                                "TokenDB::GetBySessionEntry()", "QeloCgiDecryptParam(broken)"}));
+}
+
+TEST(RequestInitParam, PostWinsOverGetForVersionAndMethodToo) {
+  const APIRequest request(json(R"({"getParam": {"api": "G", "version": 1, "method": "g"},
+                                    "postParam": {"version": 2, "method": "p"}})"));
+  EXPECT_EQ(request.GetAPIClass(), "G");
+  EXPECT_EQ(request.GetAPIVersion(), 2);
+  EXPECT_EQ(request.GetAPIMethod(), "p");
+}
+
+TEST(RequestInitParam, TakesItsOwnParametersAsTheNewOnes) {
+  APIRequest request(
+      json(R"({"getParam":{"old":1,"getParam":{"a":1,"postParam":5},"postParam":{"b":2}}})"));
+  const Json::Value def;
+  request.InitParam(request.GetParamRef("", def), true);
+  EXPECT_EQ(request.GetParam(""), json(R"({"a":1,"b":2,"postParam":5})"));
+}
+
+TEST(RequestInitParam, MergesItsOwnParametersAsTheyWereBefore) {
+  APIRequest request(
+      json(R"({"getParam":{"getParam":{"postParam":{"c":3}},"postParam":{"b":2}}})"));
+  const Json::Value def;
+  request.InitParam(request.GetParamRef("", def), false);
+  EXPECT_EQ(request.GetParam("b"), Json::Value(2));
+  EXPECT_FALSE(request.HasParam("c"));
+}
+
+TEST(RequestInitAPIInfo, EmptyDescriptionClearsTheOldOne) {
+  APIRequest request(json(R"({"reqLib":{"a":1}})"));
+  request.InitAPIInfo(Json::Value(Json::objectValue));
+  EXPECT_EQ(request.GetAPIInfo(""), json("{}"));
+}
+
+TEST(RequestInitSession, EmptySessionClearsTheOldOne) {
+  APIRequest request(json(R"({"session":{"username":"alice"}})"));
+  request.InitSession(Json::Value(Json::objectValue));
+  EXPECT_EQ(request.GetLoginUserName(), "");
+  EXPECT_EQ(request.Serialize()["session"], json("{}"));
+}
+
+TEST(RequestCopy, TakesTheAttributes) {
+  APIRequest request;
+  request.SetAttr("a", json("[1]"));
+  EXPECT_EQ(APIRequest(request).GetAttr("a"), json("[1]"));
+}
+
+TEST(RequestTransport, DeserializeKeepsUrlAttributesAndUserAgent) {
+  Json::Value record = json(R"({"attr":{"a":1},"environ":{"HTTP_HOST":"other"},
+      "url":{"initialized":true,"urlHost":"nas"},"userAgent":{"initialized":true,"x":true}})");
+  APIRequest request;
+  request.Deserialize(record);
+  EXPECT_EQ(request.GetURLHost("-"), "nas");
+  EXPECT_EQ(request.GetAttr("a"), Json::Value(1));
+  EXPECT_EQ(request.Serialize()["userAgent"], json(R"({"initialized":true,"x":true})"));
+}

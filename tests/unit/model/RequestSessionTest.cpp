@@ -173,3 +173,19 @@ TEST(RequestHasAppPriv, ComparesOneTextAndSearchesNoList) {
   EXPECT_FALSE(requestWithSession(R"({"appPriv":5})").HasAppPriv("5"));
   EXPECT_FALSE(APIRequest().HasAppPriv("x"));
 }
+
+TEST(RequestLoginUID, KeptAsZeroIsRoot) {
+  FakePlatform::Reset();
+  EXPECT_EQ(requestWithSession(R"({"username":"root","uid":0})").GetLoginUID(), 0u);
+  EXPECT_TRUE(FakePlatform::Get().calls.empty());
+}
+
+TEST(RequestLoginUID, AsksWithAnEmptySessionIdWithoutACookie) {
+  FakePlatform::Reset();
+  EXPECT_EQ(requestWithSession(R"({"username":"alice"})").GetLoginUID(), 1000u);
+  EXPECT_EQ(FakePlatform::Get().calls, std::vector<std::string>{"QeloCgiUIDGet(, alice)"});
+}
+
+TEST(RequestHasAppPriv, OfNoNameIsTrueWhenNoneWasLaid) {
+  EXPECT_TRUE(APIRequest().HasAppPriv(""));
+}

@@ -103,3 +103,15 @@ TEST(RequestSharingUrl, OfACopyIsComputedForTheRequestCopiedFrom) {
   EXPECT_EQ(copy.GetURLHost(""), "second");
   EXPECT_EQ(copy.GetSharingURL(""), "sharing:first");
 }
+
+TEST(RequestSharingUrl, TravelsWithTheRecordAndIsNotAskedForAgain) {
+  FakePlatform::Reset();
+  APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas","HOST":"h"})");
+  EXPECT_EQ(request.GetSharingURL(""), "sharing:nas");
+  Json::Value record = request.Serialize();
+  APIRequest rebuilt;
+  rebuilt.Deserialize(record);
+  EXPECT_TRUE(rebuilt.Serialize()["url"].isMember("initialized"));
+  EXPECT_EQ(rebuilt.GetSharingURL(""), "sharing:nas");
+  EXPECT_EQ(FakePlatform::Get().calls.size(), 1u);
+}

@@ -93,6 +93,7 @@ TEST(UrlHost, KeepsTheBracketsOfAnIPv6Address) {
   EXPECT_EQ(hostAndPort("[fe80::1]", "on"), "[fe80::1] 443");
   EXPECT_EQ(hostAndPort("[fe80::1]:"), "[fe80::1] 80");
   EXPECT_EQ(hostAndPort("[a]]x:1"), "[a]] 1");
+  EXPECT_EQ(hostAndPort("[a]:1:2"), "[a] -1") << "the port starts at the first colon";
 }
 
 TEST(UrlHost, IsUnknownForAnOpenBracketAndAnEmptyHeader) {
@@ -106,6 +107,12 @@ TEST(UrlPort, IsStoredAsTextAndReadAsADecimalNumber) {
   APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas:0080"})");
   EXPECT_EQ(request.GetURLPort(0), 80);
   EXPECT_EQ(request.Serialize()["url"]["urlPort"], Json::Value("0080"));
+}
+
+TEST(UrlPort, OfTheProtocolIsStoredAsText) {
+  APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas"})");
+  EXPECT_EQ(request.GetURLPort(0), 80);
+  EXPECT_EQ(request.Serialize()["url"]["urlPort"], Json::Value("80"));
 }
 
 TEST(UrlPort, IsTheDefaultWhenTheTextIsNoPort) {

@@ -137,3 +137,10 @@ TEST(CookieExpiry, IgnoresTheLocalTimeZone) {
   unsetenv("TZ");
   tzset();
 }
+
+TEST_F(CookieAdding, CreatesNoListInARecordWithoutOne) {
+  Json::Value record = json(R"({"headers":{}})");
+  response_.Deserialize(record);
+  EXPECT_FALSE(response_.AddCookie("id", "x", "/"));
+  EXPECT_EQ(response_.Serialize(), json(R"({"headers":{}})"));
+}

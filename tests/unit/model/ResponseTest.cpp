@@ -111,6 +111,30 @@ TEST(ResponseStatus, IsReadFromTheFrontOfTheHeader) {
   EXPECT_EQ(response.GetStatus(), 503);
 }
 
+TEST(ResponseStatus, IsADecimalNumberAfterBlanksAndASign) {
+  APIResponse response(nullptr);
+  for (const char* text : {" 404", "+404", "\t +404 Gone", "0404"}) {
+    response.SetHeader("Status", text);
+    EXPECT_EQ(response.GetStatus(), 404) << text;
+  }
+}
+
+TEST(ResponseStatus, IsZeroWithoutDigitsAndOutOfRange) {
+  APIResponse response(nullptr);
+  for (const char* text : {"", "OK", "+", "4294967496", "99999999999999999999"}) {
+    response.SetHeader("Status", text);
+    EXPECT_EQ(response.GetStatus(), 0) << text;
+  }
+}
+
+TEST(ResponseStatus, IsRefusedWhenTheHeaderCannotBeStored) {
+  APIResponse response(nullptr);
+  Json::Value record = json(R"({"option":{}})");
+  response.Deserialize(record);
+  EXPECT_FALSE(response.SetStatus(HTTP_STATUS_NOT_FOUND, "gone"));
+  EXPECT_EQ(response.Serialize(), json(R"({"option":{}})"));
+}
+
 TEST(ResponseRedirect, NamesTheHostThatTheClientCalledAndSetsTheStatus) {
   APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas:5001","HTTPS":"on"})");
   APIResponse response(&request);
@@ -206,6 +230,12 @@ TEST_F(ResponseCallbacks, AreRefusedInTheDaemonWithALogLine) {
   EXPECT_EQ(SyslogCapture::Messages()[0].priority, 3);
   EXPECT_EQ(lineAsN(SyslogCapture::Messages()[0].text),
             "APIResponse.cpp:N cannot use callback function in qeloapid");
+}
+
+TEST_F(ResponseCallbacks, LogTheRefusalInTheDaemonAlsoForANullFunction) {
+  setenv("in_qeloapid", "", 1);
+  response_.SetCallbackFunc(nullptr, &argument_);
+  EXPECT_EQ(SyslogCapture::Messages().size(), 1u);
 }
 
 TEST_F(ResponseCallbacks, AreTakenFromAListInItsOrder) {
