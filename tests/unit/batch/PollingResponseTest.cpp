@@ -72,8 +72,10 @@ TEST_F(PollingResponse, MakesTheHandleOnce) {
 TEST_F(PollingResponse, OfATaskWithinATaskHasAHandleOfItsOwn) {
   response->SetSuccess("outer");
   tasks->Put("@users", "1", Parse("{}"));
-  Become("@users", "1");
-  response->SetSuccess("inner");
+  EndOf(Fork([this] {
+    Become("@users", "1");
+    response->SetSuccess("inner");
+  }));
   EXPECT_EQ(Property("alice", "1", "body")["data"], "outer");
   EXPECT_EQ(Property("@users", "1", "body")["data"], "inner");
 }
