@@ -64,10 +64,12 @@ class WEBAPI_API WebEntry : public APIRunner {
  private:
   QeloCgiContext* Context();
   bool GatherEnvironment();
+  void Serve();
   bool RewriteCredentials();
   const Json::Value& KnownResult(bool allowTimeout) const;
   int Authorise(bool allowTimeout);
   void FillSession(const std::string& user, bool isAuthorized);
+  bool CoversInnerCall(const APIRequest& request);
   bool IsAllowedUser(APIRequest* request);
 
   Json::Value temporaryFiles_;

@@ -6,6 +6,7 @@
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
+#include "webapi/entry/SessionOrigin.h"
 #include "webapi/entry/UserClass.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Core.h"
@@ -54,10 +55,12 @@ int checkSession(const APIRequest& request, const char* session, bool allowTimeo
     return WEBAPI_ERR_NO_PERMISSION;
   }
   alignas(void*) QeloCgiContext context{};
-  QeloCgiInitEx(kUserStore, &context);
+  if (QeloCgiInitEx(kUserStore, &context) != 1) {
+    return WEBAPI_ERR_NO_PERMISSION;
+  }
   QeloCgiLoadInCookies(&context);
   char name[kUserNameSize] = {};
-  const QeloCgiAuthFlags flags{request.HasParam("_sid") ? 1U : 0U, 0};
+  const QeloCgiAuthFlags flags{IsSessionFromParameter(request) ? 1U : 0U, 0};
   const int result =
       QeloCgiIsAuthorizedEx(&context, &flags, name, kUserNameSize, allowTimeout ? 1 : 0, 1);
   user = name;

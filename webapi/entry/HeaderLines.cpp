@@ -27,13 +27,6 @@ bool fitsOneLine(const std::string& text) {
                       [](char c) { return c == '\r' || c == '\n' || c == '\0'; });
 }
 
-/// The text as a log line can show it.
-std::string printable(std::string text) {
-  std::replace_if(
-      text.begin(), text.end(), [](unsigned char c) { return c < 0x20 || c == 0x7F; }, '?');
-  return text;
-}
-
 bool isContentType(const std::string& name) {
   return strcasecmp(name.c_str(), kContentType) == 0;
 }
@@ -44,7 +37,7 @@ bool isSendable(const std::string& name, const Json::Value& value) {
     return false;
   }
   if (!isToken(name) || !fitsOneLine(value.asString())) {
-    WEBAPI_LOG("WebEntry.cpp", "header %s is not sent", printable(name).c_str());
+    WEBAPI_LOG("WebEntry.cpp", "header %s is not sent", LogText(name).c_str());
     return false;
   }
   return true;
@@ -86,7 +79,7 @@ std::vector<std::string> CookieLines(const APIResponse& response) {
     const std::string text = cookie.asString();
     if (!fitsOneLine(text)) {
       WEBAPI_LOG("WebEntry.cpp", "cookie %s is not sent",
-                 printable(text.substr(0, text.find('='))).c_str());
+                 LogText(text.substr(0, text.find('='))).c_str());
       continue;
     }
     lines.push_back("Set-Cookie: " + text);

@@ -96,7 +96,8 @@ bool WebEntry::InitGetParam(Json::Value& section) {
 bool WebEntry::InitPostParam(Json::Value& section) {
   try {
     const int64_t length = JsonHelper::asInt64(Request()->GetEnv("CONTENT_LENGTH", 0), 0);
-    if (!section.isObject() || Request()->IsUploadRequest() || length <= 0) {
+    if (!section.isObject() || Request()->IsUploadRequest() || length <= 0 ||
+        length > RequestBody::kMaxLength) {
       return false;
     }
     std::string body;

@@ -11,6 +11,7 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/WebEntry.h"
+#include "webapi/entry/SessionOrigin.h"
 #include "webapi/entry/UserClass.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Core.h"
@@ -52,6 +53,12 @@ const char* serverErrorOf(int code) {
     default:
       return nullptr;
   }
+}
+
+bool IsTokenGranted(const APIRequest& request, char* user, int size) {
+  const char* token = request.GetQeloAccessTokenID();
+  return token != nullptr && QeloAccessTokenGrant(token, request.GetAPIClass().c_str(),
+                                                  request.GetAPIMethod().c_str(), user, size) >= 0;
 }
 
 std::string optionOf(QeloCgiContext* context, const char* name, const char* def = "") {
@@ -101,8 +108,12 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
     return false;
   }
   const bool allowTimeout = GetMethodAttr(request, "allowTimeout");
-  const int code = CheckPermission(allowTimeout);
-  const int result = JsonHelper::asInt(KnownResult(allowTimeout), AUTHORIZED_UNKNOWN);
+  int code = CheckPermission(allowTimeout);
+  int result = JsonHelper::asInt(KnownResult(allowTimeout), AUTHORIZED_UNKNOWN);
+  if (code == WEBAPI_ERR_NONE && !CoversInnerCall(*request)) {
+    result = AUTHORIZED_UNAUTHENTICATED;
+    code = errorOf(result);
+  }
   if (result == AUTHORIZED_TOKEN_MISMATCH &&
       AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) == AUTH_LOGIN) {
     syslog(LOG_ERR, "%s:%d Token Authentication Fail.", "WebEntry", kTokenFailLine);
@@ -111,6 +122,7 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
   if (request != caller) {
     // A request within this one, which may still hold what the check before found.
     request->InitSession(code == WEBAPI_ERR_NONE ? sessionOf(*caller) : emptySessionOf(*caller));
+    request->SetCookie("id", caller->GetSessionID());
   }
   request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
   response->SetError(code);
@@ -135,6 +147,15 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
   request->InitSession(session);
   request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
   return true;
+}
+
+/// A token stands for the calls that it was made for, within a compound request too.
+bool WebEntry::CoversInnerCall(const APIRequest& request) {
+  if (&request == Request() || !JsonHelper::asBool(JsonHelper::member(permission_, "token"))) {
+    return true;
+  }
+  char user[kUserNameSize] = {};
+  return IsTokenGranted(request, user, kUserNameSize);
 }
 
 bool WebEntry::IsAllowedUser(APIRequest* request) {
@@ -170,7 +191,7 @@ int WebEntry::Authorise(bool allowTimeout) {
   int result = AUTHORIZED_NO_SESSION;
   char user[kUserNameSize] = {};
   if (!request->GetSessionID().empty()) {
-    const QeloCgiAuthFlags flags{request->HasParam("_sid") ? 1U : 0U,
+    const QeloCgiAuthFlags flags{IsSessionFromParameter(*request) ? 1U : 0U,
                                  GetMethodAttr(request, "keepIdle") ? 1U : 0U};
     result = QeloCgiIsAuthorizedEx(Context(), &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
                                    GetMethodAttr(request, "skipCheckIP") ? 0 : 1);
@@ -180,12 +201,13 @@ int WebEntry::Authorise(bool allowTimeout) {
     if (token == nullptr || *token == '\0') {
       return result;
     }
-    // The refused session's name must not stay: a method that needs no login could run as it.
+    // Nothing of a refused session may stay: a method could act on it in the token's name.
     memset(user, 0, sizeof user);
-    const bool granted =
-        QeloAccessTokenGrant(token, request->GetAPIClass().c_str(), request->GetAPIMethod().c_str(),
-                             user, kUserNameSize) >= 0;
+    request->SetCookie("id", "");
+    QeloCgiInit("", Context());
+    const bool granted = IsTokenGranted(*request, user, kUserNameSize);
     result = granted ? AUTHORIZED_YES : AUTHORIZED_UNAUTHENTICATED;
+    permission_["token"] = granted;
     if (!granted) {
       user[0] = '\0';
     }

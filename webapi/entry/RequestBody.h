@@ -9,6 +9,10 @@ namespace QELO::RequestBody {
 /// How long a client may send nothing before the rest of its body is given up.
 inline constexpr std::chrono::seconds kIdleLimit{30};
 
+/// Longest body in bytes that is taken as parameters: they are kept in memory, several times over
+/// while they are read, and nobody has been asked for a permission yet.
+inline constexpr int64_t kMaxLength = 16 << 20;
+
 /// Reads a body of `length` bytes and takes the text up to its first NUL. A body that ends or
 /// stalls early is taken as far as it came; memory is used for what came, not for `length`.
 /// @param length  bytes announced, above 0

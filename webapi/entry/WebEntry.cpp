@@ -2,11 +2,13 @@
 
 #include <cstdlib>
 #include <cstring>
+#include <exception>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/entry/BrokenPipe.h"
+#include "webapi/model/Log.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"
 
@@ -66,13 +68,23 @@ QeloCgiContext* WebEntry::Context() {
   return reinterpret_cast<QeloCgiContext*>(cgiContext_);
 }
 
+void WebEntry::Serve() {
+  if (!Initialize(Json::Value()) || !SetProcessName(Request(), Response())) {
+    return;
+  }
+  if (Request()->HasParam("relay_zt")) {
+    ProcessRelay(Request(), Response());
+  } else {
+    Process(Request(), Response());
+  }
+}
+
 bool WebEntry::Run(const Json::Value&) {
-  if (Initialize(Json::Value()) && SetProcessName(Request(), Response())) {
-    if (Request()->HasParam("relay_zt")) {
-      ProcessRelay(Request(), Response());
-    } else {
-      Process(Request(), Response());
-    }
+  try {
+    Serve();
+  } catch (const std::exception& error) {  // no memory, most likely; the client gets an answer
+    WEBAPI_LOG("WebEntry", "%s", error.what());
+    Response()->SetError(WEBAPI_ERR_NO_ANSWER);
   }
   if (Response()->IsEnableOutput()) {
     const BrokenPipe tolerated;

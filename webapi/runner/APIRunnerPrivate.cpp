@@ -9,6 +9,8 @@
 #include <cstdio>
 #include <cstring>
 
+#include "webapi/model/Log.h"
+
 namespace QELO {
 namespace {
 
@@ -60,7 +62,7 @@ void APIRunnerPrivate::SetArgv0(const std::string& name) {
 void APIRunnerPrivate::SetLogIdentity(const std::string& text) {
   static char identity[1024];  // syslog keeps the pointer
   closelog();
-  snprintf(identity, sizeof identity, "%s", text.c_str());
+  snprintf(identity, sizeof identity, "%s", LogText(text).c_str());
   openlog(identity, LOG_PID | LOG_CONS, 0);
 }
 

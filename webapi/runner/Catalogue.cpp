@@ -113,7 +113,7 @@ bool APIRunner::InitLibDesc(Json::Value& target, const std::string& api) {
   }
   const std::string path = isFileName(api) ? descriptionFile(api) : "";
   if (path.empty()) {
-    WEBAPI_LOG("APIRunner.cpp", "WebAPI %s is not valid", api.c_str());
+    WEBAPI_LOG("APIRunner.cpp", "WebAPI %s is not valid", LogText(api).c_str());
     return false;
   }
   errno = 0;

@@ -82,6 +82,12 @@ TEST_F(APIAuthTest, CheckPermissionTellsASessionThatCameAsAParameter) {
   EXPECT_EQ(platform->calls[2], "QeloCgiIsAuthorizedEx(1, 0, 1)");
 }
 
+TEST_F(APIAuthTest, CheckPermissionIgnoresAnotherSidParameter) {
+  request_.InitParam(Parse(R"({"getParam": {"_sid": "anything"}})"), false);
+  EXPECT_EQ(Check(), 0);
+  EXPECT_EQ(platform->calls[2], "QeloCgiIsAuthorizedEx(0, 0, 1)");
+}
+
 TEST_F(APIAuthTest, CheckPermissionRefusesANullSession) {
   EXPECT_EQ(Check(nullptr), 105);
   EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 0);

@@ -119,6 +119,11 @@ TEST_F(ParameterIntake, PostWithALengthBeyond64BitsSets101) {
   EXPECT_EQ(Code(), 101);
 }
 
+TEST_F(ParameterIntake, PostBeyond16MiBSets101) {
+  EXPECT_FALSE(TakeLength("16777217"));
+  EXPECT_EQ(Code(), 101);
+}
+
 TEST_F(ParameterIntake, PostWithALengthThatIsNoNumberSets101) {
   EXPECT_FALSE(TakeLength("3x"));
   EXPECT_EQ(Code(), 101);

@@ -1,5 +1,6 @@
 // Who calls, and whether that user may run the method.
 
+#include <algorithm>
 #include <memory>
 
 #include "tests/support/CgiFixture.h"
@@ -214,6 +215,44 @@ TEST_F(Permission, AccessTokenServesWhenTheSessionIsRefused) {
   platform->tokenUser = "bob";
   EXPECT_TRUE(Check(kOpenToAll));
   EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
+}
+
+TEST_F(Permission, AccessTokenLeavesNothingOfTheRefusedSession) {
+  token = "T";
+  platform->authorized = -7;
+  platform->authorizedUser = "victim";
+  platform->tokenGrant = 0;
+  platform->tokenUser = "bob";
+  EXPECT_TRUE(Check(kOpenToAll));
+  EXPECT_EQ(entry_->Request()->GetSessionID(), "");
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
+  // The context that names the refused session is emptied before its options are read.
+  EXPECT_EQ(std::count(platform->calls.begin(), platform->calls.end(), "QeloCgiInit()"), 1);
+}
+
+TEST_F(Permission, AccessTokenIsAskedForEachCallWithinTheRequest) {
+  token = "T";
+  platform->tokenGrant = 0;
+  platform->tokenUser = "bob";
+  Describe(kOpenToAll);
+  MakeRequest(*entry_, "");
+  ASSERT_TRUE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
+  APIRequest inner(*entry_->Request());
+  APIResponse answer(&inner);
+  EXPECT_TRUE(entry_->CheckPermission(&inner, &answer));
+  platform->tokenGrant = -1;
+  EXPECT_FALSE(entry_->CheckPermission(&inner, &answer));
+  EXPECT_EQ(answer.GetError(), 119);
+  EXPECT_EQ(inner.GetLoginUserName(), "");
+}
+
+TEST_F(Permission, AnotherSidParameterWaivesNoToken) {
+  Describe(kOpenToAll);
+  MakeRequest(*entry_, "S", R"({"_sid": "other"})");
+  entry_->CheckPermission(entry_->Request(), entry_->Response());
+  EXPECT_EQ(std::count(platform->calls.begin(), platform->calls.end(),
+                       "QeloCgiIsAuthorizedEx(0, 0, 1)"),
+            1);
 }
 
 TEST_F(Permission, AccessTokenIsNotAskedWhenTheSessionIsGood) {

@@ -66,6 +66,15 @@ TEST_F(Hardening, ProcessThatCannotBeNamedIs118) {
   EXPECT_EQ(SyslogCapture::Count("Set process name fail["), 1);
 }
 
+TEST_F(Hardening, ClientsTextBeginsNoLogLineOfItsOwn) {
+  TestRunner tested;
+  MakeRequest("x\nsshd: Accepted", 1, "run");
+  tested.SetProcessName(request.get(), response.get());
+  EXPECT_EQ(SyslogCapture::Identity().find('\n'), std::string::npos);
+  tested.CheckRequestParam(request.get(), response.get());
+  EXPECT_EQ(SyslogCapture::Count("WebAPI x?sshd: Accepted is not valid"), 1);
+}
+
 TEST_F(Hardening, PriorityThatIsTheCurrentOneIsNotSet) {
   priorityCalls = 0;
   Json::Value description = Description("state");
