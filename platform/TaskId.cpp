@@ -1,5 +1,6 @@
 #include "platform/TaskId.h"
 
+#include <algorithm>
 #include <charconv>
 
 #include "platform/Secrets.h"
@@ -7,15 +8,20 @@
 namespace QELO::Platform {
 namespace {
 
-constexpr char kPrefixAlphabet[] =
-    "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789._-";
 constexpr uid_t kNobody = static_cast<uid_t>(-1);  // to the kernel: no user at all
+
+// Objects, so that the compiler puts them into the loops: a list checks thousands of ids.
+constexpr auto isPrefixCharacter = [](char c) {
+  return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' ||
+         c == '_' || c == '-';
+};
+constexpr auto isSecretCharacter = [](char c) { return c != '.' && isPrefixCharacter(c); };
 
 }  // namespace
 
 bool isTaskPrefix(std::string_view prefix) {
   return prefix.size() <= kTaskPrefixLength &&
-         prefix.find_first_not_of(kPrefixAlphabet) == std::string_view::npos;
+         std::all_of(prefix.begin(), prefix.end(), isPrefixCharacter);
 }
 
 std::string makeTaskId(std::string_view prefix, uid_t store) {
@@ -25,12 +31,12 @@ std::string makeTaskId(std::string_view prefix, uid_t store) {
 
 bool readTaskId(std::string_view id, uid_t& store) {
   const size_t dot = id.rfind('.');
-  if (dot == std::string_view::npos || dot < kSecretLength ||
-      dot - kSecretLength > kTaskPrefixLength) {
+  if (dot == std::string_view::npos || dot < kSecretLength) {
     return false;
   }
+  const std::string_view secret = id.substr(dot - kSecretLength, kSecretLength);
   return isTaskPrefix(id.substr(0, dot - kSecretLength)) &&
-         isSecretText(id.substr(dot - kSecretLength, kSecretLength)) &&
+         std::all_of(secret.begin(), secret.end(), isSecretCharacter) &&
          readStoreName(id.substr(dot + 1), store);
 }
 

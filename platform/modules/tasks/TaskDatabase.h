@@ -37,6 +37,7 @@ class TaskDatabase {
   /// Stores how the task ended, unless it has another process or ended otherwise meanwhile.
   TaskResult MarkEnded(const TaskKey& key, const ProcessIdentity& process, TaskEnding ending);
   TaskResult Remove(const TaskKey& key);
+  /// @param tasks  receives the owner's tasks, oldest first, when it is empty
   TaskResult List(const std::string& owner, const std::string& prefix,
                   std::vector<ListedTask>& tasks);
 

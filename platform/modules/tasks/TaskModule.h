@@ -48,6 +48,7 @@ enum class TaskResult {
 struct ListedTask {
   std::string id;
   int64_t created = 0;  ///< milliseconds since the epoch
+  int64_t row = 0;      ///< tells which of two in one store is older
 };
 
 struct TaskStoreSettings {

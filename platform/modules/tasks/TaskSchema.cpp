@@ -27,9 +27,9 @@ constexpr const char* kSchema[] = {
     "CREATE TABLE tasks(id INTEGER PRIMARY KEY, owner TEXT NOT NULL, task TEXT NOT NULL,"
     " created INTEGER NOT NULL, born INTEGER NOT NULL, boot TEXT NOT NULL,"
     " pid INTEGER NOT NULL DEFAULT 0, start INTEGER NOT NULL DEFAULT 0,"
-    " ending INTEGER NOT NULL DEFAULT 0, finished INTEGER, version INTEGER NOT NULL DEFAULT 1,"
-    " UNIQUE(owner, task))",
+    " ending INTEGER NOT NULL DEFAULT 0, finished INTEGER, version INTEGER NOT NULL DEFAULT 1)",
     "CREATE INDEX tasks_ended ON tasks(finished) WHERE finished IS NOT NULL",
+    "CREATE INDEX tasks_named ON tasks(owner, task, created)",  // all that a list reads
     "CREATE INDEX tasks_running ON tasks(created) WHERE finished IS NULL",
 };
 
