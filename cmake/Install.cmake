@@ -42,6 +42,11 @@ install(FILES ${CMAKE_BINARY_DIR}/webapi-ARDO5.pc
 install(DIRECTORY ${WEBAPI_DESCRIPTION_DIR}/
         DESTINATION ${WEBAPI_ROOT_PREFIX}/usr/qelo/qeloman/webapi
         FILES_MATCHING PATTERN *.lib PATTERN lib.def)
+# Users' processes add their records of background tasks here, and none of them could make it.
+set(webapi_task_dir ${WEBAPI_ROOT_PREFIX}/var/lib/webapi/tasks)
+install(DIRECTORY DESTINATION ${webapi_task_dir})
+install(CODE "execute_process(COMMAND chmod 1733 \"\$ENV{DESTDIR}${webapi_task_dir}\"
+                              COMMAND_ERROR_IS_FATAL ANY)")
 get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
 install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
 file(GLOB webapi_api_readmes RELATIVE ${PROJECT_SOURCE_DIR} apis/*/README.md)

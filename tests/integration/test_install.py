@@ -95,11 +95,16 @@ def test_Install_HoldsLibraryProgramsAndDescriptions(stage, prefix):
     apis = {path.name for path in (libraries / "webapi" / "apis").iterdir()}
     assert apis == {path.name + ".so" for path in (SOURCE / "apis").glob("QELO.*") if path.is_dir()}
     modules = {path.name for path in (libraries / "webapi" / "modules").iterdir()}
-    assert {"password_pam.so", "tokens.so"} <= modules
+    assert {"password_pam.so", "tasks.so", "tokens.so"} <= modules
     assert "password_crypt.so" not in modules
     descriptions = {path.name for path in (stage / "usr/qelo/qeloman/webapi").iterdir()}
     assert {"lib.def", "QELO.Entry.Request.lib", "QELO.Access.Session.lib"} <= descriptions
     assert next(prefix.rglob("QELO.Host.Info.md"))
+
+
+def test_Install_MakesTheDirectoryOfTaskRecords(stage):
+    """Everybody may add to it, nobody take away another's."""
+    assert (stage / "var/lib/webapi/tasks").stat().st_mode & 0o7777 == 0o1733
 
 
 def test_Install_NamesNoPathOfTheBuild(stage):
