@@ -150,11 +150,11 @@ bool APIPollingPrivate::FindTask(const std::string& fullId, std::string& owner,
     return Fail(POLLING_ERR_BAD_PARAMETERS);
   }
   if (!GetUserAndTaskID(fullId, owner, taskId) || !CheckTaskUser(owner)) {
-    WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", LogText(fullId).c_str());
     return Fail(POLLING_ERR_INVALID_ID);
   }
   if (!ARDO::TaskUtil::checkTaskExists(owner, taskId)) {
-    WEBAPI_LOG(kPollingSource, "No such task id[%s]", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "No such task id[%s]", LogText(fullId).c_str());
     return Fail(POLLING_ERR_NO_SUCH_TASK);
   }
   return true;
@@ -185,7 +185,7 @@ bool APIPollingPrivate::Status(const Json::Value& fullIds, Json::Value& out) {
     std::string owner;
     std::string taskId;
     if (!GetUserAndTaskID(fullId, owner, taskId) || !CheckTaskUser(owner)) {
-      WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", fullId.c_str());
+      WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", LogText(fullId).c_str());
     } else if (ARDO::TaskUtil::checkTaskExists(owner, taskId)) {
       status = StatusOf(ARDO::Task(owner, taskId));
     }
@@ -217,7 +217,7 @@ bool APIPollingPrivate::Wait(const std::string& fullId, const std::string& state
     seen = now;
     task.waitForChange(left);
     if (!task.reload()) {
-      WEBAPI_LOG(kPollingSource, "No such task id[%s]", fullId.c_str());
+      WEBAPI_LOG(kPollingSource, "No such task id[%s]", LogText(fullId).c_str());
       return Fail(POLLING_ERR_NO_SUCH_TASK);
     }
   }
@@ -230,24 +230,24 @@ bool APIPollingPrivate::Stop(const std::string& fullId, bool remove) {
   std::string owner;
   std::string taskId;
   if (!GetUserAndTaskID(fullId, owner, taskId)) {
-    WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", LogText(fullId).c_str());
     return Fail(POLLING_ERR_BAD_PARAMETERS);
   }
   if (!CheckTaskUser(owner)) {
     return Fail(POLLING_ERR_INVALID_ID);
   }
   if (!ARDO::TaskUtil::checkTaskExists(owner, taskId)) {
-    WEBAPI_LOG(kPollingSource, "No such task id[%s]", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "No such task id[%s]", LogText(fullId).c_str());
     return Fail(POLLING_ERR_NO_SUCH_TASK);
   }
   ARDO::Task task(owner, taskId);
   const int pid = task.getCreatePid();
   if (pid > 0 && !DoKill(pid)) {
-    WEBAPI_LOG(kPollingSource, "send SIGTERM to task id[%s] fail", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "send SIGTERM to task id[%s] fail", LogText(fullId).c_str());
     return Fail(POLLING_ERR_NOT_SIGNALLED);
   }
   if (!task.finish(remove)) {
-    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail", LogText(fullId).c_str());
     return Fail(POLLING_ERR_NOT_STORED);
   }
   return true;

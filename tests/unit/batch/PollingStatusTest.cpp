@@ -34,6 +34,11 @@ TEST_F(PollingStatus, OfIdWithoutSlashIs503) {
   EXPECT_EQ(SyslogCapture::Count("Invalid task id[alice]"), 1);
 }
 
+TEST_F(PollingStatus, OfIdWithALineBreakStaysOneLineOfTheLog) {
+  EXPECT_EQ(Status("alice/x]\nkernel: all is lost"), 508);
+  EXPECT_EQ(SyslogCapture::Count("No such task id[alice/x]?kernel: all is lost]"), 1);
+}
+
 TEST_F(PollingStatus, OfIdThatEndsInASlashIsAMissingTask) {
   EXPECT_EQ(Status("alice/"), 508);
   EXPECT_EQ(SyslogCapture::Count("No such task id[alice/]"), 1);
