@@ -5,6 +5,7 @@
 #include <map>
 #include <memory>
 #include <string>
+#include <utility>
 
 #include "webapi/APITable.h"
 #include "webapi/Export.h"
@@ -126,6 +127,7 @@ class WEBAPI_API APIRunner {
  private:
   /// GetMethod(), or the defaults where a description gives the method no object.
   const Json::Value& GetAttributes(const std::string& api, int version, const std::string& method);
+  void* FindFunction(void* handle, const char* name);
   void AddDescriptions(Json::Value& catalogue, const Json::Value& file) const;
 
   Json::Value libDef;
@@ -133,6 +135,7 @@ class WEBAPI_API APIRunner {
   std::unique_ptr<APIRequest> request_;
   std::unique_ptr<APIResponse> response_;
   std::map<std::string, void*> libraries_;
+  std::map<std::pair<void*, std::string>, void*> functions_;
   int compoundDepth_ = 0;
   std::unique_ptr<APIRunnerPrivate> private_;
 };

@@ -3,6 +3,7 @@
 
 #include "webapi/CompoundHandler.h"
 
+#include <ctime>
 #include <new>
 
 #include "webapi/APIRequest.h"
@@ -102,7 +103,9 @@ void CompoundHandler::PreloadLibs() {
   // A library's constructors are foreign code.
   const WorkingDirectory directory;
   const StandardStreams shut(true, true);
-  PreloadLibs(*entries_, true);
+  if (shut.IsShut()) {
+    PreloadLibs(*entries_, true);
+  }
 }
 
 void CompoundHandler::PreloadLibs(const Json::Value& value, bool top) {
@@ -125,6 +128,7 @@ void CompoundHandler::PreloadLibs(const Json::Value& value, bool top) {
 }
 
 int CompoundHandler::CompoundProcess() {
+  tzset();  // else the log reads the time zone in every child anew
   data_["result"] = Json::Value(Json::arrayValue);
   if (!parallel_) {
     PreloadLibs();

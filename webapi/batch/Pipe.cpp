@@ -25,17 +25,17 @@ constexpr size_t kLargestText = 0x7ffff000;
 /// process, which may have work left to do.
 class ToleratedBrokenPipe {
  public:
-  ToleratedBrokenPipe() : former_(signal(SIGPIPE, SIG_IGN)) {}
+  ToleratedBrokenPipe() {
+    struct sigaction ignored {};
+    ignored.sa_handler = SIG_IGN;
+    sigaction(SIGPIPE, &ignored, &former_);
+  }
   ToleratedBrokenPipe(const ToleratedBrokenPipe&) = delete;
   ToleratedBrokenPipe& operator=(const ToleratedBrokenPipe&) = delete;
-  ~ToleratedBrokenPipe() {
-    if (former_ != SIG_ERR) {
-      signal(SIGPIPE, former_);
-    }
-  }
+  ~ToleratedBrokenPipe() { sigaction(SIGPIPE, &former_, nullptr); }
 
  private:
-  void (*former_)(int);
+  struct sigaction former_ {};
 };
 
 void closeEnd(int& end) {
@@ -104,6 +104,7 @@ bool Pipe::Init() {
     replaceBySockets(ends, kPrivilegedRoom);  // else the pipe will do as it is
   }
   Take(ends);
+  sigaction(SIGPIPE, nullptr, nullptr);  // found by the dynamic loader now, not in each child
   return true;
 }
 

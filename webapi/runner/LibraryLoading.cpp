@@ -9,6 +9,12 @@
 #include "webapi/runner/Fence.h"
 
 namespace QELO {
+namespace {
+
+constexpr char kTableFunction[] = "GetAPITable";
+constexpr char kCheckTableFunction[] = "GetAPICheckTable";
+
+}  // namespace
 
 bool APIRunner::OpenLib(APIRequest* request, _tag_API_TABLE** table,
                         _tag_API_CHECK_TABLE** checkTable) {
@@ -47,17 +53,30 @@ bool APIRunner::CacheLib(APIRequest* request, void** handle) {
     return false;
   }
   libraries_[path] = opened;
+  // Now, and not in each child that is forked from here on.
+  FindFunction(opened, kTableFunction);
+  FindFunction(opened, kCheckTableFunction);
   *handle = opened;
   return true;
+}
+
+/// Kept, since looking for what is not there walks all that the library depends on.
+void* APIRunner::FindFunction(void* handle, const char* name) {
+  const auto [entry, isNew] = functions_.try_emplace({handle, name}, nullptr);
+  if (isNew) {
+    entry->second = dlsym(handle, name);
+    dlerror();  // its text is made when it is asked for, or at the next failure
+  }
+  return entry->second;
 }
 
 bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {
   if (handle == nullptr || table == nullptr) {
     return false;
   }
-  dlerror();
-  void* symbol = dlsym(handle, "GetAPITable");
-  const char* error = dlerror();
+  void* symbol = FindFunction(handle, kTableFunction);
+  const char* error =
+      symbol == nullptr && dlsym(handle, kTableFunction) == nullptr ? dlerror() : nullptr;
   if (error != nullptr) {
     syslog(LOG_DEBUG, "%s:%d cannot load table: %s", "APIRunner.cpp", __LINE__, error);
     return false;
@@ -77,9 +96,8 @@ bool APIRunner::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkTabl
   if (handle == nullptr || checkTable == nullptr) {
     return false;
   }
-  dlerror();
-  void* symbol = dlsym(handle, "GetAPICheckTable");
-  if (dlerror() != nullptr || symbol == nullptr) {
+  void* symbol = FindFunction(handle, kCheckTableFunction);
+  if (symbol == nullptr) {
     return true;
   }
   *checkTable = nullptr;
@@ -97,6 +115,7 @@ void APIRunner::CloseLib() {
     dlclose(handle);
   }
   libraries_.clear();
+  functions_.clear();
 }
 
 }  // namespace QELO
