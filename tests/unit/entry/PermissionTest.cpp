@@ -1,67 +1,10 @@
 // Who calls, and whether that user may run the method.
 
-#include <algorithm>
-#include <memory>
-
-#include "tests/support/CgiFixture.h"
+#include "tests/unit/entry/PermissionFixture.h"
 #include "webapi/WebAPIError.h"
 
 namespace QELO {
 namespace {
-
-class Permission : public CgiTest {
- protected:
-  void SetUp() override {
-    CgiTest::SetUp();
-    platform->authorized = 1;
-    platform->authorizedUser = "ann";
-  }
-
-  /// Makes the entry's request a call of QELO.Test.Good, with this session id and parameters.
-  void MakeRequest(TestEntry& entry, const std::string& sessionId = "S",
-                   const std::string& extra = "{}") {
-    Json::Value environment;
-    environment["HTTP_COOKIE"] = "id=" + sessionId;
-    environment["QELO_REMOTE_IP"] = "192.0.2.7";
-    if (!token.empty()) {
-      environment["qeloAccessToken"] = token;
-    }
-    entry.Request()->InitEnv(environment);
-    Json::Value params;
-    params["getParam"] = Parse(extra);
-    params["getParam"]["api"] = "QELO.Test.Good";
-    params["getParam"]["version"] = 1;
-    params["getParam"]["method"] = "echo";
-    entry.Request()->InitParam(params, false);
-    entry.CheckRequestParam(entry.Request(), entry.Response());
-    entry.AddAPIInfo(entry.Request());
-  }
-
-  /// A fresh entry's full check of a call whose description has these keys and attributes.
-  bool Check(const std::string& keys, const std::string& attributes = "{}") {
-    entry_ = std::make_unique<TestEntry>();
-    Describe(keys, attributes);
-    MakeRequest(*entry_);
-    return entry_->CheckPermission(entry_->Request(), entry_->Response());
-  }
-
-  /// The full check when the CGI library answers this, with the error and server error as text.
-  std::string CheckResult(int result) {
-    platform->authorized = result;
-    TestEntry entry;
-    Describe(kOpenToAll);
-    MakeRequest(entry);
-    const bool passed = entry.CheckPermission(entry.Request(), entry.Response());
-    return std::string(passed ? "passed " : "refused ") +
-           std::to_string(entry.Response()->GetError()) + " " + entry.Response()->GetServerError();
-  }
-
-  static constexpr char kOpenToAll[] =
-      R"({"allowUser": ["admin.local", "admin.domain", "admin.ldap",
-                        "normal.local", "normal.domain", "normal.ldap"]})";
-  std::string token;
-  std::unique_ptr<TestEntry> entry_ = std::make_unique<TestEntry>();
-};
 
 TEST_F(Permission, ApiWithoutAuthLevelNeedsItAndIsNotSkipped) {
   EXPECT_TRUE(entry_->NeedPermission(entry_->Request()));
@@ -192,94 +135,6 @@ TEST_F(Permission, SecondCheckWithTheSameAllowanceAsksNobody) {
   EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_YES);
   EXPECT_EQ(entry_->CheckPermission(true), 106);
   EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 2);
-}
-
-TEST_F(Permission, AccessTokenServesWithoutASession) {
-  token = "T";
-  platform->tokenGrant = 0;
-  platform->tokenUser = "bob";
-  Describe(kOpenToAll);
-  MakeRequest(*entry_, "");
-  EXPECT_TRUE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
-  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 0);
-  EXPECT_EQ(platform->calls[platform->calls.size() - 2],
-            "QeloAccessTokenGrant(T, QELO.Test.Good, echo)");
-  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
-  EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_YES);
-}
-
-TEST_F(Permission, AccessTokenServesWhenTheSessionIsRefused) {
-  token = "T";
-  platform->authorized = -1;
-  platform->tokenGrant = 7;
-  platform->tokenUser = "bob";
-  EXPECT_TRUE(Check(kOpenToAll));
-  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
-}
-
-TEST_F(Permission, AccessTokenLeavesNothingOfTheRefusedSession) {
-  token = "T";
-  platform->authorized = -7;
-  platform->authorizedUser = "victim";
-  platform->tokenGrant = 0;
-  platform->tokenUser = "bob";
-  EXPECT_TRUE(Check(kOpenToAll));
-  EXPECT_EQ(entry_->Request()->GetSessionID(), "");
-  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
-  // The context that names the refused session is emptied before its options are read.
-  EXPECT_EQ(std::count(platform->calls.begin(), platform->calls.end(), "QeloCgiInit()"), 1);
-}
-
-TEST_F(Permission, AccessTokenIsAskedForEachCallWithinTheRequest) {
-  token = "T";
-  platform->tokenGrant = 0;
-  platform->tokenUser = "bob";
-  Describe(kOpenToAll);
-  MakeRequest(*entry_, "");
-  ASSERT_TRUE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
-  APIRequest inner(*entry_->Request());
-  APIResponse answer(&inner);
-  EXPECT_TRUE(entry_->CheckPermission(&inner, &answer));
-  platform->tokenGrant = -1;
-  EXPECT_FALSE(entry_->CheckPermission(&inner, &answer));
-  EXPECT_EQ(answer.GetError(), 119);
-  EXPECT_EQ(inner.GetLoginUserName(), "");
-}
-
-TEST_F(Permission, AnotherSidParameterWaivesNoToken) {
-  Describe(kOpenToAll);
-  MakeRequest(*entry_, "S", R"({"_sid": "other"})");
-  entry_->CheckPermission(entry_->Request(), entry_->Response());
-  EXPECT_EQ(std::count(platform->calls.begin(), platform->calls.end(),
-                       "QeloCgiIsAuthorizedEx(0, 0, 1)"),
-            1);
-}
-
-TEST_F(Permission, AccessTokenIsNotAskedWhenTheSessionIsGood) {
-  token = "T";
-  EXPECT_TRUE(Check(kOpenToAll));
-  EXPECT_EQ(Calls("QeloAccessTokenGrant"), 0);
-}
-
-TEST_F(Permission, RefusedAccessTokenIsNotAuthenticated) {
-  token = "T";
-  platform->authorized = -1;
-  platform->tokenUser = "bob";
-  EXPECT_FALSE(Check(kOpenToAll));
-  EXPECT_EQ(entry_->Response()->GetError(), 119);
-  EXPECT_EQ(entry_->Response()->GetServerError(), "unauth");
-  EXPECT_EQ(entry_->Request()->GetAuthResult(), AUTHORIZED_UNAUTHENTICATED);
-}
-
-TEST_F(Permission, RefusedAccessTokenLeavesNoUserBehind) {
-  token = "T";
-  platform->authorized = -1;  // and names the user whose session it was
-  platform->tokenUser = "bob";
-  Check(kOpenToAll);
-  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "");
-  EXPECT_FALSE(entry_->Request()->IsAuthorized());
-  EXPECT_FALSE(entry_->Request()->IsAdmin());
-  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "");
 }
 
 TEST_F(Permission, RefusedSessionLeavesNoUserBehind) {
