@@ -56,7 +56,6 @@ TEST_F(PollingWait, AnswersWhenTheBodyChanges) {
   const Stopwatch watch;
   ASSERT_EQ(Wait("alice/1", "", 20), 0);
   EXPECT_EQ(out["data"], 2);
-  EXPECT_GE(watch.Milliseconds(), 90);
   EXPECT_LT(watch.Milliseconds(), 5000);
 }
 
