@@ -1,4 +1,5 @@
 #include <linux/sched.h>
+#include <sched.h>
 #include <signal.h>
 #include <sys/prctl.h>
 #include <sys/stat.h>
@@ -139,6 +140,45 @@ TEST_F(TaskProcesses, EndAfterFinishingLeavesTheResult) {
   Kill(worker);
   EXPECT_TRUE(Task("alice", id_).isFinished());
   EXPECT_EQ(Body(id_), R"({"n":5})");
+}
+
+// The reader gives way to the process at any moment, so that the process finishes and ends between
+// the reader's look at the record and its look at the process too.
+TEST_F(TaskProcesses, EndRightAfterFinishingIsNeverTakenForDeath) {
+  EXPECT_EQ(InChild([] {
+              cpu_set_t one;
+              CPU_ZERO(&one);
+              CPU_SET(sched_getcpu(), &one);
+              sched_setaffinity(0, sizeof one, &one);
+              for (int i = 0; i < 60; ++i) {
+                const std::string id = NewTask("alice");
+                const pid_t worker = StartSleeper([] {});
+                Task task("alice", id);
+                task.setCreatePid(worker);
+                const pid_t finisher = fork();
+                if (finisher == 0) {
+                  Task own("alice", id);
+                  own.reload();
+                  usleep(static_cast<useconds_t>(2000 + i * 37 % 1000));
+                  own.finish(false);
+                  kill(worker, SIGKILL);
+                  _exit(0);
+                }
+                const sched_param lowest{};
+                sched_setscheduler(0, SCHED_IDLE, &lowest);
+                do {
+                  task.reload();
+                } while (!task.isFinished());
+                sched_setscheduler(0, SCHED_OTHER, &lowest);
+                waitpid(worker, nullptr, 0);
+                waitpid(finisher, nullptr, 0);
+                if (NumberOf(task.getProperty("body")) != 1) {
+                  return 1;
+                }
+              }
+              return 0;
+            }),
+            0);
 }
 
 // Whoever stops a task kills its process first, and others may look between the two.
