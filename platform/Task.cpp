@@ -50,7 +50,9 @@ constexpr int kRecheckMs = 100;  // a process's death is seen by looking alone
 constexpr int kUnwatchedMs = 5;  // between looks without a watch
 
 int64_t deadlineAfter(int limit) {
-  return Platform::bootMilliseconds() + static_cast<int64_t>(std::max(limit, 0)) * kUnitMs;
+  const int64_t now = Platform::bootMilliseconds();
+  // The millisecond that has begun is not counted: a wait never ends early.
+  return limit > 0 ? now + static_cast<int64_t>(limit) * kUnitMs + 1 : now;
 }
 
 /// @return false when the deadline has passed
