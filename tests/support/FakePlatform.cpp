@@ -52,6 +52,14 @@ int fill(const std::string& text, char* buffer, int size) {
   return 1;
 }
 
+int preferenceDir(char* path, int size) {
+  if (fake().preferenceDir.empty()) {
+    return -1;
+  }
+  fill(fake().preferenceDir, path, size);
+  return fake().preferenceResult;
+}
+
 }  // namespace
 
 FakePlatform& FakePlatform::Get() {
@@ -142,12 +150,12 @@ int QLIBAppPrivUserHas(const char* user, const char* application, const char* ad
 
 int QELOUserPreferenceDirGet(const char* user, char* path, int size) {
   note("QELOUserPreferenceDirGet", user);
-  return fake().preferenceDir.empty() ? -1 : fill(fake().preferenceDir, path, size);
+  return preferenceDir(path, size);
 }
 
 int QELOGroupPreferenceDirGet(const char* group, char* path, int size) {
   note("QELOGroupPreferenceDirGet", group);
-  return fake().preferenceDir.empty() ? -1 : fill(fake().preferenceDir, path, size);
+  return preferenceDir(path, size);
 }
 
 int QLIBCConfGetARDOTimeout(void) {
@@ -161,7 +169,7 @@ int QeloCgiInit(const char* program, QeloCgiContext*) {
 
 int QeloCgiInitEx(const char* userStore, QeloCgiContext*) {
   note("QeloCgiInitEx", userStore);
-  return 1;
+  return fake().cgiInitEx;
 }
 
 int QeloCgiLoadInCookies(QeloCgiContext*) {
@@ -272,7 +280,8 @@ int QELOCloudServiceZttokenGenerateToken(const char* token, char* key, int size)
 
 bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
   note("ResetCredentialsByName", name, keepPrivilege ? "keep" : "drop");
-  return fake().credentialResult;
+  return fake().resetCredentials ? fake().resetCredentials(name, keepPrivilege)
+                                 : fake().credentialResult;
 }
 
 bool QELO::CredRequestUtil::GetDecryptAESString(const std::string& key, const std::string& cipher,
@@ -286,9 +295,9 @@ namespace QELO::sharing {
 bool GetSharingURL(const std::string& host, int port, bool isHttps, const std::string& path,
                    const std::string& rewriteApp, std::string& url, _tag_SHARING_URL_TYPE& type) {
   note("GetSharingURL", host, std::to_string(port), isHttps ? "https" : "http", path, rewriteApp);
-  url = "sharing:" + host + path + rewriteApp;
+  url = fake().sharingUrlKnown ? "sharing:" + host + path + rewriteApp : "";
   type = rewriteApp.empty() ? SHARING_URL_HOST : SHARING_URL_REWRITE;
-  return true;
+  return fake().sharingUrlKnown;
 }
 
 namespace db {

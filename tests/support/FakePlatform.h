@@ -26,11 +26,13 @@ struct FakePlatform {
   int isAdmin = 0;
   int appPriv = 1;
   std::string preferenceDir = "/fake/preferences";  ///< "": the look-up fails
+  int preferenceResult = 1;                         ///< result of a look-up that finds it
   int timeoutSetting = 900;
   std::function<int(const std::string&, const std::string&)> setKeyValue;  ///< unset: 0
 
   // CGI library
   std::string language = "enu";
+  int cgiInitEx = 1;
   int tokenEnable = 0;
   std::string remoteAddress = "192.0.2.7";  ///< "": not known
   int authorized = -2;                      ///< result of QeloCgiIsAuthorizedEx
@@ -43,6 +45,8 @@ struct FakePlatform {
 
   // Credentials and tokens
   bool credentialResult = true;
+  /// What a switch of credentials does; unset: nothing, with credentialResult as its result.
+  std::function<bool(const std::string& name, bool keepPrivilege)> resetCredentials;
   int tokenGrant = -1;
   std::string tokenUser;
   int aesKeyResult = -1;
@@ -58,6 +62,7 @@ struct FakePlatform {
 
   // Sharing
   bool sharingGood = false;
+  bool sharingUrlKnown = true;  ///< false: the look-up fails, with an empty address
 
   // Web server
   bool engineThrows = false;

@@ -6,9 +6,20 @@
 #include <cstdarg>
 #include <cstdio>
 
+namespace {
+
+int closings = 0;
+
+}  // namespace
+
 std::vector<SyslogCapture::Message>& SyslogCapture::Messages() {
   static std::vector<Message> messages;
   return messages;
+}
+
+std::vector<SyslogCapture::Opening>& SyslogCapture::Openings() {
+  static std::vector<Opening> openings;
+  return openings;
 }
 
 std::string& SyslogCapture::Identity() {
@@ -23,6 +34,8 @@ int& SyslogCapture::Copy() {
 
 void SyslogCapture::Clear() {
   Messages().clear();
+  Openings().clear();
+  closings = 0;
 }
 
 int SyslogCapture::Count(const std::string& part) {
@@ -67,8 +80,12 @@ extern "C" __attribute__((visibility("default"))) void __syslog_chk(int priority
 }
 #pragma GCC diagnostic pop
 
-extern "C" __attribute__((visibility("default"))) void openlog(const char* identity, int, int) {
+extern "C" __attribute__((visibility("default"))) void openlog(const char* identity, int options,
+                                                               int facility) {
   SyslogCapture::Identity() = identity;
+  SyslogCapture::Openings().push_back({identity, options, facility, closings});
 }
 
-extern "C" __attribute__((visibility("default"))) void closelog() {}
+extern "C" __attribute__((visibility("default"))) void closelog() {
+  ++closings;
+}

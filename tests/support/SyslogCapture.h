@@ -10,8 +10,17 @@ struct SyslogCapture {
     std::string text;
   };
   static std::vector<Message>& Messages();
+  /// What an openlog() was given, and how many closelog() there were before it.
+  struct Opening {
+    std::string identity;
+    int options;
+    int facility;
+    int closings;
+  };
+  static std::vector<Opening>& Openings();
   /// The identity of the last openlog().
   static std::string& Identity();
+  /// Forgets messages and openings.
   static void Clear();
   /// Where messages are written as well, a line each, so that those of child processes are seen;
   /// -1: nowhere.

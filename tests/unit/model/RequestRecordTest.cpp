@@ -248,6 +248,20 @@ TEST(RequestPreferenceDir, IsWhatThePlatformSays) {
                                       "QELOGroupPreferenceDirGet(staff)"}));
 }
 
+TEST(RequestPreferenceDir, IsWhatThePlatformSaysWithAResultOfZeroToo) {
+  FakePlatform::Reset().preferenceResult = 0;
+  const APIRequest request;
+  EXPECT_EQ(request.GetPreferenceDir(), "/fake/preferences");
+  EXPECT_EQ(request.GetGroupPreferenceDir("staff"), "/fake/preferences");
+}
+
+TEST(RequestPreferenceDir, IsTmpWithANegativeResultWhateverWasFilledIn) {
+  FakePlatform::Reset().preferenceResult = -1;
+  const APIRequest request;
+  EXPECT_EQ(request.GetPreferenceDir(), "/tmp");
+  EXPECT_EQ(request.GetGroupPreferenceDir("staff"), "/tmp");
+}
+
 TEST(RequestPreferenceDir, IsTmpWhenThePlatformFails) {
   FakePlatform::Reset().preferenceDir = "";
   const APIRequest request;

@@ -95,6 +95,17 @@ TEST(RequestSharingUrl, HasPortZeroAndNoPathWhenTheEnvironmentSaysNothing) {
   EXPECT_EQ(FakePlatform::Get().calls, std::vector<std::string>{"GetSharingURL(, 0, http, , )"});
 }
 
+TEST(RequestSharingUrl, ThatThePlatformDoesNotKnowIsKeptEmptyAndNotAskedForAgain) {
+  FakePlatform::Reset().sharingUrlKnown = false;
+  APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas","REWRITE_APP":"photo"})");
+  EXPECT_EQ(request.GetSharingURL("default"), "");
+  EXPECT_EQ(request.GetSharingURLType(), sharing::SHARING_URL_REWRITE);
+  EXPECT_EQ(request.Serialize()["url"]["urlSharing"], Json::Value(""));
+  FakePlatform::Get().sharingUrlKnown = true;
+  EXPECT_EQ(request.GetSharingURL("default"), "");
+  EXPECT_EQ(FakePlatform::Get().calls.size(), 1u);
+}
+
 TEST(RequestSharingUrl, OfACopyIsComputedForTheRequestCopiedFrom) {
   FakePlatform::Reset();
   const APIRequest request = requestWithEnv(R"({"HTTP_HOST":"first","HOST":"h"})");
