@@ -1,6 +1,7 @@
 #include "webapi/APIAuth.h"
 
 #include <cstdlib>
+#include <utility>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
@@ -39,7 +40,7 @@ std::string processSession() {
   Json::Value environment(Json::objectValue);
   environment["HTTP_COOKIE"] = cookies != nullptr ? cookies : "";
   APIRequest own;
-  own.InitEnv(environment);
+  own.InitEnv(std::move(environment));
   return own.GetSessionID();
 }
 
@@ -73,12 +74,6 @@ bool isAdmin(const APIRequest& request, const std::string& user) {
                                             : QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
 }
 
-bool hasAppPriv(const APIRequest& request, const std::string& user, const Json::Value& appPriv) {
-  const std::string name = JsonHelper::asString(appPriv);
-  return name.empty() ||
-         QLIBAppPrivUserHas(user.c_str(), name.c_str(), request.GetRemoteIP().c_str()) > 0;
-}
-
 }  // namespace
 
 std::string APIAuth::GetUserClass(bool isAdmin, const std::string& user) {
@@ -106,7 +101,8 @@ bool APIAuth::CheckPermission(APIRequest* request, APIResponse* response, const 
                                        GetUserClass(isAdmin(*request, user), user)))) {
     code = WEBAPI_ERR_NO_PERMISSION;
   }
-  if (code == WEBAPI_ERR_NONE && !hasAppPriv(*request, user, request->GetAPIInfo("appPriv", ""))) {
+  if (code == WEBAPI_ERR_NONE &&
+      !HoldsAppPriv(request->GetAPIInfo("appPriv", ""), user, request->GetRemoteIP())) {
     code = WEBAPI_ERR_NO_APP_PRIVILEGE;
   }
   if (code != WEBAPI_ERR_NONE) {
@@ -134,7 +130,7 @@ bool APIAuth::MayCall(const APIRequest& request, const Json::Value& description,
                                      : JsonHelper::member(description, "allowUser");
   return request.IsAuthorized() && !user.empty() &&
          ListsUserClass(allowUser, GetUserClass(request.IsAdmin(), user)) &&
-         hasAppPriv(request, user, JsonHelper::member(description, "appPriv"));
+         HoldsAppPriv(JsonHelper::member(description, "appPriv"), user, request.GetRemoteIP());
 }
 
 }  // namespace QELO

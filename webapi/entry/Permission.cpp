@@ -4,6 +4,7 @@
 
 #include <cstdlib>
 #include <cstring>
+#include <utility>
 
 #include "webapi/APIAuth.h"
 #include "webapi/APIRequest.h"
@@ -136,15 +137,16 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
     response->SetError(WEBAPI_ERR_NO_PERMISSION);
     return false;
   }
-  const std::string appPriv = JsonHelper::asString(request->GetAPIInfo("appPriv", ""));
-  if (!appPriv.empty() && QLIBAppPrivUserHas(caller->GetLoginUserName().c_str(), appPriv.c_str(),
-                                             caller->GetRemoteIP().c_str()) <= 0) {
+  const Json::Value appPriv = request->GetAPIInfo("appPriv", "");
+  if (!HoldsAppPriv(appPriv, caller->GetLoginUserName(), caller->GetRemoteIP())) {
     response->SetError(WEBAPI_ERR_NO_APP_PRIVILEGE);
     return false;
   }
-  Json::Value session = sessionOf(*caller);
-  session["appPriv"] = appPriv;
-  request->InitSession(session);
+  // The caller's own request holds already what the check found.
+  Json::Value session =
+      request == caller ? JsonHelper::member(request->Serialize(), "session") : sessionOf(*caller);
+  session["appPriv"] = JsonHelper::asString(appPriv);
+  request->InitSession(std::move(session));
   request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
   return true;
 }
@@ -231,7 +233,7 @@ void WebEntry::FillSession(const std::string& user, bool isAuthorized) {
   session["webapi"] = optionOf(Context(), "webapi");
   session["isAuthorized"] = isAuthorized;
   session["tokenEnable"] = QeloCgiIsTokenEnable(Context()) != 0;
-  Request()->InitSession(session);
+  Request()->InitSession(std::move(session));
 }
 
 }  // namespace QELO

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "webapi/JsonHelper.h"
+#include "webapi/platform/Core.h"
 
 namespace QELO {
 
@@ -14,7 +15,19 @@ bool ListsUserClass(const Json::Value& allowUser, const std::string& userClass) 
 }
 
 int AuthLevelOf(const Json::Value& level) {
-  return JsonHelper::asInt(level, AUTH_LOGIN);
+  const bool isInteger = level.type() == Json::intValue || level.type() == Json::uintValue;
+  return isInteger ? JsonHelper::asInt(level, AUTH_LOGIN) : AUTH_LOGIN;
+}
+
+bool HoldsAppPriv(const Json::Value& appPriv, const std::string& user, const std::string& address) {
+  if (appPriv.isNull()) {
+    return true;
+  }
+  if (!appPriv.isString()) {
+    return false;
+  }
+  const std::string name = appPriv.asString();
+  return name.empty() || QLIBAppPrivUserHas(user.c_str(), name.c_str(), address.c_str()) > 0;
 }
 
 }  // namespace QELO

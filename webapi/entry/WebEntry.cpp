@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <exception>
+#include <utility>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
@@ -38,8 +39,14 @@ std::string environmentText(const char* name) {
   return text != nullptr ? text : "";
 }
 
-void putEnvironment(const char* name, const std::string& value) {
-  setenv(name, value.c_str(), 1);
+/// Without it the platform's libraries would go on with the credentials that were there before.
+/// @return false, logged, when the variable cannot be set
+bool putEnvironment(const char* name, const std::string& value) {
+  if (setenv(name, value.c_str(), 1) != 0) {
+    WEBAPI_LOG("WebEntry", "cannot set %s [%m]", name);
+    return false;
+  }
+  return true;
 }
 
 /// Adds the session cookie that counts, and renames the one before it.
@@ -104,7 +111,7 @@ bool WebEntry::Initialize(const Json::Value&) {
   Json::Value session(Json::objectValue);
   session["uiLang"] = QeloCgiGetLang(Context());
   session["tokenEnable"] = QeloCgiIsTokenEnable(Context());
-  Request()->InitSession(session);
+  Request()->InitSession(std::move(session));
   if (!GatherEnvironment()) {
     Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
     return false;
@@ -129,7 +136,7 @@ bool WebEntry::GatherEnvironment() {
   if (QeloCgiGetRemoteIP(address, kAddressSize) == 0) {
     environment["QELO_REMOTE_IP"] = address;
   }
-  Request()->InitEnv(environment);
+  Request()->InitEnv(std::move(environment));
   return true;
 }
 
@@ -148,19 +155,23 @@ bool WebEntry::RewriteCredentials() {
   std::string sharingHeader = environmentText(SZ_X_SHARING_HEADER);
   if (sharing.isSet) {
     sharingHeader = sharing.value;
-    putEnvironment(SZ_X_SHARING_HEADER, sharingHeader);
     if (sharingSession.isSet) {
       cookies += hadCookies ? "; " : "";
       cookies += std::string(sharing::SZK_SHARING_SID) + "=" + sharingSession.value;
-      putEnvironment("HTTP_COOKIE", cookies);
     }
   }
-  Json::Value environment(Json::objectValue);
   if (session.isSet) {
     replaceSession(cookies, hadCookies, session.value);
-    putEnvironment("HTTP_COOKIE", cookies);
-  } else if (token.isSet) {
-    if (setenv(kTokenVariable, token.value.c_str(), 1) != 0) {
+  }
+  const bool hasNewCookies = session.isSet || (sharing.isSet && sharingSession.isSet);
+  if ((sharing.isSet && !putEnvironment(SZ_X_SHARING_HEADER, sharingHeader)) ||
+      (hasNewCookies && !putEnvironment("HTTP_COOKIE", cookies))) {
+    Response()->SetError(WEBAPI_ERR_NO_ANSWER);
+    return false;
+  }
+  Json::Value environment(Json::objectValue);
+  if (!session.isSet && token.isSet) {
+    if (!putEnvironment(kTokenVariable, token.value)) {
       return false;
     }
     environment[kTokenVariable] = token.value;
@@ -168,7 +179,7 @@ bool WebEntry::RewriteCredentials() {
   QeloCgiLoadInCookies(Context());
   environment["HTTP_COOKIE"] = cookies;
   environment[SZ_X_SHARING_HEADER] = sharingHeader;
-  Request()->InitEnv(environment);
+  Request()->InitEnv(std::move(environment));
   return true;
 }
 

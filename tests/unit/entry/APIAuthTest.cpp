@@ -113,6 +113,14 @@ TEST_F(APIAuthTest, CheckPermissionRefusesWithoutATimeoutSetting) {
   EXPECT_EQ(Check(), 105);
 }
 
+TEST_F(APIAuthTest, CheckPermissionRefusesWithoutTheUserStore) {
+  for (const int result : {0, -1}) {
+    platform->cgiInitEx = result;
+    EXPECT_EQ(Check(), 105);
+  }
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 0);
+}
+
 TEST_F(APIAuthTest, CheckPermissionRefusesAnotherUserClass) {
   request_.InitAPIInfo(Parse(R"({"allowUser": ["admin.local"]})"));
   EXPECT_EQ(Check(), 105);
@@ -139,6 +147,9 @@ TEST_F(APIAuthTest, CheckPermissionSets160WithoutTheApplicationPrivilege) {
   EXPECT_EQ(platform->calls.back(), "QLIBAppPrivUserHas(ann, Files, 192.0.2.7)");
   platform->appPriv = 0;
   EXPECT_EQ(Check(), 160);
+  platform->appPriv = 1;
+  request_.InitAPIInfo(Parse(R"({"allowUser": ["normal.local"], "appPriv": ["Files"]})"));
+  EXPECT_EQ(Check(), 160);
 }
 
 TEST_F(APIAuthTest, CheckPermissionWithoutRequestOrResponseRefuses) {
@@ -164,7 +175,11 @@ TEST_F(APIAuthTest, MayCallWhatNeedsNoLogin) {
   EXPECT_TRUE(MayCall(R"({"authLevel": 0})"));
   EXPECT_TRUE(MayCall(R"({"authLevel": 2})"));
   EXPECT_FALSE(MayCall(R"({"authLevel": 1, "allowUser": ["normal.local"]})"));
-  EXPECT_FALSE(MayCall(R"({"authLevel": null, "allowUser": ["normal.local"]})"));
+  for (const char* level : {"null", "false", "0.5", "\"0\"", "\"2\"", "[]"}) {
+    EXPECT_FALSE(
+        MayCall(std::string(R"({"allowUser": ["normal.local"], "authLevel": )") + level + "}"))
+        << level;
+  }
 }
 
 TEST_F(APIAuthTest, MayCallByClassPrivilegeAndAuthorisation) {
@@ -177,6 +192,7 @@ TEST_F(APIAuthTest, MayCallByClassPrivilegeAndAuthorisation) {
   platform->appPriv = 0;
   EXPECT_TRUE(MayCall(open));
   EXPECT_FALSE(MayCall(R"({"allowUser": ["normal.local"], "appPriv": "Files"})"));
+  EXPECT_FALSE(MayCall(R"({"allowUser": ["normal.local"], "appPriv": ["Files"]})"));
   request_.InitSession(Parse(R"({"username": "ann", "isAuthorized": false})"));
   EXPECT_FALSE(MayCall(open));
   request_.InitSession(Parse(R"({"username": "", "isAuthorized": true})"));

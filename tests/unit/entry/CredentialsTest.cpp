@@ -106,6 +106,63 @@ TEST_F(CredentialParameters, TidThatCannotBeExportedStopsWithoutAnError) {
   EXPECT_EQ(entry_.Response()->GetBody(), Json::Value(Json::objectValue));
 }
 
+TEST_F(CredentialParameters, ThatCannotBeExportedStopRatherThanLeaveTheFormerOnes) {
+  const std::pair<const char*, const char*> cases[] = {
+      {"_sid=X", "HTTP_COOKIE"},
+      {"_sharing_id=S&_sharing_sid=T", "HTTP_COOKIE"},
+      {"_sharing_id=S&_sharing_sid=T", SZ_X_SHARING_HEADER},
+      {"_sharing_id=S&_sid=X", SZ_X_SHARING_HEADER}};
+  for (const auto& [query, variable] : cases) {
+    SyslogCapture::Clear();
+    Get(query);
+    Set("HTTP_COOKIE", "id=OLD");
+    unsetenv(SZ_X_SHARING_HEADER);
+    TestEntry entry;
+    const FailingSetenv failing(variable);
+    EXPECT_FALSE(entry.Initialize(Json::Value())) << query;
+    EXPECT_EQ(entry.Response()->GetError(), 117) << query;
+    ASSERT_EQ(SyslogCapture::Messages().size(), 1U) << query;
+    EXPECT_EQ(SyslogCapture::Messages()[0].priority, 3);
+    EXPECT_EQ(
+        SyslogCapture::Count(std::string("cannot set ") + variable + " [Cannot allocate memory]"),
+        1);
+  }
+}
+
+TEST_F(CredentialParameters, ThatCannotBeExportedCallNothing) {
+  Describe(R"({"authLevel": 0})", R"({"grantByDefault": true})");
+  Get("api=QELO.Test.Good&version=1&method=echo&_sid=X");
+  Set("HTTP_COOKIE", "id=OLD");
+  const FailingSetenv failing("HTTP_COOKIE");
+  EXPECT_EQ(Serve().Code(), 117);
+}
+
+TEST_F(CredentialParameters, ThatAreNumbersCountAsSentAndEmpty) {
+  Initialize("_sid=12345", "id=OLD");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "abandoned=OLD; id=");
+  EXPECT_EQ(entry_.Request()->GetSessionID(), "");
+}
+
+TEST_F(CredentialParameters, TokenAndSharingIdThatAreNumbersCountAsSentAndEmpty) {
+  Set(SZ_X_SHARING_HEADER, "header");
+  Initialize("tid=5&_sharing_id=7&_sharing_sid=8", "lang=en");
+  EXPECT_EQ(Environment("qeloAccessToken"), "");
+  EXPECT_EQ(entry_.Request()->GetQeloAccessTokenID(), nullptr);
+  EXPECT_EQ(Environment(SZ_X_SHARING_HEADER), "");
+  EXPECT_FALSE(entry_.Request()->IsSharing());
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "lang=en; sharing_sid=");
+}
+
+TEST_F(CredentialParameters, OneLeavesEmptyTextsWhereThereWasNothing) {
+  Initialize("tid=T");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "(unset)");
+  EXPECT_EQ(Environment(SZ_X_SHARING_HEADER), "(unset)");
+  for (const char* key : {"HTTP_COOKIE", SZ_X_SHARING_HEADER}) {
+    EXPECT_TRUE(entry_.Request()->HasEnv(key)) << key;
+    EXPECT_EQ(entry_.Request()->GetEnv(key), Json::Value("")) << key;
+  }
+}
+
 TEST_F(CredentialParameters, SharingSidWithoutSharingIdIsIgnored) {
   Initialize("_sharing_sid=T", "id=OLD");
   EXPECT_EQ(Environment("HTTP_COOKIE"), "id=OLD");

@@ -43,6 +43,34 @@ TEST_F(EntryLifecycle, InitializeGoesOnWithoutARemoteAddress) {
   EXPECT_EQ(entry.Response()->GetError(), 0);
 }
 
+TEST_F(EntryLifecycle, RemoteAddressHas64BytesAtMost) {
+  const std::string longest(64, '1');
+  for (const std::string& address : {longest, longest + "2"}) {
+    platform->remoteAddress = address;
+    Get("api=a");
+    TestEntry entry;
+    EXPECT_TRUE(entry.Initialize(Json::Value()));
+    EXPECT_EQ(entry.Request()->GetRemoteIP(), longest);
+  }
+}
+
+TEST_F(EntryLifecycle, TokenFlagIsTheCgiLibrarysNumberAndReadsAsATruth) {
+  for (const int flag : {0, 1, 2, -1}) {
+    platform->tokenEnable = flag;
+    Get("api=a");
+    TestEntry entry;
+    EXPECT_TRUE(entry.Initialize(Json::Value()));
+    EXPECT_EQ(entry.Request()->Serialize()["session"]["tokenEnable"], Json::Value(flag));
+    EXPECT_EQ(entry.Request()->IsTokenEnable(), flag != 0);
+    for (const bool truth : {false, true}) {
+      Json::Value session;
+      session["tokenEnable"] = truth;
+      entry.Request()->InitSession(session);
+      EXPECT_EQ(entry.Request()->IsTokenEnable(), truth);
+    }
+  }
+}
+
 TEST_F(EntryLifecycle, RunPrintsTheMethodsAnswer) {
   DescribeOpen();
   Get(std::string(kEcho) + "&name=a%20b");
@@ -197,6 +225,34 @@ TEST_F(EntryLifecycle, RelayIsAnsweredWith109) {
   DescribeOpen();
   Get(std::string(kEcho) + "&relay_zt=1");
   EXPECT_EQ(Serve().Code(), 109);
+}
+
+// The entry names the process before it decides; dispatch names it once more.
+TEST_F(EntryLifecycle, RelayIsNotDispatched) {
+  DescribeOpen();
+  const auto namings = [](const std::string& query) {
+    Get(query);
+    TestEntry entry;
+    SyslogCapture::Clear();
+    Printed([&entry] { entry.Run(Json::Value()); });
+    return SyslogCapture::Openings().size();
+  };
+  EXPECT_EQ(namings(std::string(kEcho) + "&relay_zt=1"), 1U);
+  EXPECT_EQ(namings(std::string(kEcho) + "&relay_zt="), 1U);
+  EXPECT_EQ(namings(kEcho), 3U);
+}
+
+TEST_F(EntryLifecycle, RelayWithoutAnApiIs101) {
+  Get("version=1&method=echo&relay_zt=1");
+  EXPECT_EQ(Serve().Code(), 101);
+}
+
+TEST_F(EntryLifecycle, RefusedSharingRequestRunsWhereTheCheckIsSkipped) {
+  Describe(R"({"authLevel": 2})", R"({"grantByDefault": true})");
+  Get(std::string(kEcho) + "&name=shared&_sharing_id=S");
+  const CgiAnswer answer = Serve();
+  EXPECT_EQ(answer.Json()["data"]["name"], "shared");
+  EXPECT_FALSE(answer.Json().isMember("error"));
 }
 
 TEST_F(EntryLifecycle, SharingRequestIsRefusedWith126) {

@@ -166,6 +166,19 @@ TEST_F(Output, BodyIsFlushed) {
   close(fd);
 }
 
+TEST_F(Output, BodyThatCannotBeWrittenIsNotLeftForALaterFlush) {
+  entry_.Response()->SetSuccess(Json::Value("lost"));
+  const int full = open("/dev/full", O_WRONLY | O_CLOEXEC);
+  {
+    fflush(stdout);
+    const Redirection output(STDOUT_FILENO, full);
+    entry_.OutputBody();
+  }
+  close(full);
+  clearerr(stdout);
+  EXPECT_EQ(Printed([] { printf("next"); }).text, "next");
+}
+
 TEST_F(Output, RestartAsksTheWebServersController) {
   RestartHttpd(nullptr);
   EXPECT_EQ(platform->calls, (Lines{"Engine()", "RestartService()"}));

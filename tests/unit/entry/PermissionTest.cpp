@@ -23,9 +23,12 @@ TEST_F(Permission, AuthLevelDecidesOnNeedAndSkip) {
   EXPECT_EQ(ask(R"({"authLevel": 3})"), std::pair(true, false));
 }
 
-TEST_F(Permission, AuthLevelThatIsNoNumberAsksForALogin) {
+TEST_F(Permission, AuthLevelThatIsNoIntegerAsksForALogin) {
   for (const char* description :
-       {R"({"authLevel": null})", R"({"authLevel": "none"})", R"({"authLevel": []})"}) {
+       {R"({"authLevel": null})", R"({"authLevel": "none"})", R"({"authLevel": []})",
+        R"({"authLevel": "0"})", R"({"authLevel": "2"})", R"({"authLevel": false})",
+        R"({"authLevel": 0.5})", R"({"authLevel": 0.0})", R"({"authLevel": 2.0})",
+        R"({"authLevel": {"0": 0}})", R"({"authLevel": 4294967296})"}) {
     entry_->Request()->InitAPIInfo(Parse(description));
     EXPECT_TRUE(entry_->NeedPermission(entry_->Request())) << description;
     EXPECT_FALSE(entry_->SkipPermission(entry_->Request())) << description;
@@ -92,6 +95,48 @@ TEST_F(Permission, TokenMismatchIsNotLoggedForAnApiThatIsSkipped) {
   platform->authorized = -7;
   EXPECT_FALSE(Check(R"({"authLevel": 2})"));
   EXPECT_EQ(SyslogCapture::Count("Token Authentication Fail."), 0);
+}
+
+TEST_F(Permission, TokenMismatchIsLoggedForAMethodThatAllowsTimeoutToo) {
+  platform->authorized = -7;
+  EXPECT_FALSE(Check(kOpenToAll, R"({"allowTimeout": true})"));
+  EXPECT_EQ(SyslogCapture::Count("WebEntry:577 Token Authentication Fail."), 1);
+}
+
+TEST_F(Permission, TokenMismatchOfTheOtherAllowanceIsNotLogged) {
+  platform->authorized = -7;
+  Describe(kOpenToAll, R"({"allowTimeout": true})");
+  MakeRequest(*entry_);
+  EXPECT_EQ(entry_->CheckPermission(false), 105);
+  platform->authorized = -6;
+  EXPECT_FALSE(entry_->CheckPermission(entry_->Request(), entry_->Response()));
+  EXPECT_EQ(SyslogCapture::Count("Token Authentication Fail."), 0);
+}
+
+TEST_F(Permission, TokenMismatchIsNotLoggedForAnotherLevelThanLogin) {
+  platform->authorized = -7;
+  for (const int level : {0, 2, 3}) {
+    Json::Value keys = Parse(kOpenToAll);
+    keys["authLevel"] = level;
+    EXPECT_FALSE(Check(JsonHelper::toString(keys), R"({"allowTimeout": true})"));
+    EXPECT_EQ(entry_->Response()->GetError(), 105);
+  }
+  EXPECT_EQ(SyslogCapture::Count("Token Authentication Fail."), 0);
+}
+
+TEST_F(Permission, ResultOfZeroIsRefusedWithItsUserKnownAndNoTokenAsked) {
+  token = "T";
+  platform->tokenGrant = 0;
+  platform->tokenUser = "bob";
+  platform->authorized = 0;
+  EXPECT_FALSE(Check(kOpenToAll));
+  EXPECT_EQ(entry_->Response()->GetError(), 105);
+  EXPECT_EQ(entry_->Response()->GetServerError(), "noprivilege");
+  EXPECT_EQ(Calls("QeloAccessTokenGrant"), 0);
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "ann");
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "ann");
+  EXPECT_FALSE(entry_->Request()->IsAuthorized());
+  EXPECT_EQ(entry_->Request()->GetAuthResult(), 0);
 }
 
 TEST_F(Permission, OtherRefusalsAreNotLoggedAsTokenFailure) {
@@ -169,6 +214,17 @@ TEST_F(Permission, SessionWithoutOptionsTakesTheirDefaults) {
                       "authResult": 1})"));
 }
 
+TEST_F(Permission, TimeoutIsReadAsADecimalNumberUpToWhatIsNone) {
+  const std::pair<const char*, int> cases[] = {{"900", 900}, {"010", 10}, {"0x10", 0},
+                                               {"12.5", 12}, {"60s", 60}, {"-5", -5},
+                                               {"", 0},      {"never", 0}};
+  for (const auto& [text, seconds] : cases) {
+    platform->options = {{"timeout", text}};
+    EXPECT_TRUE(Check(kOpenToAll));
+    EXPECT_EQ(entry_->Request()->GetTimeoutDuration(), seconds) << text;
+  }
+}
+
 TEST_F(Permission, HostThatCannotTellMakesNobodyAnAdministrator) {
   platform->isAdmin = -1;
   Check(kOpenToAll);
@@ -187,6 +243,14 @@ TEST_F(Permission, AllowUserThatIsEmptyOrNoListRefuses) {
     EXPECT_FALSE(Check(keys)) << keys;
     EXPECT_EQ(entry_->Response()->GetError(), 105) << keys;
   }
+}
+
+TEST_F(Permission, AllowUserThatIsNullRefusesAndTakesThePlaceOfTheApisToo) {
+  EXPECT_FALSE(Check(R"({"allowUser": null})"));
+  EXPECT_EQ(entry_->Response()->GetError(), 105);
+  EXPECT_FALSE(Check(kOpenToAll, R"({"allowUser": null})"));
+  EXPECT_EQ(entry_->Response()->GetError(), 105);
+  EXPECT_TRUE(Check(R"({"allowUser": null})", kOpenToAll));
 }
 
 TEST_F(Permission, AllowUserNamesTheCallersClass) {
@@ -231,6 +295,21 @@ TEST_F(Permission, MissingApplicationPrivilegeSets160) {
 TEST_F(Permission, EmptyApplicationPrivilegeIsNotAskedFor) {
   platform->appPriv = 0;
   EXPECT_TRUE(Check(R"({"allowUser": ["normal.local"], "appPriv": ""})"));
+  EXPECT_EQ(Calls("QLIBAppPrivUserHas"), 0);
+}
+
+TEST_F(Permission, ApplicationPrivilegeThatIsNullIsNotAskedFor) {
+  platform->appPriv = 0;
+  EXPECT_TRUE(Check(R"({"allowUser": ["normal.local"], "appPriv": null})"));
+  EXPECT_EQ(Calls("QLIBAppPrivUserHas"), 0);
+}
+
+TEST_F(Permission, ApplicationPrivilegeThatIsNoTextIsHeldByNobody) {
+  for (const char* appPriv : {R"(["Files"])", "{}", "[]", "false", "0.5", "1"}) {
+    const std::string keys = R"({"allowUser": ["normal.local"], "appPriv": )";
+    EXPECT_FALSE(Check(keys + appPriv + "}")) << appPriv;
+    EXPECT_EQ(entry_->Response()->GetError(), 160) << appPriv;
+  }
   EXPECT_EQ(Calls("QLIBAppPrivUserHas"), 0);
 }
 
