@@ -115,6 +115,8 @@ class WEBAPI_API APIRunner {
   bool InitEnv(Json::Value& env);
   bool ProcessEntry(APIRequest* request, APIResponse* response);
   bool HandleCompound(APIRequest* request, APIResponse* response);
+  /// How many compound requests are being handled, one within the other; 0 outside of them.
+  int CompoundDepth() const { return compoundDepth_; }
   bool ProcessSocket(APIRequest* request, APIResponse* response);
   bool ProcessLib(APIRequest* request, APIResponse* response);
   /// Asks the permission hooks in their order. @return whether the call may go on

@@ -5,6 +5,8 @@
 #include <sys/prctl.h>
 #include <unistd.h>
 
+#include <utility>
+
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
@@ -59,7 +61,7 @@ bool APIRunner::Initialize(const Json::Value& param) {
   if (!InitEnv(env)) {
     return false;
   }
-  request_->InitEnv(env);
+  request_->InitEnv(std::move(env));
   if (JsonHelper::hasMember(param, "environ")) {
     request_->InitEnv(param["environ"]);
   }

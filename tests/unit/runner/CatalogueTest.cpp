@@ -97,6 +97,21 @@ TEST_F(Catalogue, UnreadableLibDefGivesNullDefaults) {
   }
 }
 
+TEST_F(Catalogue, MissingLibDefGivesNullDefaultsAndNoAttributes) {
+  std::filesystem::remove(Paths::kLibDef);
+  WriteNamed("QELO.A.lib", "QELO.A", "x");
+  TestRunner tested;
+  EXPECT_TRUE(tested.InitLibDesc(catalogue, "QELO.A"));
+  for (const char* key : {"authLevel", "allowUser", "priority"}) {
+    ASSERT_TRUE(catalogue["QELO.A"].isMember(key)) << key;
+    EXPECT_TRUE(catalogue["QELO.A"][key].isNull()) << key;
+  }
+  EXPECT_EQ(catalogue["QELO.A"]["requestFormat"], Json::Value("JSON"));
+  EXPECT_TRUE(tested.GetMethod("QELO.A", 1, "plain").isNull());
+  EXPECT_FALSE(tested.GetMethodAttr("QELO.A", 1, "plain", "allowDemo"));
+  EXPECT_TRUE(SyslogCapture::Messages().empty());
+}
+
 TEST_F(Catalogue, LongestExistingPrefixWins) {
   WriteNamed("QELO.A.lib", "QELO.A.B.X", "short");
   WriteNamed("QELO.A.B.lib", "QELO.A.B.X", "long");

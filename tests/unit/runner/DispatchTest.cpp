@@ -146,6 +146,70 @@ TEST_F(Dispatch, EnvironmentIntoANonObjectIs101) {
   EXPECT_EQ(tested.Response()->GetError(), 101);
 }
 
+TEST_F(Dispatch, EnvironmentEntryWithoutAnEqualsSignIsSkipped) {
+  TestRunner tested;
+  char bare[] = "BARE";
+  char full[] = "FULL=b=c";
+  char empty[] = "EMPTY=";
+  char* entries[] = {bare, full, empty, nullptr};
+  char** former = environ;
+  Json::Value env(Json::objectValue);
+  environ = entries;
+  const bool gathered = tested.InitEnv(env);
+  environ = former;
+  EXPECT_TRUE(gathered);
+  EXPECT_EQ(env, Parse(R"({"FULL": "b=c", "EMPTY": ""})"));
+}
+
+TEST_F(Dispatch, RequestThatADaemonServesIsNotRunInProcess) {
+  struct DaemonRunner : TestRunner {
+    bool CanProcessSocket(APIRequest* request) override {
+      asked += "socket " + request->GetAPIMethod() + " ";
+      return true;
+    }
+  } tested;
+  WriteDescription(Description("state"));
+  MakeRequest("QELO.Test.Call", 1, "run");
+  SyslogCapture::Clear();
+  EXPECT_FALSE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 117);
+  EXPECT_EQ(tested.asked.rfind("socket run ", 0), 0u) << tested.asked;
+  EXPECT_TRUE(platform->calls.empty());             // nobody's credentials were taken
+  EXPECT_EQ(SyslogCapture::Openings().size(), 2u);  // named before and after
+  MakeRequest("QELO.Test.Call", 9, "run");
+  tested.asked.clear();
+  EXPECT_FALSE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 104);
+  EXPECT_EQ(tested.asked, "");
+}
+
+TEST_F(Dispatch, CompoundDepthCountsTheRequestsAroundACall) {
+  struct DepthRunner : TestRunner {
+    bool NeedPermission(APIRequest*) override {
+      asked += std::to_string(CompoundDepth()) + " ";
+      return false;
+    }
+    int Depth() const { return CompoundDepth(); }
+  } tested;
+  Json::Value entries = Parse(R"({"minVersion": 1, "maxVersion": 2,
+                                  "methods": {"2": [{"echo": {"grantable": true}}]}})");
+  entries["lib"] = std::string(TEST_PLUGIN_DIR) + "/entries.so";
+  WriteDescription(entries, "QELO.Test.Entries");
+  WriteDescription(Parse(R"({"lib": "", "minVersion": 1, "maxVersion": 1,
+                             "methods": {"1": [{"request": {"grantable": true}}]}})"),
+                   "QELO.Entry.Request");
+  MakeRequest("QELO.Entry.Request", 1, "request", Parse(R"({"compound": [
+      {"api": "QELO.Test.Entries", "version": 2, "method": "echo"},
+      {"api": "QELO.Entry.Request", "version": 1, "method": "request", "compound":
+        [{"api": "QELO.Test.Entries", "version": 2, "method": "echo"}]},
+      {"api": "QELO.Test.Entries", "version": 2, "method": "echo"}]})"));
+  EXPECT_EQ(tested.Depth(), 0);
+  EXPECT_TRUE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(tested.asked, "1 2 1 ");
+  EXPECT_EQ(tested.Depth(), 0);
+  EXPECT_EQ(Data()["has_fail"], Json::Value(false));
+}
+
 TEST_F(Dispatch, EntryWithoutCompoundIs110AndOtherMethodsSetNothing) {
   TestRunner tested;
   MakeRequest("QELO.Entry.Request", 1, "request");
@@ -190,6 +254,35 @@ TEST_F(Dispatch, CallbacksRunInAnotherProcessAfterASecond) {
   int status = -1;
   EXPECT_GT(wait(&status), 0);
   EXPECT_EQ(status, 0);
+}
+
+/// Where a callback writes which letter.
+struct Mark {
+  int fd;
+  char letter;
+};
+
+void writeMark(void* argument) {
+  const Mark* mark = static_cast<const Mark*>(argument);
+  [[maybe_unused]] const ssize_t count = write(mark->fd, &mark->letter, 1);
+}
+
+TEST_F(Dispatch, CallbacksRunInTheOrderOfTheirRegistrationWithTheirArguments) {
+  MakeRequest("QELO.Test.Call", 1, "run");
+  int ends[2];
+  ASSERT_EQ(pipe(ends), 0);
+  Mark marks[] = {{ends[1], 'c'}, {ends[1], 'a'}, {ends[1], 'b'}};
+  response->SetCallbackFunc(writeMark, &marks[0]);
+  response->SetCallbackFunc(writeByte, &ends[1]);
+  response->SetCallbackFunc(writeMark, &marks[1]);
+  response->SetCallbackFunc(writeMark, &marks[2]);
+  EXPECT_TRUE(TestRunner().HandleCallback(response.get()));
+  close(ends[1]);
+  EXPECT_GT(wait(nullptr), 0);
+  char letters[8] = {};
+  EXPECT_EQ(read(ends[0], letters, sizeof letters), 4);
+  EXPECT_STREQ(letters, "cxab");
+  close(ends[0]);
 }
 
 TEST_F(Dispatch, FailedForkOfCallbacksReturns) {

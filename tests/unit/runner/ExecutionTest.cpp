@@ -103,6 +103,18 @@ TEST_F(Execution, SharingRequestAsksTheSharingCheckAlone) {
   EXPECT_EQ(tested.asked, "sharing skip ");
 }
 
+TEST_F(Execution, RefusedSharingRequestRunsWhereTheCheckIsSkipped) {
+  WriteDescription(Description("state"));
+  MakeRequest("QELO.Test.Call", 1, "run");
+  request->InitEnv(Parse(R"({"HTTP_X_QELO_SHARING": "abc"})"));
+  TestRunner tested;
+  tested.sharing = false;
+  tested.skip = true;
+  EXPECT_TRUE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(tested.asked, "sharing skip ");
+  EXPECT_EQ(response->GetError(), 0);
+}
+
 TEST_F(Execution, NoNeedNoCheck) {
   EXPECT_TRUE(ProcessPlugin("state"));
   EXPECT_EQ(runner->asked, "need ");

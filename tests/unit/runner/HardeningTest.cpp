@@ -97,6 +97,34 @@ TEST_F(Hardening, PriorityComesBackAfterARefusedCheck) {
   EXPECT_TRUE(geteuid() != 0 || getpriority(PRIO_PROCESS, 0) == former);
 }
 
+TEST_F(Hardening, PriorityComesBackAfterAMissingMethodAndIsNotTakenForAMissingLibrary) {
+  const int former = getpriority(PRIO_PROCESS, 0);
+  for (const auto& [plugin, version, code, calls] :
+       {std::tuple("state", 2, 121, 2), std::tuple("no_table", 1, 111, 0)}) {
+    Json::Value description = Description(plugin);
+    description["priority"] = 7;
+    WriteDescription(description);
+    MakeRequest("QELO.Test.Call", version, "run");
+    priorityCalls = 0;
+    EXPECT_FALSE(TestRunner().Process(request.get(), response.get()));
+    EXPECT_EQ(response->GetError(), code);
+    EXPECT_EQ(priorityCalls, calls);
+    EXPECT_TRUE(geteuid() != 0 || getpriority(PRIO_PROCESS, 0) == former);
+  }
+}
+
+TEST_F(Hardening, PriorityThatNobodyDescribesIsZero) {
+  if (geteuid() != 0) {
+    GTEST_SKIP() << "only root may raise the priority";
+  }
+  WriteLibDef("{}");  // fills in a null
+  EXPECT_TRUE(InChild([&] {
+    ::setpriority(PRIO_PROCESS, 0, 5);
+    return ProcessPlugin("state") && Data()["priority"] == Json::Value(0) &&
+           getpriority(PRIO_PROCESS, 0) == 5;
+  }));
+}
+
 TEST_F(Hardening, MethodThatClosesTheCStreamsDoesNotSilenceTheProcess) {
   EXPECT_TRUE(InChild([&] {
     const std::string path = (directory / "output").string();

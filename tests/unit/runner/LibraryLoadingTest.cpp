@@ -1,3 +1,4 @@
+#include <dlfcn.h>
 #include <syslog.h>
 
 #include "tests/unit/runner/RunnerFixture.h"
@@ -106,6 +107,50 @@ TEST_F(LibraryLoading, OnePathIsOpenedOnce) {
   EXPECT_EQ(first, second);
   tested.CloseLib();
   EXPECT_FALSE(tested.CacheLib(request.get(), &second));
+}
+
+TEST_F(LibraryLoading, TwoSpellingsOfOnePathAreTwoOpenings) {
+  const std::string copy = (directory / "copy.so").string();
+  const std::string spelling = (directory / "." / "copy.so").string();
+  std::filesystem::copy_file(Plugin("state"), copy);
+  EXPECT_TRUE(Open(copy));
+  EXPECT_TRUE(Open(spelling));
+  EXPECT_NE(table, nullptr);
+  std::filesystem::remove(copy);
+  EXPECT_TRUE(Open(copy));
+  EXPECT_TRUE(Open(spelling));
+  EXPECT_FALSE(Open((directory / "." / "." / "copy.so").string()));
+}
+
+TEST_F(LibraryLoading, EverySpellingOfAPathIsClosed) {
+  const std::string copy = (directory / "copy.so").string();
+  std::filesystem::copy_file(Plugin("state"), copy);
+  EXPECT_TRUE(Open(copy));
+  EXPECT_TRUE(Open((directory / "." / "copy.so").string()));
+  void* handle = dlopen(copy.c_str(), RTLD_LAZY | RTLD_NOLOAD);
+  ASSERT_NE(handle, nullptr);
+  dlclose(handle);
+  tested.CloseLib();
+  EXPECT_EQ(dlopen(copy.c_str(), RTLD_LAZY | RTLD_NOLOAD), nullptr);
+}
+
+TEST_F(LibraryLoading, TwoApisOfOneLibraryShareItsOpening) {
+  const std::string copy = (directory / "copy.so").string();
+  std::filesystem::copy_file(Plugin("identity"), copy);
+  for (const char* api : {"QELO.Test.Identity", "QELO.Test.Open"}) {
+    Json::Value description = Parse(R"({"minVersion": 1, "maxVersion": 1,
+                                        "methods": {"1": ["plain"]}})");
+    description["lib"] = copy;
+    WriteDescription(description, api);
+  }
+  MakeRequest("QELO.Test.Identity", 1, "plain");
+  EXPECT_TRUE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 0);
+  std::filesystem::remove(copy);  // a second opening would fail
+  MakeRequest("QELO.Test.Open", 1, "plain");
+  EXPECT_TRUE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 0);
+  EXPECT_EQ(Data()["parameters"]["api"], Json::Value("QELO.Test.Open"));
 }
 
 }  // namespace

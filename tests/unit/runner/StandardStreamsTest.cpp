@@ -10,7 +10,7 @@ namespace {
 class Streams : public RunnerTest {
  protected:
   /// What a call of the plugin leaves on descriptor 1 when "input" can be read from descriptor 0.
-  std::string Output(const std::string& plugin, const std::string& attributes) {
+  std::string Output(const std::string& plugin, const std::string& attributes, int version = 1) {
     const std::string path = (directory / "output").string();
     const int output = open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC, 0600);
     Write((directory / "input").string(), "input input");
@@ -22,7 +22,10 @@ class Streams : public RunnerTest {
     dup2(output, 1);
     dup2(input, 0);
     printf("before ");
-    ProcessPlugin(plugin, attributes);
+    ProcessPlugin(plugin, attributes, version);
+    char left[6] = {};
+    EXPECT_GE(read(0, left, 5), 0);
+    inputAfter = left;
     printf(" after");
     fflush(stdout);
     dup2(formerOutput, 1);
@@ -33,11 +36,32 @@ class Streams : public RunnerTest {
     std::ifstream file(path);
     return std::string(std::istreambuf_iterator<char>(file), {});
   }
+  std::string inputAfter;  ///< the first bytes that could be read after the call
 };
 
 TEST_F(Streams, WhatAMethodPrintsGoesNowhere) {
   EXPECT_EQ(Output("printing", "{}"), "before  after");
   EXPECT_EQ(Data(), Json::Value("printed"));
+}
+
+TEST_F(Streams, ComeBackAfterALibraryThatCannotBeUsed) {
+  std::streambuf* const output = std::cout.rdbuf();
+  std::streambuf* const input = std::cin.rdbuf();
+  EXPECT_EQ(Output("no_table", "{}"), "before  after");
+  EXPECT_EQ(response->GetError(), 111);
+  EXPECT_EQ(inputAfter, "input");
+  EXPECT_EQ(std::cout.rdbuf(), output);
+  EXPECT_EQ(std::cin.rdbuf(), input);
+}
+
+TEST_F(Streams, ComeBackAfterAMethodThatIsMissing) {
+  std::streambuf* const output = std::cout.rdbuf();
+  std::streambuf* const input = std::cin.rdbuf();
+  EXPECT_EQ(Output("state", "{}", 2), "before  after");
+  EXPECT_EQ(response->GetError(), 121);
+  EXPECT_EQ(inputAfter, "input");
+  EXPECT_EQ(std::cout.rdbuf(), output);
+  EXPECT_EQ(std::cin.rdbuf(), input);
 }
 
 TEST_F(Streams, DownloadMethodPrints) {

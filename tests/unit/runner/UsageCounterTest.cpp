@@ -1,16 +1,51 @@
 #include "webapi/runner/UsageCounter.h"
 
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 
+#include <csignal>
 #include <ctime>
 
 #include "tests/unit/runner/RunnerFixture.h"
+
+namespace {
+bool dieBeforeRename = false;
+}  // namespace
+
+// Takes the place of the C library's for the whole test program.
+extern "C" __attribute__((visibility("default"))) int rename(const char* from,
+                                                             const char* to) noexcept {
+  if (dieBeforeRename) {
+    raise(SIGKILL);
+  }
+  return static_cast<int>(syscall(SYS_renameat, AT_FDCWD, from, AT_FDCWD, to));
+}
 
 namespace QELO {
 namespace {
 
 class UsageCounting : public RunnerTest {
  protected:
+  /// Whether another process could have the lock of the file at once.
+  bool IsUnlocked(const std::string& file) {
+    const int fd = open((directory / "spool" / (file + ".lock")).c_str(), O_RDWR | O_CLOEXEC);
+    const bool unlocked = fd >= 0 && flock(fd, LOCK_EX | LOCK_NB) == 0;
+    close(fd);
+    return unlocked;
+  }
+  /// Names in the directory, sorted, without the marker.
+  std::vector<std::string> Files() {
+    std::vector<std::string> names;
+    for (const auto& entry : std::filesystem::directory_iterator(directory / "spool")) {
+      if (entry.path().filename() != ".timestamp") {
+        names.push_back(entry.path().filename());
+      }
+    }
+    std::sort(names.begin(), names.end());
+    return names;
+  }
   Json::Value Counters(const std::string& file) {
     Json::Value value;
     JsonHelper::fromFile((directory / "spool" / file).string(), value);
@@ -79,6 +114,65 @@ TEST_F(UsageCounting, LockIsAskedForTwoSecondsAndItsRefusalLosesTheCountSilently
   EXPECT_TRUE(SyslogCapture::Messages().empty());
 }
 
+TEST_F(UsageCounting, LockIsGivenBackAtOnce) {
+  EXPECT_TRUE(counter.Increase("QELO.A.B", "x", 1));
+  EXPECT_EQ(platform->calls.back(), "QLIBCFileUnlockByFile()");
+  EXPECT_TRUE(IsUnlocked("QELO.A.B.json"));
+}
+
+TEST_F(UsageCounting, LockIsGivenBackAfterAFailedWriteWhichLeavesNothing) {
+  std::filesystem::create_directories(directory / "spool" / "QELO.A.B.json" / "in the way");
+  EXPECT_FALSE(counter.Increase("QELO.A.B", "x", 1));
+  EXPECT_TRUE(IsUnlocked("QELO.A.B.json"));
+  EXPECT_EQ(Files(), (std::vector<std::string>{"QELO.A.B.json", "QELO.A.B.json.lock"}));
+}
+
+TEST_F(UsageCounting, KilledWritersLeaveOneFileThatTheNextReplaces) {
+  EXPECT_TRUE(counter.Increase("QELO.A.B", "x", 1));
+  for (int i = 0; i < 3; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      dieBeforeRename = true;
+      counter.Increase("QELO.A.B", "x", 1);
+      _exit(0);
+    }
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_TRUE(WIFSIGNALED(status));
+  }
+  EXPECT_EQ(Files(),
+            (std::vector<std::string>{"QELO.A.B.json", "QELO.A.B.json.lock", "QELO.A.B.json.new"}));
+  EXPECT_TRUE(counter.Increase("QELO.A.B", "x", 1));
+  EXPECT_EQ(Files(), (std::vector<std::string>{"QELO.A.B.json", "QELO.A.B.json.lock"}));
+  EXPECT_EQ(Counters("QELO.A.B.json")["QELO.A.B_1_x"]["count"], Json::Value(2));
+}
+
+TEST_F(UsageCounting, LinkInThePlaceOfTheNewFileIsReplacedAndNotFollowed) {
+  Write("victim", "untouched");
+  std::filesystem::create_directory("spool");
+  for (const char* target : {"../victim", "../dangling"}) {
+    std::filesystem::create_symlink(target, "spool/QELO.A.B.json.new");
+    EXPECT_TRUE(counter.Increase("QELO.A.B", "x", 1));
+    EXPECT_EQ(Files(), (std::vector<std::string>{"QELO.A.B.json", "QELO.A.B.json.lock"}));
+    EXPECT_TRUE(
+        std::filesystem::is_regular_file(std::filesystem::symlink_status("spool/QELO.A.B.json")));
+  }
+  std::ifstream victim("victim");
+  EXPECT_EQ(std::string(std::istreambuf_iterator<char>(victim), {}), "untouched");
+  EXPECT_FALSE(std::filesystem::exists("dangling"));
+}
+
+TEST_F(UsageCounting, FileKeepsItsPermissions) {
+  using std::filesystem::perms;
+  EXPECT_TRUE(counter.Increase("QELO.A.B", "x", 1));
+  const std::filesystem::path file = directory / "spool" / "QELO.A.B.json";
+  EXPECT_EQ(std::filesystem::status(file).permissions(), perms::owner_read | perms::owner_write);
+  const perms opened = perms::owner_read | perms::owner_write | perms::group_read;
+  std::filesystem::permissions(file, opened);
+  EXPECT_TRUE(counter.Increase("QELO.A.B", "x", 1));
+  EXPECT_EQ(std::filesystem::status(file).permissions(), opened);
+}
+
 TEST_F(UsageCounting, CorruptFileIsReplaced) {
   for (const char* text : {"[1, 2]", "{\"cut", ""}) {
     Write("spool/QELO.A.B.json", text);
@@ -138,33 +232,69 @@ class CountedCalls : public RunnerTest {
       const auto reads = std::count(
           platform->calls.begin(), platform->calls.end(),
           "QLIBCFileCheckKeyValue(" + std::string(Paths::kSystemInfo) + ", enable_data_collect)");
-      _exit(reads <= 1 ? 0 : 1);
+      _exit(static_cast<int>(reads));
     }
     int status = -1;
     waitpid(child, &status, 0);
-    EXPECT_EQ(status, 0);
+    EXPECT_TRUE(WIFEXITED(status));
+    reads_ = WEXITSTATUS(status);
     Json::Value counters;
     JsonHelper::fromFile(std::string(Paths::kCounterDir) + "/QELO.Test.Call.json", counters);
     const Json::Value& written = JsonHelper::member(counters, "QELO.Test.Call_1_run");
     EXPECT_TRUE(written.isNull() || written["count"] == Json::Value(2));
     return std::filesystem::exists(Paths::kCounterDir);
   }
+
+  int reads_ = 0;  ///< of the switch, during the two calls
 };
 
 TEST_F(CountedCalls, OnlyWhenCollectionIsEnabled) {
   EXPECT_FALSE(IsCounted("{}"));
+  EXPECT_EQ(reads_, 1);
   platform->settings["enable_data_collect"] = "no";
   EXPECT_FALSE(IsCounted("{}"));
+  EXPECT_EQ(reads_, 1);
   platform->settings["enable_data_collect"] = "yes";
   EXPECT_TRUE(IsCounted("{}"));
+  EXPECT_EQ(reads_, 1);
 }
 
 TEST_F(CountedCalls, NotForOtherRunnersTimeoutMethodsOrUncountedApis) {
   platform->settings["enable_data_collect"] = "yes";
   EXPECT_FALSE(IsCounted("{}", Json::Value(), false));
+  EXPECT_EQ(reads_, 0);
   EXPECT_FALSE(IsCounted(R"({"allowTimeout": true})"));
+  EXPECT_EQ(reads_, 0);
   EXPECT_FALSE(IsCounted("{}", false));
+  EXPECT_EQ(reads_, 0);
   EXPECT_TRUE(IsCounted("{}", true));
+  EXPECT_EQ(reads_, 1);
+}
+
+TEST_F(CountedCalls, BeforeTheUploadIsTakenAndAfterThePermission) {
+  platform->settings["enable_data_collect"] = "yes";
+  for (const bool permission : {true, false}) {
+    std::filesystem::remove_all(Paths::kCounterDir);
+    const pid_t child = fork();
+    if (child == 0) {
+      WriteDescription(Description("state", R"({"allowUpload": true})"));
+      MakeRequest("QELO.Test.Call", 1, "run");
+      request->InitEnv(Parse(R"({"CONTENT_TYPE": "multipart/form-data"})"));
+      TestRunner tested;
+      tested.Request()->SetAttr("_collector_count_webapi", true);
+      tested.need = true;
+      tested.permission = permission;
+      tested.upload = false;
+      const bool called = tested.Process(request.get(), response.get());
+      const std::string asked = permission ? "need check upload " : "need check skip ";
+      _exit(!called && tested.asked == asked ? 0 : 1);
+    }
+    int status = -1;
+    waitpid(child, &status, 0);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(std::filesystem::exists(std::string(Paths::kCounterDir) + "/QELO.Test.Call.json"),
+              permission);
+  }
 }
 
 }  // namespace

@@ -1,0 +1,143 @@
+// Whose rights a method runs with when several attributes speak of them, and the process's ids
+// after a switch that really happened.
+
+#include <fcntl.h>
+#include <grp.h>
+#include <sys/wait.h>
+
+#include <array>
+
+#include "tests/unit/runner/RunnerFixture.h"
+
+namespace QELO {
+namespace {
+
+constexpr int kUser = 4242;    ///< whom the method runs as
+constexpr int kCaller = 4343;  ///< who started the process
+
+class CredentialSwitch : public RunnerTest {
+ protected:
+  using Ids = std::array<unsigned int, 6>;  ///< real, effective and saved user, then group
+
+  void SetUp() override {
+    RunnerTest::SetUp();
+    std::filesystem::permissions(directory, std::filesystem::perms::all);
+    platform->resetCredentials = [](const std::string&, bool keepPrivilege) {
+      const uid_t other = static_cast<uid_t>(keepPrivilege ? -1 : kUser);
+      return setgroups(0, nullptr) == 0 && setresgid(other, kUser, other) == 0 &&
+             setresuid(other, kUser, other) == 0;
+    };
+  }
+  static Ids CurrentIds() {
+    Ids ids{};
+    EXPECT_EQ(getresuid(&ids[0], &ids[1], &ids[2]), 0);
+    EXPECT_EQ(getresgid(&ids[3], &ids[4], &ids[5]), 0);
+    return ids;
+  }
+  static std::vector<gid_t> CurrentGroups() {
+    std::vector<gid_t> groups(64);
+    groups.resize(static_cast<size_t>(getgroups(64, groups.data())));
+    return groups;
+  }
+  /// What a child process finds when it has these ids.
+  template <typename Body>
+  static void InChild(const Ids& ids, Body body) {
+    if (geteuid() != 0) {
+      GTEST_SKIP() << "needs root";
+    }
+    const pid_t child = fork();
+    if (child == 0) {
+      const gid_t groups[] = {7, 8};
+      const bool good = setgroups(2, groups) == 0 && setresgid(ids[3], ids[4], ids[5]) == 0 &&
+                        setresuid(ids[0], ids[1], ids[2]) == 0;
+      _exit(good && body() ? 0 : 1);
+    }
+    int status = -1;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(status, 0);
+  }
+  bool RanAsUser() const {
+    return Data()["euid"] == Json::Value(kUser) && Data()["egid"] == Json::Value(kUser);
+  }
+};
+
+constexpr char kGrantable[] = R"({"grantable": true})";
+
+TEST_F(CredentialSwitch, GrantableGivesRootsIdsAndGroupsBack) {
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    const Ids before = CurrentIds();
+    const std::vector<gid_t> groups = CurrentGroups();
+    return groups.size() == 2 && ProcessPlugin("state", kGrantable) && RanAsUser() &&
+           CurrentIds() == before && CurrentGroups() == groups;
+  });
+}
+
+TEST_F(CredentialSwitch, GrantableGivesTheIdsOfASetUserIdProgramBack) {
+  const Ids started{kCaller, 0, 0, kCaller, kCaller, kCaller};
+  InChild(started, [&] {
+    return ProcessPlugin("state", kGrantable) && RanAsUser() && CurrentIds() == started &&
+           CurrentGroups().size() == 2;
+  });
+}
+
+TEST_F(CredentialSwitch, GrantableServesASecondCall) {
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    return ProcessPlugin("state", kGrantable) && RanAsUser() &&
+           ProcessPlugin("state", kGrantable) && RanAsUser() && geteuid() == 0;
+  });
+}
+
+TEST_F(CredentialSwitch, GrantableGivesTheIdsBackAfterAMethodThatThrew) {
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    return !ProcessPlugin("throwing", kGrantable) && response->GetError() == 117 &&
+           CurrentIds() == Ids{0, 0, 0, 0, 0, 0};
+  });
+}
+
+TEST_F(CredentialSwitch, WithoutGrantableTheUsersIdsStay) {
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    return ProcessPlugin("state") && RanAsUser() &&
+           CurrentIds() == Ids{kUser, kUser, kUser, kUser, kUser, kUser} &&
+           CurrentGroups().empty() && setresuid(0, 0, 0) != 0;
+  });
+}
+
+TEST_F(CredentialSwitch, GrantByDefaultComesBeforeTheOthers) {
+  platform->resetCredentials = nullptr;
+  const char* all = R"({"grantByDefault": true, "grantByUser": true, "runAs": "media"})";
+  WriteDescription(Description("state", all));
+  MakeRequest("QELO.Test.Call", 1, "run");
+  request->InitSession(Parse(R"({"username": "alice"})"));
+  TestRunner().Process(request.get(), response.get());
+  for (const std::string& call : platform->calls) {
+    EXPECT_EQ(call.find("ResetCredentialsByName"), std::string::npos) << call;
+  }
+  MakeRequest("QELO.Test.Call", 1, "run");  // and asks for no login user
+  TestRunner().Process(request.get(), response.get());
+  EXPECT_EQ(SyslogCapture::Count("failed to get login username"), 0);
+}
+
+TEST_F(CredentialSwitch, GrantByUserComesBeforeRunAs) {
+  platform->resetCredentials = nullptr;
+  Json::Value description = Description("state", R"({"grantByUser": true, "runAs": "media"})");
+  description["runAs"] = "backup";
+  WriteDescription(description);
+  MakeRequest("QELO.Test.Call", 1, "run");
+  request->InitSession(Parse(R"({"username": "alice"})"));
+  EXPECT_TRUE(TestRunner().Process(request.get(), response.get()));
+  EXPECT_EQ(platform->calls.back(), "ResetCredentialsByName(alice, drop)");
+}
+
+TEST_F(CredentialSwitch, GrantByDefaultGivesBackWithoutGrantable) {
+  const Ids started{kCaller, kCaller, 0, kCaller, kCaller, 0};
+  WriteDescription(Description("state", R"({"grantByDefault": true})"));
+  MakeRequest("QELO.Test.Call", 1, "run");
+  InChild(started, [&] {
+    return TestRunner().Process(request.get(), response.get()) &&
+           Data()["euid"] == Json::Value(0) && Data()["egid"] == Json::Value(0) &&
+           CurrentIds() == started;
+  });
+}
+
+}  // namespace
+}  // namespace QELO
