@@ -10,6 +10,11 @@
 ///     extern "C" QELO::_tag_API_CHECK_TABLE* GetAPICheckTable();   // optional
 ///
 /// Both return static arrays of the library, which the framework neither copies nor frees.
+///
+/// An exception that leaves one of these functions or a function of their tables is caught. One
+/// that leaves the constructor of a static object is not: nothing can be unwound while a library is
+/// being loaded, so the process ends without an answer. Make objects that can fail at their first
+/// use.
 namespace QELO {
 
 class APIRequest;
