@@ -56,6 +56,13 @@ def test_MethodThatCrashes_IsTheServersError(client, describe):
     assert call(client).status == 200
 
 
+def test_LibraryWhoseConstructorThrows_IsTheServersError(client, describe):
+    describe("QELO.Test.Call", "throwing_constructor.so")
+    assert call(client).status == 500
+    describe("QELO.Test.Call", "throwing.so")
+    assert call(client).status == 200
+
+
 @pytest.mark.parametrize("method, code", [("echo", 0), ("fail", 400), ("silent", 117)])
 def test_Method_AnswersWhatItSet_OrNoAnswer(client, describe, method, code):
     describe("QELO.Test.Good", "good.so", methods={"1": ["echo", "fail", "silent"]})

@@ -50,7 +50,9 @@ def test_KilledAtAnyMoment_LeavesValidJsonAndNoLock(tmp_path):
             assert count >= last
             last = count
     assert last > 0
+    assert len(list(tmp_path.glob("*.json?*"))) <= 2, "the lock, and one file of a killed process"
     assert start(tmp_path, 1).communicate(timeout=10)[0] == "1\n"
+    assert [path.suffix for path in tmp_path.glob("*.json?*")] == [".lock"]
 
 
 @pytest.fixture
