@@ -137,9 +137,9 @@ class WEBAPI_API APIRunner {
   std::unique_ptr<APIRequest> request_;
   std::unique_ptr<APIResponse> response_;
   std::map<std::string, void*> libraries_;
-  std::map<std::pair<void*, std::string>, void*> functions_;
   int compoundDepth_ = 0;
   std::unique_ptr<APIRunnerPrivate> private_;
+  std::map<std::pair<void*, std::string>, void*> functions_;
 };
 
 }  // namespace QELO
