@@ -96,9 +96,13 @@ void printRows(const std::vector<Row>& rows) {
 
 }  // namespace
 
-ExitCode showAnswer(const Json::Value& answer) {
+void printAnswer(const Json::Value& answer) {
   printf("%s\n", isatty(STDOUT_FILENO) == 1 ? prettyText(answer).c_str()
                                             : JsonHelper::toString(answer).c_str());
+}
+
+ExitCode showAnswer(const Json::Value& answer) {
+  printAnswer(answer);
   if (succeeded(answer)) {
     return kDone;
   }

@@ -6,6 +6,9 @@
 
 namespace QELO::ExecProgram {
 
+/// Prints a call's answer to standard output.
+void printAnswer(const Json::Value& answer);
+
 /// Prints a call's answer to standard output, and what its error code means to standard error.
 ExitCode showAnswer(const Json::Value& answer);
 

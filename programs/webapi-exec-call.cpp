@@ -46,9 +46,14 @@ int openOutput(const std::string& file) {
 
 }  // namespace
 
+std::string findUser(const Options& options, std::string& user) {
+  user = options.user.empty() ? ownName() : options.user;
+  return checkUser(user);
+}
+
 std::string makeCall(const Options& options, Json::Value& answer) {
-  const std::string user = options.user.empty() ? ownName() : options.user;
-  const std::string wrong = checkUser(user);
+  std::string user;
+  const std::string wrong = findUser(options, user);
   if (!wrong.empty()) {
     return wrong;
   }

@@ -25,6 +25,10 @@ const char kHelp[] =
     "    --json FILE         object of parameters, \"-\" for standard input; --param counts "
     "before\n"
     "    --output FILE       gets the body that a downloading method prints; else it is dropped\n"
+    "webapi-exec --follow --api API --method METHOD [OPTION...]\n"
+    "webapi-exec --follow --task ID [--user NAME]\n"
+    "    Starts a background task, or takes one that runs; shows its progress on a terminal, and\n"
+    "    prints its result when it ends. Ctrl-C asks whether to stop it or to leave it running.\n"
     "webapi-exec --batch FILE [--user NAME] [--param NAME=VALUE...]\n"
     "    Makes the calls that FILE lists and shows a table of the results. FILE, or \"-\", holds "
     "a\n"
@@ -37,12 +41,26 @@ const char kHelp[] =
     "    Prints the names of the APIs, or of an API's methods.\n"
     "webapi-exec --help\n"
     "\n"
-    "Exit status: 0 success; 1 the call, or one of the batch, failed or could not be made;\n"
-    "2 wrong use. Standard error says what an error code means.\n";
+    "Exit status: 0 success; 1 the call, one of the batch, or the task failed or could not be "
+    "made;\n"
+    "2 wrong use; 130 the task goes on. Standard error says what an error code means.\n";
 
 namespace {
 
-enum Option { kHelpOption, kList, kApi, kVersion, kMethod, kUser, kParam, kJson, kOutput, kBatch };
+enum Option {
+  kHelpOption,
+  kList,
+  kApi,
+  kVersion,
+  kMethod,
+  kUser,
+  kParam,
+  kJson,
+  kOutput,
+  kBatch,
+  kFollow,
+  kTask
+};
 
 constexpr option kOptions[] = {{"help", no_argument, nullptr, kHelpOption},
                                {"list", no_argument, nullptr, kList},
@@ -54,6 +72,8 @@ constexpr option kOptions[] = {{"help", no_argument, nullptr, kHelpOption},
                                {"json", required_argument, nullptr, kJson},
                                {"output", required_argument, nullptr, kOutput},
                                {"batch", required_argument, nullptr, kBatch},
+                               {"follow", no_argument, nullptr, kFollow},
+                               {"task", required_argument, nullptr, kTask},
                                {nullptr, 0, nullptr, 0}};
 
 std::string readVersion(const std::string& text, int& version) {
@@ -116,6 +136,12 @@ std::string readBatch(Options& options) {
 /// What is missing or does not go together.
 std::string check(const Options& options, bool hasJson) {
   const bool names = !options.api.empty() || !options.method.empty() || options.version != 0;
+  if (!options.task.empty() || (options.follow && (options.list || !options.batch.empty()))) {
+    const bool others = options.list || names || hasJson || !options.params.empty() ||
+                        !options.output.empty() || !options.batch.empty();
+    return options.follow && !others ? ""
+                                     : "--follow goes with one call, or with --task and --user";
+  }
   if (!options.batch.empty()) {
     return options.list || names || hasJson || !options.output.empty()
                ? "--batch goes with --user and --param alone"
@@ -127,6 +153,11 @@ std::string check(const Options& options, bool hasJson) {
                : "--list goes with --api, and --version with that";
   }
   return options.api.empty() || options.method.empty() ? "--api and --method are needed" : "";
+}
+
+std::string takeWord(const std::string& argument, const char* rule, std::string& word) {
+  word = argument;
+  return argument.empty() ? rule : "";
 }
 
 /// Takes one option's argument. @return what is wrong, or ""
@@ -152,14 +183,16 @@ std::string take(int option, const std::string& argument, Options& options, std:
     case kParam:
       return readParam(argument, options.params);
     case kJson:
-      json = argument;
-      return argument.empty() ? "--json takes a file" : "";
+      return takeWord(argument, "--json takes a file", json);
     case kOutput:
-      options.output = argument;
-      return argument.empty() ? "--output takes a file" : "";
+      return takeWord(argument, "--output takes a file", options.output);
     case kBatch:
-      options.batch = argument;
-      return argument.empty() ? "--batch takes a file" : "";
+      return takeWord(argument, "--batch takes a file", options.batch);
+    case kFollow:
+      options.follow = true;
+      return "";
+    case kTask:
+      return takeWord(argument, "--task takes a task's id", options.task);
     default:
       return "wrong option";  // getopt has said which
   }

@@ -7,7 +7,12 @@
 namespace QELO::ExecProgram {
 
 /// The exit codes of webapi-exec.
-enum ExitCode : int { kDone = 0, kFailed = 1, kWrongUse = 2 };
+enum ExitCode : int {
+  kDone = 0,
+  kFailed = 1,
+  kWrongUse = 2,
+  kLeft = 130,  ///< a task that was followed goes on; 128 and the number of SIGINT
+};
 
 extern const char kHelp[];
 
@@ -20,9 +25,11 @@ struct Options {
   std::string method;
   std::string user;
   Json::Value params{Json::objectValue};
-  std::string output;  ///< file for what the method prints, "" for none
-  std::string batch;   ///< file of calls, "" for a single call
-  Json::Value calls;   ///< the batch's calls
+  std::string output;   ///< file for what the method prints, "" for none
+  std::string batch;    ///< file of calls, "" for a single call
+  Json::Value calls;    ///< the batch's calls
+  bool follow = false;  ///< the call starts a task, which is watched until it ends
+  std::string task;     ///< task to follow instead of a call, "" for none
 };
 
 /// Reads the command line, and the files that give parameters; "-" is standard input.

@@ -4,6 +4,7 @@
 
 #include "programs/webapi-exec-answer.h"
 #include "programs/webapi-exec-call.h"
+#include "programs/webapi-exec-follow.h"
 #include "programs/webapi-exec-names.h"
 
 using namespace QELO::ExecProgram;
@@ -15,6 +16,9 @@ static ExitCode run(const Options& options) {
   }
   if (options.list) {
     return listNames(options);
+  }
+  if (options.follow) {
+    return follow(options);
   }
   Json::Value answer;
   const std::string wrong = makeCall(options, answer);

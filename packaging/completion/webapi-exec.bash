@@ -3,7 +3,8 @@
 
 _webapi_exec() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local options="--api --method --version --user --param --json --output --batch --list --help"
+  local options="--api --method --version --user --param --json --output --batch"
+  options+=" --follow --task --list --help"
   local words="" api="" i
   case $previous in
     --api) words=$("${COMP_WORDS[0]}" --list 2> /dev/null) ;;
@@ -22,7 +23,7 @@ _webapi_exec() {
       mapfile -t COMPREPLY < <(compgen -f -- "$current")
       return
       ;;
-    --version | --param) return ;;
+    --version | --param | --task) return ;;
     *) words=$options ;;
   esac
   mapfile -t COMPREPLY < <(compgen -W "$words" -- "$current")

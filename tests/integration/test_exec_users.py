@@ -95,7 +95,8 @@ def test_List_WithoutDescriptions_Fails():
 def test_Help_NamesEveryOption():
     process = run("--help")
     assert (process.returncode, process.stderr) == (0, "")
-    for option in ("api", "method", "version", "user", "param", "json", "output", "batch", "list"):
+    for option in ("api", "method", "version", "user", "param", "json", "output", "batch", "list",
+                   "follow", "task"):
         assert f"--{option}" in process.stdout
     assert all(len(line) <= 100 for line in process.stdout.splitlines())
 
@@ -125,6 +126,14 @@ def test_Help_NamesEveryOption():
         ("--batch", "/dev/null", "--list"),
         ("--list", "--method", "echo"),
         ("--list", "--version", "1"),
+        ("--follow",),
+        ("--follow", "--list"),
+        ("--follow", "--batch", "/dev/null"),
+        ("--follow", "--task", ""),
+        ("--follow", "--task", "alice/x", "--api", ENTRIES, "--method", "echo"),
+        ("--follow", "--task", "alice/x", "--param", "a=1"),
+        ("--follow", "--task", "alice/x", "--output", "x"),
+        ("--task", "alice/x"),
     ],
 )
 def test_WrongUse_SaysSo(arguments):
@@ -149,6 +158,8 @@ def completions(*words):
 
 def test_Completion_OffersOptionsAndNamesOfTheCatalogue(tmp_path):
     assert completions("--ba") == ["--batch"]
+    assert completions("--fo") == ["--follow"]
+    assert completions("--ta") == ["--task"]
     assert "--method" in completions("")
     assert completions("--api", "QELO.Host.I") == ["QELO.Host.Info"]
     assert set(completions("--api", "QELO.Test.E")) == {ENTRIES}
@@ -160,3 +171,4 @@ def test_Completion_OffersOptionsAndNamesOfTheCatalogue(tmp_path):
     (tmp_path / "calls.json").touch()
     assert completions("--batch", f"{tmp_path}/ca") == [f"{tmp_path}/calls.json"]
     assert completions("--param", "x") == []
+    assert completions("--task", "x") == []

@@ -1,0 +1,30 @@
+#pragma once
+
+namespace QELO::ExecProgram {
+
+/// Asks the person at the terminal what becomes of the task.
+class StopPrompt {
+ public:
+  enum class Choice { kNone, kStop, kLeave, kGoOn };
+
+  StopPrompt() = default;
+  StopPrompt(const StopPrompt&) = delete;
+  StopPrompt& operator=(const StopPrompt&) = delete;
+  ~StopPrompt();
+
+  /// Asks. What was typed before does not count. @return false when nobody can be asked
+  bool Ask();
+  bool IsAsking() const { return isAsking_; }
+  /// Can be read when there is something for Read(); below 0 while nothing is asked.
+  int Descriptor() const { return isAsking_ ? terminal_ : -1; }
+  /// Reads one line. @return kNone when it asks again; the end of input leaves the task
+  Choice Read();
+  /// Takes the question back.
+  void Cancel();
+
+ private:
+  int terminal_ = -1;
+  bool isAsking_ = false;
+};
+
+}  // namespace QELO::ExecProgram

@@ -1,0 +1,201 @@
+"""webapi-exec --follow: how the watching ends, by the task and by the person."""
+
+import json
+import os
+import signal
+import subprocess
+import time
+
+import pytest
+
+from exec_follow import (  # noqa: F401
+    INTERRUPT, children_of, counts, follow, following, following_id, shown, status_of, task, work)
+from exec_program import EXEC, described, run  # noqa: F401
+from tasks import assert_ends, is_running
+
+pytestmark = pytest.mark.usefixtures("described", "following")
+
+# Ends
+
+
+def test_Error_IsTheTasksEnd(work, follow):
+    steps = work(counts(1, 4), {"code": 444, "errors": {"reason": "no \x1b[31mroom"}})
+    terminal = follow(*steps.arguments())
+    terminal.wait_until(shown(25))
+    steps.open()
+    status, output = terminal.finish()
+    assert (status, json.loads(output)["error"]["code"]) == (1, 444)
+    screen = terminal.screen()
+    assert screen[1].startswith(" 25% ["), "how far it had come"
+    assert screen[2:] == [
+        "webapi-exec: error 444: an error of the API's own", "webapi-exec: no ?[31mroom", ""]
+
+
+def test_KilledProcess_IsAFailure(work, follow):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    pid = status_of(terminal.task_id())["data"]["pid"]
+    os.kill(pid, signal.SIGKILL)
+    status, output = terminal.finish()
+    assert (status, json.loads(output)["error"]["code"]) == (1, 117)
+    assert "The task's process ended without finishing it." in terminal.printed
+
+
+def test_TaskThatSomebodyElseStops_IsAFailure(work, follow):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    assert task("stop", terminal.task_id())["success"]
+    status, output = terminal.finish()
+    assert (status, json.loads(output)["data"]["files"]) == (1, {"done": 1, "total": 4})
+    assert "webapi-exec: the task was stopped before all was done" in terminal.printed
+
+
+def test_RecordThatSomebodyElseRemoves_IsAFailure(work, follow):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    terminal.wait_until(shown(25))
+    assert task("stop", terminal.task_id(), "--param", "remove=true")["success"]
+    status, output = terminal.finish()
+    assert (status, json.loads(output)["data"]["files"]) == (1, {"done": 1, "total": 4})
+    assert "the task's record was removed" in terminal.printed
+
+
+def test_RecordThatGoesWithItsTask_GivesItsLastResult(work, follow):
+    steps = work(counts(1, 4), {"code": 445}, keep=False)
+    terminal = follow(*steps.arguments())
+    terminal.wait_until(shown(25))
+    steps.open()
+    status, output = terminal.finish()
+    assert (status, json.loads(output)["error"]["code"]) == (1, 445)
+    assert task("status", terminal.task_id())["error"]["code"] == 508, "gone, as it was to be"
+
+
+# Ctrl-C
+
+QUESTION = "Stop the task (s), leave it running (l), or continue watching (c)? "
+
+
+def interrupted(terminal):
+    """@return the task's id and process, while the question stands"""
+    full_id = terminal.task_id()
+    terminal.wait_until(shown(25))
+    terminal.type(INTERRUPT)
+    terminal.wait_for(QUESTION)
+    return full_id, status_of(full_id)["data"]["pid"]
+
+
+def test_Interrupt_ThenStop_EndsTheTask(work, follow):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    _, pid = interrupted(terminal)
+    terminal.type("s\n")
+    status, output = terminal.finish()
+    assert (status, json.loads(output)["data"]["files"]) == (1, {"done": 1, "total": 4})
+    assert terminal.screen()[-2] == "webapi-exec: the task was stopped"
+    assert_ends(pid)
+
+
+@pytest.mark.parametrize("answer", ["l\n", INTERRUPT, "\x04"], ids=["l", "Ctrl-C", "Ctrl-D"])
+@pytest.mark.parametrize("keep", [True, False])
+def test_Interrupt_ThenLeave_LetsTheTaskGoOn(work, follow, answer, keep):
+    steps = work(counts(1, 4), counts(4, 4), keep=keep)
+    terminal = follow(*steps.arguments(), columns=200)
+    full_id, pid = interrupted(terminal)
+    assert os.getsid(pid) == pid, "Ctrl-C at the terminal does not reach it"
+    terminal.type(answer)
+    assert terminal.finish() == (130, "")
+    again = f"webapi-exec --follow --task '{full_id}' --user 'alice'"
+    assert again in [line.strip() for line in terminal.screen()]
+    assert is_running(pid)
+    assert status_of(full_id)["auto_remove"] is not keep, "as before"
+    second = follow("--task", full_id, "--user", "alice")
+    second.wait_until(shown(25))
+    steps.open()
+    status, output = second.finish()
+    assert (status, json.loads(output)["data"]["files"]["done"]) == (0, 4)
+
+
+def test_Interrupt_ThenContinue_GoesOnWatching(work, follow):
+    steps = work(counts(1, 4), counts(3, 4), counts(4, 4))
+    terminal = follow(*steps.arguments())
+    interrupted(terminal)
+    terminal.type("what?\n")
+    terminal.wait_for(QUESTION, times=2)
+    terminal.type("c\n")
+    steps.open(1)
+    terminal.wait_until(shown(75))
+    terminal.type(INTERRUPT)
+    terminal.wait_for(QUESTION, times=3)
+    steps.open()  # it ends while the question stands
+    assert terminal.finish()[0] == 0
+    assert terminal.screen()[-2].startswith("100% [")
+
+
+def test_WhatWasTypedBeforeTheQuestion_IsNoAnswer(work, follow):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    terminal.wait_until(shown(25))
+    terminal.type("s\n")
+    _, pid = interrupted(terminal)
+    terminal.type("l\n")
+    assert terminal.finish()[0] == 130
+    assert is_running(pid)
+
+
+@pytest.mark.parametrize("number", [signal.SIGTERM, signal.SIGHUP], ids=["TERM", "HUP"])
+def test_OtherSignal_LeavesTheTask(work, follow, number):
+    terminal = follow(*work(counts(1, 4), keep=False).arguments())
+    full_id = terminal.task_id()
+    terminal.wait_until(shown(25))
+    terminal.process.send_signal(number)
+    assert terminal.finish() == (128 + number, "")
+    status = status_of(full_id)
+    assert (status["finish"], status["auto_remove"]) == (False, True)
+
+
+# Without a terminal
+
+
+def test_Pipe_GetsTheResultAlone(work):
+    steps = work(counts(1, 2), counts(2, 2))
+    steps.open()
+    process = run("--follow", *steps.arguments())
+    assert (process.returncode, process.stderr) == (0, "")
+    assert json.loads(process.stdout)["data"]["files"]["done"] == 2
+    assert process.stdout.count("\n") == 1
+
+
+def test_Interrupt_WithoutATerminal_LeavesTheTask(work):
+    steps = work(counts(1, 2))
+    with subprocess.Popen([EXEC, "--follow", *steps.arguments()], stdout=subprocess.PIPE,
+                          stderr=subprocess.PIPE, start_new_session=True, text=True) as process:
+        full_id = following_id(process)
+        process.send_signal(signal.SIGINT)
+        output, message = process.communicate(timeout=30)
+    assert (process.returncode, output) == (130, "")
+    assert message == ("The task goes on. To follow it again:\n"
+                       f"  webapi-exec --follow --task '{full_id}' --user 'alice'\n")
+    assert is_running(status_of(full_id)["data"]["pid"])
+
+
+def test_OutputThatCannotBePrinted_KeepsTheRecord(work):
+    steps = work(counts(2, 2), keep=False)
+    with open("/dev/full", "w", encoding="ascii") as full, subprocess.Popen(
+        [EXEC, "--follow", *steps.arguments()], stdout=full, stderr=subprocess.PIPE
+    ) as process:
+        full_id = following_id(process)
+        while status_of(full_id)["auto_remove"]:
+            assert process.poll() is None
+        steps.open()
+        process.communicate(timeout=30)
+    assert process.returncode == 1
+    assert status_of(full_id)["data"]["files"]["done"] == 2
+
+
+def test_ProgramThatIsKilled_LeavesTheTaskAndNoProcess(work, follow):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    full_id = terminal.task_id()
+    terminal.wait_until(shown(25))
+    (child,) = children_of(terminal.process)
+    terminal.process.kill()
+    terminal.finish()
+    deadline = time.monotonic() + 30
+    while is_running(child):
+        assert time.monotonic() < deadline
+        time.sleep(0.05)
+    assert is_running(status_of(full_id)["data"]["pid"])
