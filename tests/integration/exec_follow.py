@@ -4,6 +4,7 @@ import fcntl
 import json
 import os
 import pty
+import re
 import select
 import struct
 import subprocess
@@ -117,8 +118,9 @@ class Terminal:
         return render(self.printed, self.columns)
 
     def task_id(self):
-        self.wait_until(lambda screen: len(screen) > 1 and screen[0].startswith("Task "))
-        return self.screen()[0].removeprefix("Task ")
+        line = re.compile(r"Task (\S+)\r\n")
+        self.wait_until(lambda screen: line.search(self.printed), "the task's id")
+        return line.search(self.printed).group(1)
 
 
 def render(text, columns):

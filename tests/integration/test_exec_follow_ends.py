@@ -9,9 +9,9 @@ import time
 import pytest
 
 from exec_follow import (  # noqa: F401
-    INTERRUPT, children_of, counts, follow, following, following_id, shown, status_of, task, work)
+    INTERRUPT, TASK, children_of, counts, follow, following, following_id, shown, status_of, task, work)
 from exec_program import EXEC, described, run  # noqa: F401
-from tasks import assert_ends, is_running
+from tasks import WORK, assert_ends, is_running
 
 pytestmark = pytest.mark.usefixtures("described", "following")
 
@@ -135,6 +135,39 @@ def test_WhatWasTypedBeforeTheQuestion_IsNoAnswer(work, follow):
     terminal.type("l\n")
     assert terminal.finish()[0] == 130
     assert is_running(pid)
+
+
+def wait_for_start(terminal):
+    while not children_of(terminal.process):
+        assert terminal.process.poll() is None
+
+
+def test_Interrupt_WhileTheTaskIsStarted_AsksWhenItsIdIsKnown(follow):
+    parameters = ("--param", "silent=4", "--param", "pause=10000")
+    terminal = follow("--api", WORK, "--method", "start", "--user", "alice", *parameters)
+    wait_for_start(terminal)
+    terminal.type(INTERRUPT)
+    terminal.wait_for(QUESTION)
+    pid = None
+    while not pid:
+        pid = status_of(terminal.task_id()).get("data", {}).get("pid")
+    assert os.getsid(pid) == pid
+    terminal.type("s\n")
+    assert terminal.finish()[0] == 1
+    assert_ends(pid)
+
+
+def test_Interrupt_OfAStartThatHangs_EndsTheProgramTheSecondTime(work, follow):
+    watched = follow(*work(counts(1, 4)).arguments())
+    terminal = follow("--api", TASK, "--method", "wait", "--user", "alice",
+                      "--param", f"task_id={watched.task_id()}", "--param", "timeout=60")
+    wait_for_start(terminal)
+    deadline = time.monotonic() + 30
+    while terminal.process.poll() is None:
+        assert time.monotonic() < deadline
+        terminal.type(INTERRUPT)
+        time.sleep(0.1)
+    assert terminal.finish() == (-signal.SIGINT, "")
 
 
 @pytest.mark.parametrize("number", [signal.SIGTERM, signal.SIGHUP], ids=["TERM", "HUP"])
