@@ -2,6 +2,8 @@
 
 #include <fcntl.h>
 
+#include <algorithm>
+
 #include "platform/TextFile.h"
 #include "platform/UniqueFd.h"
 
@@ -38,27 +40,28 @@ std::string_view unquoted(std::string_view text) {
 KeyValueFile::KeyValueFile(const char* path) {
   // An administrator may link a configuration file elsewhere, so links are followed here.
   const UniqueFd file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!file || !readText(file.Get(), kMaxSize, text_)) {
-    text_.clear();
+  std::string text;
+  if (!file || !readText(file.Get(), kMaxSize, text)) {
+    return;
   }
-}
-
-bool KeyValueFile::Get(std::string_view key, std::string& value) const {
-  bool found = false;
-  std::string_view rest = text_;
-  while (!rest.empty()) {
+  for (std::string_view rest = text; !rest.empty();) {
     const size_t end = rest.find('\n');
     const std::string_view line = trimmed(rest.substr(0, end));
     rest.remove_prefix(end == std::string_view::npos ? rest.size() : end + 1);
     const size_t equals = line.find('=');
-    if (equals == std::string_view::npos || line.front() == '#' ||
-        trimmed(line.substr(0, equals)) != key) {
-      continue;
+    if (equals != std::string_view::npos && line.front() != '#') {
+      lines_.emplace_back(trimmed(line.substr(0, equals)), unquoted(line.substr(equals + 1)));
     }
-    value = unquoted(line.substr(equals + 1));
-    found = true;
   }
-  return found;
+}
+
+bool KeyValueFile::Get(std::string_view key, std::string& value) const {
+  const auto last = std::find_if(lines_.rbegin(), lines_.rend(),
+                                 [key](const auto& line) { return line.first == key; });
+  if (last != lines_.rend()) {
+    value = last->second;
+  }
+  return last != lines_.rend();
 }
 
 }  // namespace QELO::Platform

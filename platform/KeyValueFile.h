@@ -2,6 +2,8 @@
 
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 namespace QELO::Platform {
 
@@ -20,7 +22,8 @@ class KeyValueFile {
   bool Get(std::string_view key, std::string& value) const;
 
  private:
-  std::string text_;
+  /// Names and values as they stand, in the order of the lines.
+  std::vector<std::pair<std::string, std::string>> lines_;
 };
 
 }  // namespace QELO::Platform

@@ -3,6 +3,7 @@
 #include <sys/random.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 
 namespace QELO::Platform {
@@ -43,8 +44,10 @@ std::string makeSecret() {
 }
 
 bool isSecretText(std::string_view text) {
-  return text.size() == kSecretLength &&
-         text.find_first_not_of(kAlphabet) == std::string_view::npos;
+  return text.size() == kSecretLength && std::all_of(text.begin(), text.end(), [](char c) {
+           return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') ||
+                  c == '-' || c == '_';
+         });
 }
 
 bool equalSecrets(std::string_view left, std::string_view right) {

@@ -1,50 +1,23 @@
 #include "platform/Settings.h"
 
 #include <strings.h>
-#include <sys/stat.h>
 
 #include <charconv>
 
+#include "platform/KnownFile.h"
 #include "platform/PlatformPaths.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
-
 namespace {
 
-/// A file as this process last read it.
-class KnownFile {
- public:
-  explicit KnownFile(const char* path) : path_(path) {}
-
-  std::shared_ptr<const KeyValueFile> Get() {
-    struct stat now {};
-    if (stat(path_, &now) != 0) {
-      now = {};
-    }
-    // A file that is replaced has another inode, one that is written another time or size.
-    if (content_ == nullptr || now.st_ino != known_.st_ino || now.st_dev != known_.st_dev ||
-        now.st_size != known_.st_size || now.st_mtim.tv_sec != known_.st_mtim.tv_sec ||
-        now.st_mtim.tv_nsec != known_.st_mtim.tv_nsec) {
-      content_ = std::make_shared<const KeyValueFile>(path_);
-      known_ = now;
-    }
-    return content_;
-  }
-
- private:
-  const char* path_;
-  struct stat known_ {};
-  std::shared_ptr<const KeyValueFile> content_;
-};
-
 std::shared_ptr<const KeyValueFile> defaults() {
-  static KnownFile file(Paths::kSystemInfoDefaults);
+  static KnownFile<KeyValueFile> file(Paths::kSystemInfoDefaults);
   return file.Get();
 }
 
 std::shared_ptr<const KeyValueFile> own() {
-  static KnownFile file(Paths::kSystemInfo);
+  static KnownFile<KeyValueFile> file(Paths::kSystemInfo);
   return file.Get();
 }
 

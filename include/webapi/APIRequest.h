@@ -57,6 +57,7 @@ class WEBAPI_API APIRequest {
   /// Merges CGI variables (string members only) and parses cookies, request method and sharing
   /// link from them.
   void InitEnv(const Json::Value& env);
+  void InitEnv(Json::Value&& env);
   /// Takes the parameters in "getParam", then "postParam", which wins; enciphered ones are
   /// deciphered. @param replace  drop the parameters there are first
   void InitParam(const Json::Value& params, bool replace);
@@ -64,6 +65,7 @@ class WEBAPI_API APIRequest {
   void InitAPIInfo(const Json::Value& description);
   /// Replaces what is known of the caller.
   void InitSession(const Json::Value& session);
+  void InitSession(Json::Value&& session);
 
   /// The whole record; may be changed in place.
   Json::Value& Serialize();

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 
 #include "webapi/Export.h"
 
@@ -36,14 +37,14 @@ WEBAPI_API bool toFile(const std::string& path, const Json::Value& value);
 
 /// The member `key`, or null when `value` is no object or has no such member. It lives as long as
 /// `value` is unchanged.
-WEBAPI_API const Json::Value* find(const Json::Value& value, const std::string& key);
+WEBAPI_API const Json::Value* find(const Json::Value& value, std::string_view key);
 
 /// The member `key`, or a null value when `value` is no object or has no such member. The
 /// reference lives as long as `value` is unchanged.
-WEBAPI_API const Json::Value& member(const Json::Value& value, const std::string& key);
+WEBAPI_API const Json::Value& member(const Json::Value& value, std::string_view key);
 
 /// Whether `value` is an object that has the member `key`, be it null.
-WEBAPI_API bool hasMember(const Json::Value& value, const std::string& key);
+WEBAPI_API bool hasMember(const Json::Value& value, std::string_view key);
 
 /// Text form: a string as it is, numbers and booleans as JSON writes them, null as ""; an array
 /// or object gives `fallback`.

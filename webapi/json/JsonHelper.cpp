@@ -49,7 +49,7 @@ bool readAll(const std::string& path, std::string& text) {
   bool good = fstat(fd, &info) == 0 && S_ISREG(info.st_mode);
   text.clear();
   while (good) {
-    char buffer[16384];
+    char buffer[4096];
     const ssize_t count = TEMP_FAILURE_RETRY(read(fd, buffer, sizeof buffer));
     if (count <= 0) {
       good = count == 0;
@@ -136,20 +136,25 @@ bool toFile(const std::string& path, const Json::Value& value) {
   return true;
 }
 
-const Json::Value* find(const Json::Value& value, const std::string& key) {
+const Json::Value* find(const Json::Value& value, std::string_view key) {
   return value.isObject() ? value.find(key.data(), key.data() + key.size()) : nullptr;
 }
 
-const Json::Value& member(const Json::Value& value, const std::string& key) {
+const Json::Value& member(const Json::Value& value, std::string_view key) {
   const Json::Value* found = find(value, key);
   return found != nullptr ? *found : Json::Value::nullSingleton();
 }
 
-bool hasMember(const Json::Value& value, const std::string& key) {
+bool hasMember(const Json::Value& value, std::string_view key) {
   return find(value, key) != nullptr;
 }
 
 std::string asString(const Json::Value& value, const std::string& fallback) {
+  const char* start = nullptr;
+  const char* end = nullptr;
+  if (value.getString(&start, &end)) {
+    return std::string(start, end);
+  }
   if (value.type() == Json::realValue) {
     return toString(value);  // the library's own form has digits that no one wrote
   }

@@ -18,14 +18,19 @@ APIBase::APIBase() : store_(Json::objectValue) {}
 
 APIBase::~APIBase() = default;
 
-Json::Value* APIBase::FindSection(const std::string& section) {
+const Json::Value* APIBase::Find(std::string_view section, std::string_view key) const {
+  const Json::Value* found = JsonHelper::find(store_, section);
+  return found != nullptr ? JsonHelper::find(*found, key) : nullptr;
+}
+
+Json::Value* APIBase::FindSection(std::string_view section) {
   // The store is ours to change; the JSON library finds members of constant values only.
   Json::Value* found = const_cast<Json::Value*>(JsonHelper::find(store_, section));
   return found != nullptr && (found->isObject() || found->isNull()) ? found : nullptr;
 }
 
 bool APIBase::HasData(const std::string& section, const std::string& key) const {
-  return JsonHelper::hasMember(JsonHelper::member(store_, section), key);
+  return Find(section, key) != nullptr;
 }
 
 bool APIBase::SetData(const std::string& section, const Json::Value& members, bool stringOnly) {
@@ -43,6 +48,16 @@ bool APIBase::SetData(const std::string& section, const Json::Value& members, bo
     }
   }
   return true;
+}
+
+bool APIBase::TakeData(const std::string& section, Json::Value&& members, bool stringOnly) {
+  Json::Value* target = FindSection(section);
+  if (target != nullptr && target->empty() && members.isObject() && !members.empty() &&
+      (!stringOnly || holdsStringsAlone(members))) {
+    target->swap(members);
+    return true;
+  }
+  return SetData(section, members, stringOnly);
 }
 
 bool APIBase::SetData(const std::string& section, const std::string& key, const Json::Value& value,

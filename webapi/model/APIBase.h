@@ -3,6 +3,7 @@
 #include <json/json.h>
 
 #include <string>
+#include <string_view>
 
 namespace QELO {
 
@@ -47,9 +48,14 @@ class APIBase {
   /// Swaps the store with `record`, unchecked.
   void Deserialize(Json::Value& record) { store_.swap(record); }
 
+  /// As SetData() with the members of an object, which are moved where that is possible.
+  bool TakeData(const std::string& section, Json::Value&& members, bool stringOnly);
+
  protected:
+  /// The member, or null when it or the section is missing.
+  const Json::Value* Find(std::string_view section, std::string_view key) const;
   /// The section as something that takes members, or null.
-  Json::Value* FindSection(const std::string& section);
+  Json::Value* FindSection(std::string_view section);
 
   Json::Value store_;
 };

@@ -1,5 +1,7 @@
 #include "webapi/APIRequest.h"
 
+#include <utility>
+
 #include "webapi/JsonHelper.h"
 #include "webapi/model/APIRequestPrivate.h"
 #include "webapi/platform/Core.h"
@@ -42,6 +44,10 @@ void APIRequest::InitEnv(const Json::Value& env) {
   private_->InitEnv(env);
 }
 
+void APIRequest::InitEnv(Json::Value&& env) {
+  private_->InitEnv(std::move(env));
+}
+
 void APIRequest::InitParam(const Json::Value& params, bool replace) {
   private_->InitParam(params, replace);
 }
@@ -52,6 +58,10 @@ void APIRequest::InitAPIInfo(const Json::Value& description) {
 
 void APIRequest::InitSession(const Json::Value& session) {
   private_->InitSession(session);
+}
+
+void APIRequest::InitSession(Json::Value&& session) {
+  private_->InitSession(std::move(session));
 }
 
 Json::Value& APIRequest::Serialize() {

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <cstdlib>
+#include <utility>
 #include <vector>
 
 #include "webapi/JsonHelper.h"
@@ -42,8 +43,8 @@ APIRequestPrivate::APIRequestPrivate(APIRequest* owner) : owner_(owner) {
   SetData("private", "requestMethod", APIRequest::METHOD_UNKNOWN, false);
 }
 
-void APIRequestPrivate::InitEnv(const Json::Value& env) {
-  SetData("environ", env, true);
+void APIRequestPrivate::InitEnv(Json::Value env) {
+  TakeData("environ", std::move(env), true);
   InitCookie();
   InitRequestMethod();
   InitSharing();
@@ -72,9 +73,9 @@ void APIRequestPrivate::InitAPIInfo(const Json::Value& description) {
   SetData("reqLib", description, false);
 }
 
-void APIRequestPrivate::InitSession(const Json::Value& session) {
+void APIRequestPrivate::InitSession(Json::Value session) {
   ClearData("session", "");
-  SetData("session", session, false);
+  TakeData("session", std::move(session), false);
 }
 
 void APIRequestPrivate::Restore(Json::Value& record) {
@@ -175,18 +176,21 @@ std::string APIRequestPrivate::GetCookie(const std::string& name, const std::str
              : def;
 }
 
-std::string APIRequestPrivate::Text(const std::string& section, const std::string& key,
+std::string APIRequestPrivate::Text(std::string_view section, std::string_view key,
                                     const std::string& def) const {
-  return JsonHelper::asString(GetData(section, key, def), def);
+  const Json::Value* found = Find(section, key);
+  return found != nullptr ? JsonHelper::asString(*found, def) : def;
 }
 
-int APIRequestPrivate::Number(const std::string& section, const std::string& key, int def) const {
-  return JsonHelper::asInt(GetData(section, key, def), def);
+int APIRequestPrivate::Number(std::string_view section, std::string_view key, int def) const {
+  const Json::Value* found = Find(section, key);
+  return found != nullptr ? JsonHelper::asInt(*found, def) : def;
 }
 
-bool APIRequestPrivate::Flag(const std::string& section, const std::string& key, bool missing,
+bool APIRequestPrivate::Flag(std::string_view section, std::string_view key, bool missing,
                              bool unreadable) const {
-  return JsonHelper::asBool(GetData(section, key, missing), unreadable);
+  const Json::Value* found = Find(section, key);
+  return found != nullptr ? JsonHelper::asBool(*found, unreadable) : missing;
 }
 
 }  // namespace QELO

@@ -3,6 +3,7 @@
 #include <json/json.h>
 
 #include <string>
+#include <string_view>
 
 #include "webapi/APIParameter.h"
 #include "webapi/APIRequest.h"
@@ -22,10 +23,10 @@ class APIRequestPrivate : public APIBase {
   /// The copy keeps the owner of the original.
   APIRequestPrivate(const APIRequestPrivate&) = default;
 
-  void InitEnv(const Json::Value& env);
+  void InitEnv(Json::Value env);
   void InitParam(const Json::Value& params, bool replace);
   void InitAPIInfo(const Json::Value& description);
-  void InitSession(const Json::Value& session);
+  void InitSession(Json::Value session);
   /// Takes a deserialized store; what is kept beside the store is made anew from it.
   void Restore(Json::Value& record);
 
@@ -54,12 +55,11 @@ class APIRequestPrivate : public APIBase {
   int GetURLPort(int def);
 
   /// A key's text or integer; `def` when it is missing or cannot be read as one.
-  std::string Text(const std::string& section, const std::string& key,
+  std::string Text(std::string_view section, std::string_view key,
                    const std::string& def = "") const;
-  int Number(const std::string& section, const std::string& key, int def) const;
+  int Number(std::string_view section, std::string_view key, int def) const;
   /// A key's truth; `missing` without the key, `unreadable` when it holds none.
-  bool Flag(const std::string& section, const std::string& key, bool missing,
-            bool unreadable) const;
+  bool Flag(std::string_view section, std::string_view key, bool missing, bool unreadable) const;
 
   template <typename T>
   APIParameter<T> GetAndCheckParam(const std::string& name, bool required, Json::ValueType type,
