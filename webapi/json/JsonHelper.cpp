@@ -11,29 +11,19 @@
 #include <limits>
 #include <utility>
 
-#include "webapi/json/JsonSyntax.h"
+#include "webapi/json/JsonReader.h"
 
 namespace QELO::JsonHelper {
 namespace {
 
 bool parse(const std::string& text, bool comments, Json::Value& value) {
-  if (!isJsonText(text, comments, kMaxDepth)) {
-    return false;
-  }
-  // The newer reader wants its settings as a JSON object, which costs more to make than a request's
-  // texts cost to read. What this one is laxer in, the check above has refused.
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
-  Json::Reader reader(Json::Features::all());
-#pragma GCC diagnostic pop
-  const size_t start = text.starts_with(kByteOrderMark) ? kByteOrderMark.size() : 0;
   try {
     Json::Value parsed;
-    if (!reader.parse(text.data() + start, text.data() + text.size(), parsed, false)) {
-      return false;
+    const bool good = readJsonText(text, comments, kMaxDepth, parsed);
+    if (good) {
+      value.swap(parsed);
     }
-    value.swap(parsed);
-    return true;
+    return good;
   } catch (const std::exception&) {
     return false;
   }

@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <sstream>
 #include <string>
 
 #include "webapi/JsonHelper.h"
@@ -78,7 +79,8 @@ TEST(JsonFromString, RefusesWhatOnlyLooksLikeANumber) {
 
 TEST(JsonFromString, RefusesBrokenStrings) {
   for (const char* text :
-       {"\"abc", "\"a\nb\"", R"("\x")", R"("\u12")", R"("\u12g4")", R"("\ud800")", "'a'", "\"\\"}) {
+       {"\"abc", "\"a\nb\"", R"("\x")", R"("\u12")", R"("\u12g4")", R"("\u-123")", R"("\ud800")",
+        R"("\udc00")", R"("\ud800\u0041")", R"("\ud800x")", "'a'", "\"\\"}) {
     EXPECT_EQ(reparsed(text), "refused") << text;
   }
 }
@@ -129,7 +131,53 @@ TEST(JsonFromString, LeavesTheValueWhenItRefuses) {
   EXPECT_EQ(value, Json::Value("kept"));
 }
 
+TEST(JsonFromString, ReadsEscapesAsTheCharactersTheyStandFor) {
+  Json::Value value;
+  ASSERT_TRUE(
+      JsonHelper::fromString(R"("\"\\\/\b\f\n\r\t\u0041\u00e9\u20AC\ud83d\uDE00\u0000.")", value));
+  EXPECT_EQ(value.asString(),
+            std::string("\"\\/\b\f\n\r\tA\xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80\0.", 20));
+}
+
+TEST(JsonFromString, ReadsIntegersAsTheJsonLibraryHasThem) {
+  const auto typeOf = [](const char* text) {
+    Json::Value value;
+    EXPECT_TRUE(JsonHelper::fromString(text, value)) << text;
+    return value.type();
+  };
+  EXPECT_EQ(typeOf("2147483647"), Json::intValue);
+  EXPECT_EQ(typeOf("2147483648"), Json::uintValue);
+  EXPECT_EQ(typeOf("18446744073709551615"), Json::uintValue);
+  EXPECT_EQ(typeOf("18446744073709551616"), Json::realValue);
+  EXPECT_EQ(typeOf("-2147483649"), Json::intValue);
+  EXPECT_EQ(typeOf("-9223372036854775808"), Json::intValue);
+  EXPECT_EQ(typeOf("-9223372036854775809"), Json::realValue);
+  EXPECT_EQ(typeOf("1.0"), Json::realValue);
+  EXPECT_EQ(typeOf("1e2"), Json::realValue);
+}
+
+TEST(JsonFromString, TakesTheSmallestRealsForZeroAndRefusesTheLargest) {
+  EXPECT_EQ(reparsed("1e-999"), "0.0");
+  EXPECT_EQ(reparsed("4.9e-324"), "5e-324");
+  EXPECT_EQ(reparsed("1e999"), "refused");
+  EXPECT_EQ(reparsed("-1e999"), "refused");
+}
+
+TEST(JsonFromString, AgreesWithTheJsonLibraryOnWhatBothTake) {
+  for (const char* text :
+       {"{}", "[]", "null", "[1,[2,{\"a\":[]}],\"x\"]", R"({"b":true,"a":false,"c":{"":0}})",
+        "[0.5,-0.25,1e3,12345678901234567890,-7]", R"(["\u00fc\n",""])"}) {
+    Json::Value ours;
+    Json::Value theirs;
+    std::istringstream stream(text);
+    stream >> theirs;
+    ASSERT_TRUE(JsonHelper::fromString(text, ours)) << text;
+    EXPECT_EQ(ours, theirs) << text;
+  }
+}
+
 TEST(JsonFromString, LastOfTwoEqualNamesWins) {
+  EXPECT_EQ(reparsed(R"({"a":[1],"a":{"b":2}})"), R"({"a":{"b":2}})");
   EXPECT_EQ(reparsed(R"({"a":1,"a":2})"), R"({"a":2})");
 }
 
