@@ -14,6 +14,14 @@ namespace {
 constexpr char kTableFunction[] = "GetAPITable";
 constexpr char kCheckTableFunction[] = "GetAPICheckTable";
 
+/// Nothing of the loader can be unwound: an exception of a library's constructor ends the process
+/// here. It would not everywhere if dlopen() were called by its name, since that is declared not to
+/// throw and what then happens is up to the optimiser.
+void* load(const std::string& path) noexcept {
+  void* (*volatile open)(const char*, int) = dlopen;
+  return open(path.c_str(), RTLD_LAZY);
+}
+
 }  // namespace
 
 bool APIRunner::OpenLib(APIRequest* request, _tag_API_TABLE** table,
@@ -47,7 +55,7 @@ bool APIRunner::CacheLib(APIRequest* request, void** handle) {
     *handle = cached->second;
     return true;
   }
-  void* opened = dlopen(path.c_str(), RTLD_LAZY);
+  void* opened = load(path);
   if (opened == nullptr) {
     WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", path.c_str(), dlerror());
     return false;
