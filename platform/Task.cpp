@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <functional>
 
+#include "platform/PlatformLog.h"
 #include "platform/TaskAccess.h"
 #include "platform/TaskValues.h"
 #include "webapi/JsonHelper.h"
@@ -135,6 +136,9 @@ bool Task::setProperty(const std::string& name, const Json::Value& value) {
   }
   std::string text;
   if (!Platform::isTaskPropertyName(name) || !Platform::writeTaskValue(value, text)) {
+    PLATFORM_LOG("Task.cpp", "a task's property is not stored: %s",
+                 text.empty() && Platform::isTaskPropertyName(name) ? "its value nests too deep"
+                                                                    : "its name cannot be one");
     private_->refused = true;
     return false;
   }

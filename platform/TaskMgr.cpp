@@ -12,9 +12,9 @@ using namespace QELO::Platform;
 
 namespace ARDO {
 
-TaskMgr::TaskMgr(const std::string& owner) : owner_(owner) {}
+namespace {
 
-Json::Value TaskMgr::getAllTaskId(const char* prefix) {
+Json::Value listTasks(const std::string& owner, const char* prefix, bool unended) {
   Json::Value ids(Json::arrayValue);
   std::vector<ListedTask> tasks;
   TaskStores* stores = openTaskStores();
@@ -22,8 +22,8 @@ Json::Value TaskMgr::getAllTaskId(const char* prefix) {
     return ids;
   }
   for (const uid_t store : stores->Stores()) {
-    if (mayHoldTasksOf(store, owner_)) {
-      stores->List(store, owner_, prefix != nullptr ? prefix : "", tasks);
+    if (mayHoldTasksOf(store, owner)) {
+      stores->List({store, owner, prefix != nullptr ? prefix : "", unended}, tasks);
     }
   }
   std::stable_sort(tasks.begin(), tasks.end(), [](const ListedTask& left, const ListedTask& right) {
@@ -33,6 +33,18 @@ Json::Value TaskMgr::getAllTaskId(const char* prefix) {
     ids.append(task.id);
   }
   return ids;
+}
+
+}  // namespace
+
+TaskMgr::TaskMgr(const std::string& owner) : owner_(owner) {}
+
+Json::Value TaskMgr::getAllTaskId(const char* prefix) {
+  return listTasks(owner_, prefix, false);
+}
+
+Json::Value TaskMgr::getUnendedTaskId(const char* prefix) {
+  return listTasks(owner_, prefix, true);
 }
 
 std::string TaskUtil::getUniqueID(const std::string&, const std::string& prefix) {

@@ -75,6 +75,8 @@ class WEBAPI_API TaskMgr {
   /// The ids of the owner's tasks, oldest first, as an array of strings.
   /// @param prefix  only those that start with it; null for all
   Json::Value getAllTaskId(const char* prefix);
+  /// Of those the ones that nobody has found ended yet. Ended ones cost nothing, however many.
+  Json::Value getUnendedTaskId(const char* prefix);
 
  private:
   std::string owner_;

@@ -63,11 +63,11 @@ TaskResult TaskDatabase::Update(const TaskKey& key, const TaskProperties& proper
 TaskResult TaskDatabase::SetProcess(const TaskKey& key, const ProcessIdentity& process) {
   Statement statement(
       Prepare("UPDATE tasks SET pid=?3, start=?4, boot=?5, version=version+1,"
-              " finished=CASE WHEN ending=1 THEN finished END,"
+              " changed=?6, finished=CASE WHEN ending=1 THEN finished END,"
               " ending=CASE WHEN ending=1 THEN 1 ELSE 0 END WHERE owner=?1 AND task=?2"));
   statement.Text(1, key.owner).Text(2, key.id).Number(3, process.pid);
   statement.Number(4, static_cast<int64_t>(process.start)).Text(5, process.boot);
-  return Changed(statement.Run());
+  return Changed(statement.Number(6, currentMilliseconds()).Run());
 }
 
 TaskResult TaskDatabase::Finish(const TaskKey& key) {
@@ -106,14 +106,18 @@ TaskResult TaskDatabase::Remove(const TaskKey& key) {
   return Erase(row) && statement.Run() && transaction.Commit() ? TaskResult::kDone : Fail();
 }
 
-TaskResult TaskDatabase::List(const std::string& owner, const std::string& prefix,
-                              std::vector<ListedTask>& tasks) {
+TaskResult TaskDatabase::List(const TaskQuery& query, std::vector<ListedTask>& tasks) {
+  Tidy();
   // The index holds all that is read here. In the order of age it would take twice as long.
-  Statement statement(
-      Prepare("SELECT task, created, id FROM tasks WHERE owner=?1 AND task>=?2 AND task<?3"
-              " LIMIT ?4"));
-  const std::string end = prefix + '\x7f';  // behind every character of an id
-  statement.Text(1, owner).Text(2, prefix).Text(3, end).Number(4, kMostListed);
+  constexpr char kAll[] =
+      "SELECT task, created, id FROM tasks INDEXED BY tasks_named"
+      " WHERE owner=?1 AND task>=?2 AND task<?3 LIMIT ?4";
+  constexpr char kUnended[] =
+      "SELECT task, created, id FROM tasks INDEXED BY tasks_running"
+      " WHERE finished IS NULL AND owner=?1 AND task>=?2 AND task<?3 LIMIT ?4";
+  Statement statement(Prepare(query.unended ? kUnended : kAll));
+  const std::string end = query.prefix + '\x7f';  // behind every character of an id
+  statement.Text(1, query.owner).Text(2, query.prefix).Text(3, end).Number(4, kMostListed);
   while (statement.Row()) {
     tasks.push_back({statement.TextAt(0), statement.NumberAt(1), statement.NumberAt(2)});
   }
@@ -150,7 +154,8 @@ TaskResult TaskDatabase::Create(const TaskKey& key, int64_t& row) {
   const int64_t now = currentMilliseconds();
   const std::string boot = readBootId();
   Statement statement(
-      Prepare("INSERT INTO tasks(owner, task, created, born, boot) VALUES(?1, ?2, ?3, ?4, ?5)"));
+      Prepare("INSERT INTO tasks(owner, task, created, changed, born, boot)"
+              " VALUES(?1, ?2, ?3, ?3, ?4, ?5)"));
   statement.Text(1, key.owner).Text(2, key.id).Number(3, now);
   statement.Number(4, bootMilliseconds()).Text(5, boot);
   if (!removed.Good() || !Clear(now) || !statement.Run()) {
@@ -171,8 +176,9 @@ bool TaskDatabase::Put(int64_t row, const TaskProperties& properties) {
     }
   }
   Statement size(Prepare("SELECT total(length(value)) FROM properties WHERE task=?1"));
-  Statement version(Prepare("UPDATE tasks SET version=version+1 WHERE id=?1"));
-  if (!size.Number(1, row).Row() || !version.Number(1, row).Run()) {
+  Statement version(Prepare("UPDATE tasks SET version=version+1, changed=?2 WHERE id=?1"));
+  version.Number(1, row).Number(2, currentMilliseconds());
+  if (!size.Number(1, row).Row() || !version.Run()) {
     Fail();
     return false;
   }

@@ -25,7 +25,8 @@ class TaskDatabase {
   using KeepSeconds = int (*)();
 
   /// @param database     taken over
-  /// @param keepSeconds  asked when a record is made: those that ended longer ago are then cleared
+  /// @param keepSeconds  asked when a record is made or records are listed: those that ended longer
+  ///                     ago are then cleared
   TaskDatabase(sqlite3* database, KeepSeconds keepSeconds);
   TaskDatabase(const TaskDatabase&) = delete;
   TaskDatabase& operator=(const TaskDatabase&) = delete;
@@ -37,9 +38,9 @@ class TaskDatabase {
   /// Stores how the task ended, unless it has another process or ended otherwise meanwhile.
   TaskResult MarkEnded(const TaskKey& key, const ProcessIdentity& process, TaskEnding ending);
   TaskResult Remove(const TaskKey& key);
-  /// @param tasks  receives the owner's tasks, oldest first, when it is empty
-  TaskResult List(const std::string& owner, const std::string& prefix,
-                  std::vector<ListedTask>& tasks);
+  /// Clears first, unless others are writing.
+  /// @param tasks  receives the tasks, oldest first, when it is empty
+  TaskResult List(const TaskQuery& query, std::vector<ListedTask>& tasks);
 
   const std::string& Error() const { return error_; }
 
@@ -58,8 +59,19 @@ class TaskDatabase {
   TaskResult Create(const TaskKey& key, int64_t& row);
   bool Put(int64_t row, const TaskProperties& properties);
   bool Erase(int64_t row);
+  struct Forgotten {
+    int64_t row;
+    TaskEnding ending;
+    int64_t time;  ///< of the last sign of life
+  };
+
   bool Clear(int64_t now);
-  bool EndForgotten(int64_t before, int64_t now);
+  /// Clears when there is something to clear.
+  void Tidy();
+  bool HasEnded(int64_t before);
+  /// Some of the tasks that were made before and died while nobody asked for them.
+  bool FindForgotten(int64_t before, std::vector<Forgotten>& forgotten);
+  bool EndForgotten(const std::vector<Forgotten>& forgotten);
   bool ClearEnded(int64_t before);
   bool ClearRemoved(int64_t before);
   /// What the last statement did to the record that it named.

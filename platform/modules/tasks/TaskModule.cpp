@@ -34,8 +34,7 @@ class DatabaseStores final : public TaskStores {
   TaskResult Remove(const TaskKey& key) override {
     return Change(key.store, false, [&](TaskDatabase& database) { return database.Remove(key); });
   }
-  TaskResult List(uid_t store, const std::string& owner, const std::string& prefix,
-                  std::vector<ListedTask>& tasks) override;
+  TaskResult List(const TaskQuery& query, std::vector<ListedTask>& tasks) override;
   std::vector<uid_t> Stores() override {
     return geteuid() == 0 ? listStores(settings_.directory) : std::vector<uid_t>{geteuid()};
   }
@@ -77,21 +76,20 @@ TaskResult DatabaseStores::Load(const TaskKey& key, TaskRecord& record) {
   return End(use, key.store, result);
 }
 
-TaskResult DatabaseStores::List(uid_t store, const std::string& owner, const std::string& prefix,
-                                std::vector<ListedTask>& tasks) {
-  Use use(StoreConnection::Get(), settings_, store, false);
+TaskResult DatabaseStores::List(const TaskQuery& query, std::vector<ListedTask>& tasks) {
+  Use use(StoreConnection::Get(), settings_, query.store, false);
   TaskResult result = use.State();
   if (result == TaskResult::kDone) {
     std::vector<ListedTask> found;
-    result = use.Database().List(owner, prefix, found);
+    result = use.Database().List(query, found);
     for (ListedTask& task : found) {
       uid_t named = 0;
-      if (readTaskId(task.id, named) && named == store) {
+      if (readTaskId(task.id, named) && named == query.store) {
         tasks.push_back(std::move(task));
       }
     }
   }
-  return End(use, store, result);
+  return End(use, query.store, result);
 }
 
 UniqueFd DatabaseStores::Watch(uid_t store) {

@@ -45,6 +45,14 @@ enum class TaskResult {
   kFailed    ///< the store cannot be used (logged)
 };
 
+/// Which tasks of one store.
+struct TaskQuery {
+  uid_t store = 0;
+  std::string owner;
+  std::string prefix;    ///< of the ids; "": all
+  bool unended = false;  ///< those alone that nobody has found ended yet
+};
+
 struct ListedTask {
   std::string id;
   int64_t created = 0;  ///< milliseconds since the epoch
@@ -73,9 +81,8 @@ class TaskStores {
   virtual TaskResult SetProcess(const TaskKey& key, const ProcessIdentity& process) = 0;
   virtual TaskResult Finish(const TaskKey& key) = 0;
   virtual TaskResult Remove(const TaskKey& key) = 0;
-  /// Adds the owner's tasks in one store, oldest first.
-  virtual TaskResult List(uid_t store, const std::string& owner, const std::string& prefix,
-                          std::vector<ListedTask>& tasks) = 0;
+  /// Adds the tasks that are asked for, oldest first.
+  virtual TaskResult List(const TaskQuery& query, std::vector<ListedTask>& tasks) = 0;
   /// The stores that the process may open.
   virtual std::vector<uid_t> Stores() = 0;
   /// A descriptor that becomes readable after every change in a store from now on; reading it does

@@ -1,6 +1,7 @@
 #include "platform/modules/tasks/TaskSchema.h"
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -8,12 +9,15 @@
 #include <cstring>
 #include <iterator>
 
+#include "platform/PlatformLog.h"
 #include "platform/Secrets.h"
 
 namespace QELO::Platform {
 namespace {
 
-constexpr int kBusyMs = 5000;
+constexpr int kVersion = 1;  // of the tables below; 0 is what came before versions
+constexpr int kLockTries = 100;
+constexpr useconds_t kLockPauseUs = 10'000;
 constexpr int kLargestText = 16 << 20;      // bytes of one property
 constexpr char kCheckpointPages[] = "128";  // what one who opens the database reads at most
 
@@ -27,7 +31,8 @@ constexpr const char* kSchema[] = {
     "CREATE TABLE tasks(id INTEGER PRIMARY KEY, owner TEXT NOT NULL, task TEXT NOT NULL,"
     " created INTEGER NOT NULL, born INTEGER NOT NULL, boot TEXT NOT NULL,"
     " pid INTEGER NOT NULL DEFAULT 0, start INTEGER NOT NULL DEFAULT 0,"
-    " ending INTEGER NOT NULL DEFAULT 0, finished INTEGER, version INTEGER NOT NULL DEFAULT 1)",
+    " ending INTEGER NOT NULL DEFAULT 0, finished INTEGER, version INTEGER NOT NULL DEFAULT 1,"
+    " changed INTEGER NOT NULL DEFAULT 0)",
     "CREATE INDEX tasks_ended ON tasks(finished) WHERE finished IS NOT NULL",
     "CREATE INDEX tasks_named ON tasks(owner, task, created)",  // all that a list reads
     "CREATE INDEX tasks_running ON tasks(created) WHERE finished IS NULL",
@@ -49,7 +54,7 @@ sqlite3* openFile(const std::string& path, std::string& error) {
     sqlite3_close(database);
     return nullptr;
   }
-  sqlite3_busy_timeout(database, kBusyMs);
+  sqlite3_busy_timeout(database, kTaskBusyMs);
   sqlite3_limit(database, SQLITE_LIMIT_LENGTH, kLargestText);
   return database;
 }
@@ -64,7 +69,10 @@ bool writeSchema(const std::string& path, std::string& error) {
     sql += std::string(statement) + ";";
   }
   // The journal mode stays with the file. Set last, it leaves nothing in companion files.
-  const bool written = execute(database, sql + "COMMIT; PRAGMA journal_mode=WAL", error);
+  const bool written = execute(
+      database,
+      sql + "PRAGMA user_version=" + std::to_string(kVersion) + "; COMMIT; PRAGMA journal_mode=WAL",
+      error);
   sqlite3_close(database);
   return written;
 }
@@ -136,6 +144,80 @@ bool hasOurSchema(sqlite3* database, std::string& error) {
   return same;
 }
 
+/// The number that a query answers, -1 on failure.
+int64_t ask(sqlite3* database, const char* sql) {
+  sqlite3_stmt* statement = nullptr;
+  int64_t number = -1;
+  if (sqlite3_prepare_v2(database, sql, -1, &statement, nullptr) == SQLITE_OK &&
+      sqlite3_step(statement) == SQLITE_ROW) {
+    number = sqlite3_column_int64(statement, 0);
+  }
+  sqlite3_finalize(statement);
+  return number;
+}
+
+/// Whether another version of this module has made it.
+bool isOfAnotherVersion(sqlite3* database) {
+  const int64_t version = ask(database, "PRAGMA user_version");
+  return version >= 0 && version != kVersion &&
+         ask(database,
+             "SELECT count(*) FROM sqlite_schema"
+             " WHERE type='table' AND name IN ('tasks','properties')") == 2;
+}
+
+/// Keeps others out while it lives. Its user might hold the lock for ever, so it is not waited for
+/// for long. @return none, with errno, on failure
+UniqueFd lockDirectory(const StoreDirectory& directory) {
+  UniqueFd lock(open(directory.Path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  for (int tries = 0; lock && flock(lock.Get(), LOCK_EX | LOCK_NB) != 0; ++tries) {
+    if (errno != EWOULDBLOCK || tries == kLockTries) {
+      return UniqueFd();
+    }
+    usleep(kLockPauseUs);
+  }
+  return lock;
+}
+
+/// Renames the database and what belongs to it. @return false with errno
+bool renameToOld(int directory) {
+  const std::string name = kTaskDatabase;
+  for (const char* companion : {"", "-wal", "-shm"}) {  // a log must not meet another's database
+    if (unlinkat(directory, (name + ".old" + companion).c_str(), 0) != 0 && errno != ENOENT) {
+      return false;
+    }
+  }
+  // The database last: until it is gone another process would do the same.
+  for (const char* companion : {"-wal", "-shm", ""}) {
+    const std::string old = name + ".old" + companion;
+    if (renameat(directory, (name + companion).c_str(), directory, old.c_str()) != 0 &&
+        (errno != ENOENT || *companion == '\0')) {
+      return false;
+    }
+  }
+  return true;
+}
+
+/// Renames the file that is open as the database, unless another process did before.
+bool setAside(const StoreDirectory& directory, sqlite3* database, const DatabaseFile& file,
+              std::string& error) {
+  const UniqueFd lock = lockDirectory(directory);
+  if (lock && !(findDatabaseFile(directory) == file)) {
+    return true;
+  }
+  if (lock) {
+    // So that the file is whole by itself. Not before it is known to be the one with this log.
+    sqlite3_wal_checkpoint_v2(database, nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
+  }
+  if (!lock || !renameToOld(directory.Fd())) {
+    error = strerror(errno);
+    return false;
+  }
+  PLATFORM_LOG("TaskModule.cpp",
+               "another version made the task records %s/%s, which are kept as %s.old",
+               directory.Path().c_str(), kTaskDatabase, kTaskDatabase);
+  return true;
+}
+
 bool prepare(sqlite3* database, std::string& error) {
   sqlite3_db_config(database, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
   sqlite3_db_config(database, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
@@ -152,11 +234,11 @@ bool prepare(sqlite3* database, std::string& error) {
          hasOurSchema(database, error);
 }
 
-}  // namespace
-
-sqlite3* openTaskDatabase(const StoreDirectory& directory, uid_t store, bool create, bool& missing,
-                          std::string& error) {
+/// @param again  receives whether the database was set aside, and there may be another now
+sqlite3* openOnce(const StoreDirectory& directory, uid_t store, bool create, bool& missing,
+                  std::string& error, bool& again) {
   missing = false;
+  again = false;
   if (!isSafeFile(directory, store, missing, error)) {
     if (!missing || !create || !makeDatabase(directory, error) ||
         !isSafeFile(directory, store, missing, error)) {
@@ -164,12 +246,23 @@ sqlite3* openTaskDatabase(const StoreDirectory& directory, uid_t store, bool cre
     }
   }
   missing = false;
+  const DatabaseFile file = findDatabaseFile(directory);
   sqlite3* database = openFile(directory.Path() + "/" + kTaskDatabase, error);
-  if (database != nullptr && !prepare(database, error)) {
-    sqlite3_close(database);
-    return nullptr;
+  if (database == nullptr || prepare(database, error)) {
+    return database;
   }
-  return database;
+  again = isOfAnotherVersion(database) && setAside(directory, database, file, error);
+  sqlite3_close(database);
+  return nullptr;
+}
+
+}  // namespace
+
+sqlite3* openTaskDatabase(const StoreDirectory& directory, uid_t store, bool create, bool& missing,
+                          std::string& error) {
+  bool again = false;
+  sqlite3* database = openOnce(directory, store, create, missing, error, again);
+  return again ? openOnce(directory, store, create, missing, error, again) : database;
 }
 
 DatabaseFile findDatabaseFile(const StoreDirectory& directory) {

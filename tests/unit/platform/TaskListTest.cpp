@@ -146,6 +146,20 @@ TEST_F(TaskLists, LeaveOutRowsWhoseIdCannotBeOne) {
   EXPECT_EQ(List("alice", nullptr), Expected({id}));
 }
 
+TEST_F(TaskLists, OfUnendedTasksLeaveOutThoseThatAreKnownToHaveEnded) {
+  const std::string running = NewTask("alice", "a_");
+  const std::string finished = NewTask("alice", "a_");
+  const std::string other = NewTask("alice", "b_");
+  NewTask("bob", "a_");
+  EXPECT_TRUE(Task("alice", finished).finish(false));
+  const auto list = [](const char* prefix) {
+    return JsonHelper::toString(TaskMgr("alice").getUnendedTaskId(prefix));
+  };
+  EXPECT_EQ(list(nullptr), Expected({running, other}));
+  EXPECT_EQ(list("a_"), Expected({running}));
+  EXPECT_EQ(JsonHelper::toString(TaskMgr("carol").getUnendedTaskId("")), "[]");
+}
+
 TEST_F(TaskLists, OfTenThousandComeAtOnce) {
   const std::string id = NewTask("alice", "mine_");
   Sql("WITH RECURSIVE n(i) AS (SELECT 10000 UNION ALL SELECT i+1 FROM n WHERE i<19999)"

@@ -81,6 +81,7 @@ TEST_F(TaskRecords, UpdateWithOneValueThatNestsTooDeepStoresNothing) {
   EXPECT_TRUE(task.setProperty("body", Number(2)));
   EXPECT_FALSE(task.setProperty("deep", Nested(JsonHelper::kMaxDepth + 1)));
   EXPECT_FALSE(task.endUpdate());
+  EXPECT_EQ(SyslogCapture::Count("a task's property is not stored: its value nests too deep"), 1);
   EXPECT_EQ(NumberOf(Task("alice", id).getProperty("body")), 1);
 }
 
@@ -115,6 +116,7 @@ TEST_F(TaskRecords, PropertyNamesThatAreEmptyOrTooLongOrHoldNulAreRefused) {
   EXPECT_FALSE(task.setProperty("", 1));
   EXPECT_FALSE(task.setProperty(std::string("a\0b", 3), 1));
   EXPECT_FALSE(task.setProperty(std::string(257, 'n'), 1));
+  EXPECT_EQ(SyslogCapture::Count("a task's property is not stored: its name cannot be one"), 3);
   EXPECT_TRUE(task.setProperty(std::string(256, 'n'), 1));
 }
 

@@ -1,10 +1,12 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <filesystem>
 #include <fstream>
+#include <vector>
 
 #include "platform/PlatformPaths.h"
 #include "tests/support/SyslogCapture.h"
@@ -200,6 +202,78 @@ TEST_F(TaskStore, DatabaseWithAMissingIndexIsRefused) {
   Sql("DROP INDEX tasks_running");
   CloseStore();
   ExpectRefused("the file holds other tables than ours");
+}
+
+/// As a store was before its tables had a version.
+constexpr char kOldTables[] = "ALTER TABLE tasks DROP COLUMN changed; PRAGMA user_version=0";
+
+TEST_F(TaskStore, OfAnotherVersionIsSetAsideAndUsedAnew) {
+  for (const char* change : {kOldTables, "PRAGMA user_version=2; CREATE TABLE more(x)"}) {
+    const std::string old = NewTask("alice");
+    const std::string records = Sql("SELECT count(*) FROM tasks");
+    Sql(change);
+    CloseStore();
+    SyslogCapture::Clear();
+    const std::string id = NewTask("alice");
+    EXPECT_TRUE(TaskUtil::checkTaskExists("alice", id)) << change;
+    EXPECT_FALSE(TaskUtil::checkTaskExists("alice", old));
+    EXPECT_EQ(TaskMgr("alice").getAllTaskId(nullptr).size(), 1U);
+    EXPECT_EQ(SyslogCapture::Count("TaskModule.cpp:"), 1);
+    EXPECT_EQ(SyslogCapture::Count("another version made the task records " + Store(geteuid()) +
+                                   "/tasks.db, which are kept as tasks.db.old"),
+              1);
+    fs::rename(Store(geteuid(), "tasks.db"), Store(geteuid(), "new.db"));
+    for (const char* companion : {"", "-wal", "-shm"}) {
+      const std::string kept = Store(geteuid(), "tasks.db.old") + companion;
+      if (fs::exists(kept)) {
+        fs::copy_file(kept, Store(geteuid(), "tasks.db") + companion,
+                      fs::copy_options::overwrite_existing);
+      }
+    }
+    EXPECT_EQ(Sql("SELECT count(*) FROM tasks"), records) << "what it holds is kept";
+    RemoveCompanions();
+    fs::rename(Store(geteuid(), "new.db"), Store(geteuid(), "tasks.db"));
+    fs::remove_all(Store(geteuid()));
+  }
+}
+
+TEST_F(TaskStore, OfAnotherVersionIsNoStoreToAReader) {
+  Sql(kOldTables);
+  CloseStore();
+  SyslogCapture::Clear();
+  EXPECT_FALSE(TaskUtil::checkTaskExists("alice", id_));
+  EXPECT_EQ(TaskMgr("alice").getAllTaskId(nullptr).size(), 0U);
+  EXPECT_EQ(SyslogCapture::Count("another version made"), 1);
+  EXPECT_EQ(SyslogCapture::Count("cannot use the task store"), 0);
+  EXPECT_FALSE(fs::exists(Store(geteuid(), "tasks.db")));
+}
+
+TEST_F(TaskStore, OfAnotherVersionIsSetAsideOnceByManyWhoNeedIt) {
+  Sql(kOldTables);
+  CloseStore();
+  constexpr int kProcesses = 12;
+  std::vector<pid_t> children;
+  for (int i = 0; i < kProcesses; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      _exit(NewTask("alice").empty() ? 1 : 0);
+    }
+    children.push_back(child);
+  }
+  for (const pid_t child : children) {
+    int status = -1;
+    EXPECT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(status, 0);
+  }
+  EXPECT_EQ(TaskMgr("alice").getAllTaskId(nullptr).size(), 12U);
+}
+
+TEST_F(TaskStore, OfAnotherVersionStaysWhenItCannotBeSetAside) {
+  Sql(kOldTables);
+  CloseStore();
+  fs::create_directory(Store(geteuid(), "tasks.db.old"));
+  ExpectRefused("Is a directory");
+  EXPECT_TRUE(fs::exists(Store(geteuid(), "tasks.db")));
 }
 
 // Bytes are changed everywhere in turn: whatever is hit, every operation ends, and what it says of
