@@ -52,22 +52,6 @@ int FindDirectory(const std::string& path, std::string& directory) {
   return 0;
 }
 
-/// How many of the caller's tasks of this kind have not ended.
-int CountRunning(APIPolling& polling) {
-  Json::Value groups(Json::arrayValue);
-  groups.append("user");
-  Json::Value ids;
-  Json::Value tasks;
-  if (!polling.List(kPrefix, groups, ids) || !polling.Status(ids["user"], tasks)) {
-    return 0;  // none was ever started
-  }
-  int running = 0;
-  for (const Json::Value& task : tasks) {
-    running += QELO::JsonHelper::asBool(QELO::JsonHelper::member(task, "finish"), true) ? 0 : 1;
-  }
-  return running;
-}
-
 void Work(APIRequest*, APIResponse* response, void* arg) {
   const Job& job = *static_cast<const Job*>(arg);
   [[maybe_unused]] const int niceness = nice(kNiceness);  // people at work go first
@@ -110,7 +94,8 @@ void Start(APIRequest* request, APIResponse* response) {
     return;
   }
   APIPolling polling(request);
-  if (CountRunning(polling) >= kMostRunning) {
+  int running = 0;
+  if (!polling.CountRunning(kPrefix, running) || running >= kMostRunning) {
     response->SetError(kTooMany);
     return;
   }

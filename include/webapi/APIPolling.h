@@ -66,8 +66,10 @@ class WEBAPI_API APIPolling {
   /// In the background process: `work` gets the same request and response and sets a result as
   /// often as it likes; each is what a status shows from then on. The request's environment is
   /// replaced by "task_id", "task_user" and "full_task_id". When `work` returns the task ends; when
-  /// it throws, or returns without a result, the result is error 117. It need not return: a stop
-  /// is SIGTERM. Standard streams lead to /dev/null.
+  /// it throws, returns without a result, or its last one cannot be stored, the result is error
+  /// 117. It need not return: a stop is SIGTERM. Standard streams lead to /dev/null; ends of pipes
+  /// and socket pairs whose other end only other processes have are closed. `work` does not run
+  /// when the task was stopped before.
   ///
   /// "info" never holds the credentials that a request may carry as parameters.
   /// @param arg  handed to `work`
@@ -97,6 +99,11 @@ class WEBAPI_API APIPolling {
   /// @param prefix  only task ids that start with it; "": all
   /// @param groups  array of "user", "admin" and "everyone"
   bool List(const std::string& prefix, const Json::Value& groups, Json::Value& out);
+
+  /// How many of the login user's own tasks have not ended. Costs what the running ones cost,
+  /// however many records of ended ones there are.
+  /// @param prefix  only task ids that start with it; "": all
+  bool CountRunning(const std::string& prefix, int& count);
 
   void SetError(int code);
   int GetError() const;

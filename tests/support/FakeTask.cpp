@@ -69,6 +69,12 @@ bool isAlive(int pid) {
   return name != std::string::npos && text[name + 2] != 'Z';
 }
 
+void passTime(const std::string& operation) {
+  if (FakeTask::Get().meanwhile) {
+    FakeTask::Get().meanwhile(operation);
+  }
+}
+
 void note(const std::string& call) {
   FakeTask::Get().calls.push_back(call);
 }
@@ -167,9 +173,10 @@ bool Task::setProperty(const std::string& name, const Json::Value& value) {
 }
 
 bool Task::endUpdate() {
-  note("endUpdate(" + QELO::JsonHelper::toString(private_->pending) + ")");
+  const std::string text = QELO::JsonHelper::toString(private_->pending);
+  note("endUpdate(" + text + ")");
   private_->updating = false;
-  if (!FakeTask::Get().endUpdate) {
+  if (!FakeTask::Get().endUpdate || text.size() > FakeTask::Get().largestUpdate) {
     return false;
   }
   const bool isNew = private_->record.isNull();  // one that was removed is not made again
@@ -222,6 +229,7 @@ bool Task::reload() {
 }
 
 bool Task::setCreatePid(int pid) {
+  passTime("setCreatePid");
   return FakeTask::Get().setCreatePid &&
          FakeTask::Get().Change(private_->owner, private_->id, false,
                                 [&](Json::Value& record) { record["pid"] = pid; });
@@ -229,7 +237,9 @@ bool Task::setCreatePid(int pid) {
 
 int Task::getCreatePid() const {
   const int pid = asInt(member(private_->record, "pid"));
-  return pid > 0 && !isAlive(pid) ? 0 : pid;
+  const bool isTold = pid > 0 && (FakeTask::Get().tellDead || isAlive(pid));
+  passTime("getCreatePid");
+  return isTold ? pid : 0;
 }
 
 std::string Task::getTaskId() const {
@@ -263,6 +273,17 @@ bool Task::waitForChange(int limit) {
 
 TaskMgr::TaskMgr(const std::string& owner) : owner_(owner) {}
 
+Json::Value TaskMgr::getUnendedTaskId(const char* prefix) {
+  const Json::Value all = getAllTaskId(prefix);
+  Json::Value ids(Json::arrayValue);
+  for (const Json::Value& id : all) {
+    if (!asBool(member(FakeTask::Get().Record(owner_, id.asString()), "finished"))) {
+      ids.append(id);
+    }
+  }
+  return ids;
+}
+
 Json::Value TaskMgr::getAllTaskId(const char* prefix) {
   note("getAllTaskId(" + owner_ + ", " + (prefix != nullptr ? prefix : "null") + ")");
   Json::Value ids(Json::arrayValue);
@@ -280,7 +301,9 @@ std::string TaskUtil::getUniqueID(const std::string& owner, const std::string& p
 }
 
 bool TaskUtil::checkTaskExists(const std::string& owner, const std::string& taskId) {
-  return !FakeTask::Get().Record(owner, taskId).isNull();
+  const bool exists = !FakeTask::Get().Record(owner, taskId).isNull();
+  passTime("checkTaskExists");
+  return exists;
 }
 
 }  // namespace ARDO

@@ -2,6 +2,7 @@
 
 #include <json/json.h>
 
+#include <cstdint>
 #include <functional>
 #include <string>
 #include <vector>
@@ -16,10 +17,15 @@ struct FakeTask {
   /// Calls of this process: "Operation(argument, ...)" in order. A child's are its own.
   std::vector<std::string> calls;
 
-  std::string nextId = "id1";  ///< what getUniqueID appends to the prefix
-  bool endUpdate = true;       ///< false: nothing is stored
-  bool finish = true;          ///< false: nothing is stored
-  bool setCreatePid = true;    ///< false: nothing is stored
+  std::string nextId = "id1";       ///< what getUniqueID appends to the prefix
+  bool endUpdate = true;            ///< false: nothing is stored
+  bool finish = true;               ///< false: nothing is stored
+  bool setCreatePid = true;         ///< false: nothing is stored
+  bool tellDead = false;            ///< getCreatePid answers a process that has ended, too
+  size_t largestUpdate = SIZE_MAX;  ///< longer ones, as JSON text, are not stored
+  /// Called by operations once they have looked at the records or changed them: what another
+  /// process does in that moment. Named as in `calls`.
+  std::function<void(const std::string& operation)> meanwhile;
 
   /// A record: {"properties": {...}, "finished": bool, "pid": int}; null when there is none.
   Json::Value Record(const std::string& owner, const std::string& taskId) const;

@@ -60,6 +60,10 @@ bool APIPolling::List(const std::string& prefix, const Json::Value& groups, Json
   return private_->List(prefix, groups, out);
 }
 
+bool APIPolling::CountRunning(const std::string& prefix, int& count) {
+  return private_->CountRunning(prefix, count);
+}
+
 void APIPolling::SetError(int code) {
   private_->SetError(code);
 }

@@ -2,6 +2,8 @@
 
 #include <sys/types.h>
 
+#include <functional>
+#include <memory>
 #include <string>
 
 #include "webapi/APIPolling.h"
@@ -31,13 +33,17 @@ class APIPollingPrivate : public APIBase {
   bool Wait(const std::string& fullId, const std::string& state, int seconds, Json::Value& out);
   bool Stop(const std::string& fullId, bool remove);
   bool List(const std::string& prefix, const Json::Value& groups, Json::Value& out);
+  bool CountRunning(const std::string& prefix, int& count);
 
   /// Splits at the first "/". @return false, and nothing is set, when there is none
   bool GetUserAndTaskID(const std::string& fullId, std::string& owner, std::string& taskId) const;
   /// Whether the login user may touch the owner's tasks.
   bool CheckTaskUser(const std::string& owner) const;
-  /// Asks a process to end. @return whether it was asked, or is gone
-  bool DoKill(pid_t pid) const;
+  /// Asks a process to end.
+  /// @param isStill  whether the number is that process's still; asked with the process in hand,
+  ///                 which whoever gets the number later is not; null: it is
+  /// @return whether it was asked, or is gone
+  bool DoKill(pid_t pid, const std::function<bool()>& isStill = nullptr) const;
   /// The full ids of a text, of an object's or of an array's members; else null.
   Json::Value ConverToFullTaskId(const std::string& owner, const Json::Value& ids) const;
 
@@ -57,11 +63,19 @@ class APIPollingPrivate : public APIBase {
   /// @return 0, or the response's error
   int FindOwner(const std::string& group, std::string& owner) const;
   Json::Value DescribeCall() const;
-  /// Finds one of the caller's tasks by what a client sent. @return false with the error set
-  bool FindTask(const std::string& fullId, std::string& owner, std::string& taskId);
+  /// Loads one of the caller's tasks by what a client sent. @return null with the error set
+  std::unique_ptr<ARDO::Task> FindTask(const std::string& fullId);
+  /// Loads a task of an owner who was checked. @return null when there is none
+  static std::unique_ptr<ARDO::Task> LoadTask(const std::string& owner, const std::string& taskId);
+  bool FailMissing(const std::string& fullId);
+  /// Asks the task's process, if one is recorded, to end. @return false with the error set
+  bool EndProcess(const ARDO::Task& task, const std::string& fullId);
   Json::Value StatusOf(const ARDO::Task& task) const;
+  static void LeaveStarter(pid_t starter) noexcept;
   [[noreturn]] void RunChild(const std::string& owner, const std::string& taskId,
                              APIResponse* response, APIPolling::Work work, void* arg) noexcept;
+  /// Ends the task whose work is over. @param returned  false: it threw
+  void FinishTask(ARDO::Task& task, APIResponse* response, bool returned) const;
 
   APIRequest* request_;
   APIPolling* owner_;

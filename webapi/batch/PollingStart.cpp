@@ -12,7 +12,9 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/batch/APIPollingPrivate.h"
+#include "webapi/batch/PollingPipes.h"
 #include "webapi/batch/PollingTerms.h"
+#include "webapi/model/APIResponseTask.h"
 #include "webapi/model/Log.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Task.h"
@@ -109,6 +111,7 @@ bool APIPollingPrivate::Start(APIResponse* response, APIPolling::Work work, void
     WEBAPI_LOG(kPollingSource, "Failed to set property.");
     return false;
   }
+  const pid_t starter = getpid();
   const pid_t child = QLIBCProcFork();
   if (child < 0) {
     const int error = errno;
@@ -118,6 +121,7 @@ bool APIPollingPrivate::Start(APIResponse* response, APIPolling::Work work, void
     return false;
   }
   if (child == 0) {
+    LeaveStarter(starter);
     RunChild(owner, taskId, response, work, arg);
   }
   task.waitForDataReady("task_run", kFirstResultLimit);
@@ -127,13 +131,22 @@ bool APIPollingPrivate::Start(APIResponse* response, APIPolling::Work work, void
   return true;
 }
 
+/// What the process has from its starter and must not keep.
+void APIPollingPrivate::LeaveStarter(pid_t starter) noexcept {
+  setsid();
+  // A daemon that starts a task takes SIGTERM as it likes; the task ends by it.
+  sigset_t stop;
+  sigemptyset(&stop);
+  sigaddset(&stop, SIGTERM);
+  signal(SIGTERM, SIG_DFL);
+  sigprocmask(SIG_UNBLOCK, &stop, nullptr);
+  StandardStreams::LetGo();
+  closePipesToOthers(starter);
+}
+
 /// Nothing may leave this function: behind it lies the parent's work.
 void APIPollingPrivate::RunChild(const std::string& owner, const std::string& taskId,
                                  APIResponse* response, APIPolling::Work work, void* arg) noexcept {
-  setsid();
-  // A daemon that starts a task takes SIGTERM as it likes; the task ends by it.
-  signal(SIGTERM, SIG_DFL);
-  StandardStreams::LetGo();
   Json::Value environment(Json::objectValue);
   environment["task_id"] = taskId;
   environment["task_user"] = owner;
@@ -141,23 +154,34 @@ void APIPollingPrivate::RunChild(const std::string& owner, const std::string& ta
   request_->Serialize()["environ"] = environment;
   // Not the parent's object: what it holds open cannot be shared with a child.
   ARDO::Task task(owner, taskId);
-  if (!task.setCreatePid(getpid())) {
-    WEBAPI_LOG(kPollingSource, "Failed to set property.");
-  }
-  const bool returned = Fence("polling task", [&] { work(request_, response, arg); });
-  task.reload();
-  if (!returned || !task.hasProperty("task_run")) {
-    response->SetError(WEBAPI_ERR_NO_ANSWER);
-    task.reload();
-  }
-  if (!task.finish(task.getBoolProperty("auto_remove", false))) {
-    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail",
-               request_->GetPollingTaskId().c_str());
-  }
+  const bool recorded = task.setCreatePid(getpid());
+  if (task.reload() && !task.isFinished()) {
+    if (!recorded) {
+      WEBAPI_LOG(kPollingSource, "Failed to set property.");
+    }
+    const bool returned = Fence(
+        "polling task", [&] { work(request_, response, arg); }, kPollingSource);
+    FinishTask(task, response, returned);
+  }  // else it was stopped before it began, and nobody could see the work or stop it
   // Not exit(): handlers that the parent registered for its end, and what it has buffered in C++
   // streams, are the parent's.
   fflush(nullptr);
   _exit(0);
+}
+
+void APIPollingPrivate::FinishTask(ARDO::Task& task, APIResponse* response, bool returned) const {
+  if (!task.reload()) {
+    return;  // it was removed meanwhile
+  }
+  const bool refused = JsonHelper::asBool(
+      JsonHelper::member(JsonHelper::member(response->Serialize(), "option"), kResultRefused));
+  if (!returned || refused || !task.hasProperty("task_run")) {
+    response->SetError(WEBAPI_ERR_NO_ANSWER);
+  }
+  if (task.reload() && !task.finish(task.getBoolProperty("auto_remove", false)) && task.reload()) {
+    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail",
+               request_->GetPollingTaskId().c_str());
+  }
 }
 
 }  // namespace QELO

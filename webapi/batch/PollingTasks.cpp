@@ -2,6 +2,11 @@
 
 #include <errno.h>
 #include <signal.h>
+#include <unistd.h>
+
+extern "C" {  // the C library's header does not say so itself
+#include <sys/pidfd.h>
+}
 
 #include <algorithm>
 #include <chrono>
@@ -37,6 +42,37 @@ int unitsUntil(std::chrono::steady_clock::time_point end) {
   const auto left = std::chrono::ceil<Unit>(end - std::chrono::steady_clock::now()).count();
   return static_cast<int>(std::max<int64_t>(left, 0));
 }
+
+/// A process that is held: its number may become another's, but no signal goes to that one. Kernels
+/// that hold none are given the number.
+class Process {
+ public:
+  explicit Process(pid_t pid) : pid_(pid), handle_(pidfd_open(pid, 0)), error_(errno) {}
+  Process(const Process&) = delete;
+  Process& operator=(const Process&) = delete;
+  ~Process() {
+    if (handle_ >= 0) {
+      close(handle_);
+    }
+  }
+
+  /// @return 0, or errno
+  int Terminate() const {
+    if (handle_ < 0 && error_ == ESRCH) {
+      return ESRCH;
+    }
+    if (handle_ >= 0 && pidfd_send_signal(handle_, SIGTERM, nullptr, 0) == 0) {
+      return 0;
+    }
+    const bool isRefused = handle_ >= 0 && errno != ENOSYS;
+    return isRefused || kill(pid_, SIGTERM) != 0 ? errno : 0;
+  }
+
+ private:
+  pid_t pid_;
+  int handle_;
+  int error_;  ///< why there is no handle
+};
 
 }  // namespace
 
@@ -92,15 +128,19 @@ bool APIPollingPrivate::CheckTaskUser(const std::string& owner) const {
   return false;
 }
 
-bool APIPollingPrivate::DoKill(pid_t pid) const {
+bool APIPollingPrivate::DoKill(pid_t pid, const std::function<bool()>& isStill) const {
   if (pid < 1) {
     WEBAPI_LOG(kPollingSource, "invalid process id");
     return false;
   }
-  if (kill(pid, SIGTERM) == 0 || errno == ESRCH) {
+  const Process process(pid);
+  if (isStill && !isStill()) {
     return true;
   }
-  const int error = errno;
+  const int error = process.Terminate();
+  if (error == 0 || error == ESRCH) {
+    return true;
+  }
   WEBAPI_LOG(kPollingSource, "Failed to kill %d, reason=%s(%d)", pid, strerror(error), error);
   return false;
 }
@@ -140,33 +180,50 @@ Json::Value APIPollingPrivate::StatusOf(const ARDO::Task& task) const {
   return status;
 }
 
-bool APIPollingPrivate::FindTask(const std::string& fullId, std::string& owner,
-                                 std::string& taskId) {
+std::unique_ptr<ARDO::Task> APIPollingPrivate::LoadTask(const std::string& owner,
+                                                        const std::string& taskId) {
+  if (!ARDO::TaskUtil::checkTaskExists(owner, taskId)) {
+    return nullptr;
+  }
+  auto task = std::make_unique<ARDO::Task>(owner, taskId);
+  // It may have removed itself since, and what is not there would look as if it ran.
+  return task->reload() ? std::move(task) : nullptr;
+}
+
+bool APIPollingPrivate::FailMissing(const std::string& fullId) {
+  WEBAPI_LOG(kPollingSource, "No such task id[%s]", LogText(fullId).c_str());
+  return Fail(POLLING_ERR_NO_SUCH_TASK);
+}
+
+std::unique_ptr<ARDO::Task> APIPollingPrivate::FindTask(const std::string& fullId) {
+  std::string owner;
+  std::string taskId;
   if (!HasRequest()) {
-    return false;
+    return nullptr;
   }
   if (fullId.empty()) {
     WEBAPI_LOG(kPollingSource, "bad parameters");
-    return Fail(POLLING_ERR_BAD_PARAMETERS);
+    Fail(POLLING_ERR_BAD_PARAMETERS);
+    return nullptr;
   }
   if (!GetUserAndTaskID(fullId, owner, taskId) || !CheckTaskUser(owner)) {
     WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", LogText(fullId).c_str());
-    return Fail(POLLING_ERR_INVALID_ID);
+    Fail(POLLING_ERR_INVALID_ID);
+    return nullptr;
   }
-  if (!ARDO::TaskUtil::checkTaskExists(owner, taskId)) {
-    WEBAPI_LOG(kPollingSource, "No such task id[%s]", LogText(fullId).c_str());
-    return Fail(POLLING_ERR_NO_SUCH_TASK);
+  std::unique_ptr<ARDO::Task> task = LoadTask(owner, taskId);
+  if (task == nullptr) {
+    FailMissing(fullId);
   }
-  return true;
+  return task;
 }
 
 bool APIPollingPrivate::Status(const std::string& fullId, Json::Value& out) {
-  std::string owner;
-  std::string taskId;
-  if (!FindTask(fullId, owner, taskId)) {
+  const std::unique_ptr<ARDO::Task> task = FindTask(fullId);
+  if (task == nullptr) {
     return false;
   }
-  out = StatusOf(ARDO::Task(owner, taskId));
+  out = StatusOf(*task);
   return true;
 }
 
@@ -186,8 +243,8 @@ bool APIPollingPrivate::Status(const Json::Value& fullIds, Json::Value& out) {
     std::string taskId;
     if (!GetUserAndTaskID(fullId, owner, taskId) || !CheckTaskUser(owner)) {
       WEBAPI_LOG(kPollingSource, "Invalid task id[%s]", LogText(fullId).c_str());
-    } else if (ARDO::TaskUtil::checkTaskExists(owner, taskId)) {
-      status = StatusOf(ARDO::Task(owner, taskId));
+    } else if (const std::unique_ptr<ARDO::Task> task = LoadTask(owner, taskId)) {
+      status = StatusOf(*task);
     }
   }
   out.swap(all);
@@ -196,17 +253,15 @@ bool APIPollingPrivate::Status(const Json::Value& fullIds, Json::Value& out) {
 
 bool APIPollingPrivate::Wait(const std::string& fullId, const std::string& state, int seconds,
                              Json::Value& out) {
-  std::string owner;
-  std::string taskId;
-  if (!FindTask(fullId, owner, taskId)) {
+  const std::unique_ptr<ARDO::Task> task = FindTask(fullId);
+  if (task == nullptr) {
     return false;
   }
   const auto end = std::chrono::steady_clock::now() +
                    std::chrono::seconds(std::clamp(seconds, 0, APIPolling::kLongestWait));
-  ARDO::Task task(owner, taskId);
   std::string seen = state;
   for (;;) {
-    Json::Value status = StatusOf(task);
+    Json::Value status = StatusOf(*task);
     const std::string now = stateOf(status);
     const int left = unitsUntil(end);
     if ((!seen.empty() && now != seen) || left == 0 || JsonHelper::asBool(status["finish"])) {
@@ -215,12 +270,20 @@ bool APIPollingPrivate::Wait(const std::string& fullId, const std::string& state
       return true;
     }
     seen = now;
-    task.waitForChange(left);
-    if (!task.reload()) {
-      WEBAPI_LOG(kPollingSource, "No such task id[%s]", LogText(fullId).c_str());
-      return Fail(POLLING_ERR_NO_SUCH_TASK);
+    task->waitForChange(left);
+    if (!task->reload()) {
+      return FailMissing(fullId);
     }
   }
+}
+
+bool APIPollingPrivate::EndProcess(const ARDO::Task& task, const std::string& fullId) {
+  const int pid = task.getCreatePid();
+  if (pid > 0 && !DoKill(pid, [&] { return task.getCreatePid() == pid; })) {
+    WEBAPI_LOG(kPollingSource, "send SIGTERM to task id[%s] fail", LogText(fullId).c_str());
+    return Fail(POLLING_ERR_NOT_SIGNALLED);
+  }
+  return true;
 }
 
 bool APIPollingPrivate::Stop(const std::string& fullId, bool remove) {
@@ -236,17 +299,20 @@ bool APIPollingPrivate::Stop(const std::string& fullId, bool remove) {
   if (!CheckTaskUser(owner)) {
     return Fail(POLLING_ERR_INVALID_ID);
   }
-  if (!ARDO::TaskUtil::checkTaskExists(owner, taskId)) {
-    WEBAPI_LOG(kPollingSource, "No such task id[%s]", LogText(fullId).c_str());
-    return Fail(POLLING_ERR_NO_SUCH_TASK);
+  const std::unique_ptr<ARDO::Task> task = LoadTask(owner, taskId);
+  if (task == nullptr) {
+    return FailMissing(fullId);
   }
-  ARDO::Task task(owner, taskId);
-  const int pid = task.getCreatePid();
-  if (pid > 0 && !DoKill(pid)) {
-    WEBAPI_LOG(kPollingSource, "send SIGTERM to task id[%s] fail", LogText(fullId).c_str());
-    return Fail(POLLING_ERR_NOT_SIGNALLED);
+  const bool mayRecordItself = task->getCreatePid() == 0 && !task->isFinished();
+  if (!EndProcess(*task, fullId)) {
+    return false;
   }
-  if (!task.finish(remove)) {
+  // A process that records itself now finds the end, and ends; or it did before that was stored,
+  // and is found here.
+  if (mayRecordItself && task->finish(false) && task->reload() && !EndProcess(*task, fullId)) {
+    return false;
+  }
+  if (!task->finish(remove)) {
     WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail", LogText(fullId).c_str());
     return Fail(POLLING_ERR_NOT_STORED);
   }
@@ -283,6 +349,20 @@ bool APIPollingPrivate::List(const std::string& prefix, const Json::Value& group
     out[group] = ConverToFullTaskId(
         owner, ARDO::TaskMgr(owner).getAllTaskId(prefix.empty() ? nullptr : prefix.c_str()));
   }
+  return true;
+}
+
+bool APIPollingPrivate::CountRunning(const std::string& prefix, int& count) {
+  if (!HasRequest()) {
+    return false;
+  }
+  const std::string owner = LoginUser();
+  int running = 0;
+  for (const Json::Value& id : ARDO::TaskMgr(owner).getUnendedTaskId(prefix.c_str())) {
+    ARDO::Task task(owner, JsonHelper::asString(id));
+    running += task.reload() && !task.isFinished() ? 1 : 0;
+  }
+  count = running;
   return true;
 }
 

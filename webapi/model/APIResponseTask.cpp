@@ -1,10 +1,13 @@
 // A response within a background task: each result it is given is the task's at once.
 
+#include "webapi/model/APIResponseTask.h"
+
 #include <unistd.h>
 
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/model/APIResponsePrivate.h"
+#include "webapi/model/Log.h"
 #include "webapi/platform/Task.h"
 
 namespace QELO {
@@ -34,7 +37,16 @@ void APIResponsePrivate::UpdateTask() {
   task_->beginUpdate();
   task_->setProperty("body", store_["body"]);
   task_->setProperty("task_run", true);
-  task_->endUpdate();
+  Json::Value& option = store_["option"];
+  if (task_->endUpdate()) {
+    if (JsonHelper::hasMember(option, kResultRefused)) {
+      option.removeMember(kResultRefused);
+    }
+  } else if (task_->reload()) {  // else it was removed, and nobody wants its results
+    WEBAPI_LOG("APIPolling.cpp", "cannot store a result of task id[%s]",
+               LogText(task_->getTaskId()).c_str());
+    option[kResultRefused] = true;
+  }
 }
 
 }  // namespace QELO

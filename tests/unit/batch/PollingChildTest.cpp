@@ -7,6 +7,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <regex>
 #include <sstream>
 #include <stdexcept>
 
@@ -49,12 +50,18 @@ class PollingChild : public PollingTest {
 
   /// What the background process logs.
   std::string LogOf(APIPolling::Work work) {
+    SyslogCapture::Clear();
     const std::string path = File("log");
     SyslogCapture::Copy() = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
     Run(work);
     close(SyslogCapture::Copy());
     SyslogCapture::Copy() = -1;
-    return Content(path);
+    const std::string log = Content(path);
+    std::istringstream lines(log);
+    for (std::string line; std::getline(lines, line);) {
+      EXPECT_TRUE(std::regex_search(line, std::regex("^(<3>)?APIPolling.cpp:[0-9]+ "))) << line;
+    }
+    return log;
   }
 
   std::string File(const char* name) const {
@@ -120,6 +127,132 @@ TEST_F(PollingChild, EndsBySigtermWhateverTheStarterDoesWithIt) {
   const pid_t pid = JsonHelper::asInt(tasks->Record("alice", "id1")["pid"]);
   kill(pid, SIGTERM);
   EXPECT_EQ(EndOf(pid), SIGTERM);
+}
+
+TEST_F(PollingChild, EndsBySigtermThatTheStarterBlocks) {
+  sigset_t stop;
+  sigemptyset(&stop);
+  sigaddset(&stop, SIGTERM);
+  ASSERT_EQ(sigprocmask(SIG_BLOCK, &stop, nullptr), 0);
+  const bool started = polling->Start(
+      response.get(),
+      [](APIRequest*, APIResponse* own, void*) {
+        own->SetSuccess();
+        sleep(30);
+      },
+      nullptr);
+  ASSERT_EQ(sigprocmask(SIG_UNBLOCK, &stop, nullptr), 0);
+  ASSERT_TRUE(started);
+  const pid_t pid = JsonHelper::asInt(tasks->Record("alice", "id1")["pid"]);
+  kill(pid, SIGTERM);
+  const Stopwatch watch;
+  EXPECT_EQ(EndOf(pid), SIGTERM);
+  EXPECT_LT(watch.Milliseconds(), 5000);
+}
+
+TEST_F(PollingChild, ThatIsStoppedBeforeItIsRecordedDoesNotWork) {
+  Meanwhile("setCreatePid", [] {
+    FakeTask::Get().Change("alice", "id1", false,
+                           [](Json::Value& record) { record["finished"] = true; });
+  });
+  EXPECT_EQ(LogOf(succeed), "");
+  EXPECT_TRUE(Property("alice", "id1", "body").isNull());
+  EXPECT_EQ(tasks->Record("alice", "id1")["finished"], true);
+}
+
+TEST_F(PollingChild, ThatIsStoppedAndRemovedBeforeItIsRecordedDoesNotWork) {
+  RemoveMeanwhile("setCreatePid", "id1");
+  std::string path = File("worked");
+  EXPECT_TRUE(Run([](APIRequest*, APIResponse*,
+                     void* arg) { std::ofstream(*static_cast<std::string*>(arg)) << "worked"; },
+                  &path)
+                  .isNull());
+  EXPECT_FALSE(std::filesystem::exists(path));
+}
+
+TEST_F(PollingChild, ThatIsRemovedBeforeItIsRecordedLogsNothing) {
+  RemoveMeanwhile("setCreatePid", "id1");
+  EXPECT_EQ(LogOf(succeed), "");
+}
+
+TEST_F(PollingChild, ThatIsRemovedWhileItWorksEndsQuietly) {
+  EXPECT_EQ(LogOf([](APIRequest*, APIResponse* answer, void*) {
+              answer->SetSuccess("progress");
+              FakeTask::Get().Put("alice", "id1", Json::Value());
+              answer->SetSuccess("result");
+            }),
+            "");
+  EXPECT_TRUE(tasks->Record("alice", "id1").isNull());
+}
+
+TEST_F(PollingChild, ThatIsRemovedWithoutAResultEndsQuietly) {
+  EXPECT_EQ(LogOf([](APIRequest*, APIResponse*, void*) {
+              FakeTask::Get().Put("alice", "id1", Json::Value());
+            }),
+            "");
+  EXPECT_TRUE(tasks->Record("alice", "id1").isNull());
+}
+
+constexpr size_t kSmall = 1000;
+void progressAndTooLargeResult(APIRequest*, APIResponse* answer, void*) {
+  FakeTask::Get().largestUpdate = kSmall;
+  answer->SetSuccess("progress");
+  answer->SetSuccess(std::string(kSmall, 'x'));
+}
+
+TEST_F(PollingChild, WhoseResultCannotBeStoredAnswers117) {
+  const Json::Value record = Run(progressAndTooLargeResult);
+  EXPECT_EQ(Text(record["properties"]["body"]), R"({"error":{"code":117},"success":false})");
+  EXPECT_EQ(record["finished"], true);
+}
+
+TEST_F(PollingChild, WhoseResultCannotBeStoredIsLogged) {
+  EXPECT_NE(LogOf(progressAndTooLargeResult).find(" cannot store a result of task id[id1]\n"),
+            std::string::npos);
+}
+
+TEST_F(PollingChild, WhoseProgressCannotBeStoredKeepsTheLaterResult) {
+  const Json::Value body = BodyAfter([](APIRequest*, APIResponse* answer, void*) {
+    FakeTask::Get().largestUpdate = kSmall;
+    answer->SetSuccess(std::string(kSmall, 'x'));
+    answer->SetSuccess("result");
+  });
+  EXPECT_EQ(Text(body), R"({"data":"result","success":true})");
+}
+
+TEST_F(PollingChild, WhoseResultsCanAllNotBeStoredEndsTheTask) {
+  const Json::Value record = Run([](APIRequest*, APIResponse* answer, void*) {
+    answer->SetSuccess("progress");
+    FakeTask::Get().endUpdate = false;
+    answer->SetSuccess("result");
+  });
+  EXPECT_EQ(record["properties"]["body"]["data"], "progress");
+  EXPECT_EQ(record["finished"], true);
+}
+
+TEST_F(PollingChild, WithoutThePropertyAutoRemoveKeepsTheRecord) {
+  polling->SetRemoveAttr(true);
+  const Json::Value record = Run([](APIRequest*, APIResponse* answer, void*) {
+    answer->SetSuccess();
+    FakeTask::Get().Change("alice", "id1", false, [](Json::Value& stored) {
+      stored["properties"].removeMember("auto_remove");
+    });
+  });
+  EXPECT_EQ(record["finished"], true);
+}
+
+TEST_F(PollingChild, RunsNoCallbacksThatTheWorkRegisters) {
+  static std::string mark;
+  mark = File("called");
+  Run([](APIRequest*, APIResponse* answer, void*) {
+    const auto callback = [](void*) { std::ofstream(mark) << "called"; };
+    answer->SetCallbackFunc(callback, nullptr);
+    answer->SetCallbackFunc(callback, nullptr);
+    answer->SetSuccess(static_cast<int>(answer->GetCallbackFuncs()->size()));
+  });
+  EXPECT_EQ(Property("alice", "id1", "body")["data"], 1) << "the second is the first once more";
+  EXPECT_FALSE(std::filesystem::exists(mark));
+  EXPECT_TRUE(response->GetCallbackFuncs()->empty()) << "the starter's own list is another";
 }
 
 TEST_F(PollingChild, EachResultReplacesTheOneBefore) {

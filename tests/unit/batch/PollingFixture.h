@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/wait.h>
+#include <syslog.h>
 #include <unistd.h>
 
 #include <chrono>
@@ -37,6 +38,10 @@ class PollingTest : public testing::Test {
       kill(child, SIGKILL);
     }
     while (waitpid(-1, nullptr, 0) > 0) {
+    }
+    for (const SyslogCapture::Message& message : SyslogCapture::Messages()) {
+      EXPECT_EQ(message.text.rfind("APIPolling.cpp:", 0), 0U) << message.text;
+      EXPECT_EQ(message.priority, LOG_ERR) << message.text;
     }
   }
 
@@ -92,6 +97,20 @@ class PollingTest : public testing::Test {
       signal(SIGTERM, SIG_DFL);
       sleep(30);
     });
+  }
+
+  /// Runs a change of the records when an operation of the task manager has been called so often.
+  void Meanwhile(const std::string& operation, const std::function<void()>& change,
+                 int calls = 1) const {
+    tasks->meanwhile = [=, left = calls](const std::string& name) mutable {
+      if (name == operation && --left == 0) {
+        change();
+      }
+    };
+  }
+
+  void RemoveMeanwhile(const std::string& operation, const std::string& taskId) const {
+    Meanwhile(operation, [=, this] { tasks->Put("alice", taskId, Json::Value()); });
   }
 
   /// The signal that ended a child, 0 when it ended by itself.

@@ -87,6 +87,35 @@ TEST_F(PollingList, OfWhoIsNotLoggedInIsNull) {
   EXPECT_TRUE(out["user"].isNull());
 }
 
+TEST_F(PollingList, CountOfRunningLeavesOutEndedForeignAndOtherTasks) {
+  FakeTask::Get().Change("alice", "a1", false, [](Json::Value& task) { task["finished"] = true; });
+  const pid_t gone = Fork([] {});
+  EndOf(gone);
+  Record("alice", "b3", "{}", gone);
+  Record("alice", "b4", "{}", Sleeper());
+  int count = -1;
+  EXPECT_TRUE(polling->CountRunning("b", count));
+  EXPECT_EQ(count, 2) << "b2 has no process yet, b4 has one";
+  EXPECT_TRUE(polling->CountRunning("a", count));
+  EXPECT_EQ(count, 0);
+}
+
+TEST_F(PollingList, CountOfRunningIsNoneAndNoErrorForAUserWithoutTasks) {
+  Login("carol", false);
+  int count = -1;
+  EXPECT_TRUE(polling->CountRunning("", count));
+  EXPECT_EQ(count, 0);
+  EXPECT_TRUE(SyslogCapture::Messages().empty());
+}
+
+TEST_F(PollingList, CountOfRunningWithoutRequestIs502) {
+  polling->SetRequest(nullptr);
+  int count = -1;
+  EXPECT_FALSE(polling->CountRunning("", count));
+  EXPECT_EQ(polling->GetError(), 502);
+  EXPECT_EQ(count, -1);
+}
+
 class PollingFullIds : public PollingTest {
  protected:
   std::string Convert(const std::string& owner, const Json::Value& ids) const {

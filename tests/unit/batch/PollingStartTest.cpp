@@ -1,7 +1,5 @@
 // Starting a task as its caller sees it: checks, the record, the answer.
 
-#include <errno.h>
-
 #include "tests/unit/batch/PollingFixture.h"
 
 namespace QELO {
@@ -89,6 +87,7 @@ TEST_F(PollingStart, OfGroupAdminByAnotherUserIs105) {
   granted.SetRequest(request.get());
   EXPECT_FALSE(granted.Start(response.get(), succeed, nullptr));
   EXPECT_EQ(response->GetError(), 105);
+  EXPECT_EQ(granted.GetError(), 500) << "the response has the reason";
   EXPECT_TRUE(tasks->Ids("@administrators").empty());
 }
 
@@ -97,6 +96,7 @@ TEST_F(PollingStart, OfUnknownGroupIs114) {
   own.SetData("polling_attribute", "share_to_group", "nobody", true);
   EXPECT_FALSE(own.Start(response.get(), succeed, nullptr));
   EXPECT_EQ(response->GetError(), 114);
+  EXPECT_EQ(own.error(), 500);
   EXPECT_TRUE(platform->calls.empty());
 }
 
@@ -144,15 +144,16 @@ TEST_F(PollingStart, ThatCannotRecordFails) {
   EXPECT_FALSE(polling->Start(response.get(), succeed, nullptr));
   EXPECT_EQ(SyslogCapture::Count("Failed to set property."), 1);
   EXPECT_EQ(response->GetError(), 117);
+  EXPECT_EQ(polling->GetError(), 500);
   EXPECT_TRUE(platform->calls.empty()) << "nothing may have been forked";
 }
 
 TEST_F(PollingStart, ThatCannotForkRemovesTheRecord) {
-  platform->forkResult = -1;
-  errno = EAGAIN;
+  platform->forksLeft = 0;
   EXPECT_FALSE(polling->Start(response.get(), succeed, nullptr));
   EXPECT_EQ(response->GetError(), 110);
-  EXPECT_EQ(SyslogCapture::Count("Failed to fork(). "), 1);
+  EXPECT_EQ(polling->GetError(), 500);
+  EXPECT_EQ(SyslogCapture::Count(" Failed to fork(). Resource temporarily unavailable"), 1);
   EXPECT_TRUE(tasks->Ids("alice").empty());
 }
 

@@ -90,6 +90,21 @@ TEST_F(PollingStatus, OfMissingTaskIs508) {
   EXPECT_EQ(SyslogCapture::Count("No such task id[alice/none]"), 1);
 }
 
+TEST_F(PollingStatus, OfATaskThatRemovesItselfMeanwhileIs508) {
+  Record("alice", "1", R"({"success":true})");
+  RemoveMeanwhile("checkTaskExists", "1");
+  EXPECT_EQ(Status("alice/1"), 508);
+  EXPECT_EQ(SyslogCapture::Count("No such task id[alice/1]"), 1);
+  EXPECT_TRUE(out.isNull());
+}
+
+TEST_F(PollingStatus, OfAListMapsATaskThatRemovesItselfMeanwhileToAnEmptyObject) {
+  Record("alice", "1", R"({"success":true})");
+  RemoveMeanwhile("checkTaskExists", "1");
+  ASSERT_EQ(Status(Parse(R"(["alice/1"])")), 0);
+  EXPECT_EQ(Text(out), R"({"alice/1":{}})");
+}
+
 TEST_F(PollingStatus, SplitsAtTheFirstSlash) {
   Record("alice", "a/b", R"({"success":true})");
   EXPECT_EQ(Status("alice/a/b"), 0);

@@ -1,3 +1,6 @@
+#include <climits>
+#include <cstdio>
+
 #include "tests/unit/batch/PollingFixture.h"
 
 namespace QELO {
@@ -127,6 +130,29 @@ TEST_F(PollingWait, OfATaskThatIsRemovedMeanwhileIs508) {
   EXPECT_EQ(Wait("alice/1", "", 20), 508);
   EXPECT_EQ(SyslogCapture::Count("No such task id[alice/1]"), 1);
   EXPECT_TRUE(out.isNull());
+}
+
+TEST_F(PollingWait, OfATaskThatRemovesItselfBeforeItIsReadIs508AtOnce) {
+  Record("alice", "1", kFirst);
+  RemoveMeanwhile("checkTaskExists", "1");
+  const Stopwatch watch;
+  EXPECT_EQ(Wait("alice/1", "", 20), 508);
+  EXPECT_LT(watch.Milliseconds(), 5000);
+  EXPECT_EQ(SyslogCapture::Count("No such task id[alice/1]"), 1);
+}
+
+TEST_F(PollingWait, AboveTheLongestIsCut) {
+  for (const int seconds : {61, 1'000'000, INT_MAX}) {
+    Record("alice", "1", kFirst);
+    tasks->calls.clear();
+    ChangeLater([this] { Record("alice", "1", kSecond); });
+    ASSERT_EQ(Wait("alice/1", "", seconds), 0);
+    ASSERT_FALSE(tasks->calls.empty());
+    int limit = 0;
+    ASSERT_EQ(sscanf(tasks->calls.back().c_str(), "waitForChange(%d)", &limit), 1);
+    EXPECT_LE(limit, 60 * 100) << seconds;
+    EXPECT_GT(limit, 50 * 100) << seconds;
+  }
 }
 
 TEST_F(PollingWait, LeavesTheWaitingToTheTaskManager) {
