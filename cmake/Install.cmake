@@ -9,17 +9,11 @@ set(webapi_package_dir ${CMAKE_INSTALL_LIBDIR}/cmake/webapi)
 # unless they stand where the dynamic loader looks anyway.
 get_property(webapi_programs DIRECTORY programs PROPERTY BUILDSYSTEM_TARGETS)
 if(NOT CMAKE_INSTALL_FULL_LIBDIR IN_LIST CMAKE_PLATFORM_IMPLICIT_LINK_DIRECTORIES)
-  set_target_properties(webapi webapi_platform ${webapi_programs}
+  set_target_properties(webapi ${webapi_programs}
                         PROPERTIES INSTALL_RPATH ${CMAKE_INSTALL_FULL_LIBDIR})
 endif()
 
 install(TARGETS webapi EXPORT webapi-targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
-# The platform is exported as what the library itself needs at link time; its headers are not.
-set_target_properties(webapi_platform PROPERTIES INTERFACE_INCLUDE_DIRECTORIES
-  "$<BUILD_INTERFACE:${PROJECT_SOURCE_DIR}/include;${PROJECT_SOURCE_DIR}>"
-  INTERFACE_COMPILE_DEFINITIONS "$<BUILD_INTERFACE:WEBAPI_ROOT_PREFIX=\"${WEBAPI_ROOT_PREFIX}\">")
-install(TARGETS webapi_platform EXPORT webapi-targets
-        LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} NAMELINK_SKIP)
 install(TARGETS entry.cgi RUNTIME DESTINATION ${CMAKE_INSTALL_LIBEXECDIR}/webapi)
 install(DIRECTORY include/webapi DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}
         FILES_MATCHING PATTERN *.h)

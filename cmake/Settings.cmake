@@ -44,8 +44,8 @@ if(WEBAPI_ROOT_PREFIX)
   set(CMAKE_SKIP_RPATH ON)
 endif()
 function(webapi_shared_library target)
-  # Calls within a library are bound when it is linked, not looked up when it is loaded.
-  target_link_options(${target} PRIVATE -Wl,-Bsymbolic-functions)
+  # Names within a library are bound when it is linked, not looked up when it is loaded.
+  target_link_options(${target} PRIVATE -Wl,-Bsymbolic)
   set_target_properties(${target} PROPERTIES VERSION ${PROJECT_VERSION}
                                              SOVERSION ${PROJECT_VERSION_MAJOR})
   if(WEBAPI_ROOT_PREFIX)

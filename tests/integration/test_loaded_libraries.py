@@ -9,7 +9,6 @@ from conftest import ENTRY
 
 COMMON_ROAD = {
     "libwebapi-ARDO5.so",
-    "libwebapi-platform.so",
     "libjsoncpp.so.25",
     "libstdc++.so.6",
     "libgcc_s.so.1",

@@ -72,13 +72,13 @@ StandardStreams* StandardStreams::innermost_ = nullptr;
 StandardStreams::StandardStreams(bool shutInput, bool shutOutput) : outer_(innermost_) {
   innermost_ = this;
   if (shutInput) {
-    inputBuffer_ = std::cin.rdbuf(&null_);
+    inputBuffer_ = std::cin.rdbuf();
     isShut_ = input_.Replace(STDIN_FILENO);
   }
   if (shutOutput) {
     std::cout.flush();
     std::fflush(stdout);
-    outputBuffer_ = std::cout.rdbuf(&null_);
+    outputBuffer_ = std::cout.rdbuf();
     isShut_ = output_.Replace(STDOUT_FILENO) && isShut_;
   }
 }
@@ -87,8 +87,8 @@ StandardStreams::~StandardStreams() {
   innermost_ = outer_;
   if (outputBuffer_ != nullptr) {
     std::cout.flush();
-    std::fflush(stdout);  // what a method left in the buffer ends in /dev/null
-    std::cout.rdbuf(outputBuffer_);
+    std::fflush(stdout);             // what a method left in the buffers ends in /dev/null
+    std::cout.rdbuf(outputBuffer_);  // a method may have put its own in place; clears errors too
     stdout = revived(stdout, STDOUT_FILENO, "w");
   }
   if (inputBuffer_ != nullptr) {

@@ -26,8 +26,8 @@ class NullDescriptor {
 /// Shuts foreign code off from standard input and output, and gives them back at the end.
 ///
 /// Each stream exists three times, and an API library may use any of them: the C++ stream, the C
-/// stream and the descriptor. All three lead to /dev/null meanwhile. What was written before goes
-/// out before.
+/// stream and the descriptor. The first two end in the third, which is /dev/null meanwhile; what
+/// was written before goes out before.
 class StandardStreams {
  public:
   StandardStreams(bool shutInput, bool shutOutput);
@@ -43,14 +43,6 @@ class StandardStreams {
   static void LetGo();
 
  private:
-  /// Nothing to read, and nothing kept of what is written: what /dev/null is to a stream.
-  class NullBuffer : public std::streambuf {
-   protected:
-    int_type overflow(int_type c) override { return traits_type::not_eof(c); }
-    std::streamsize xsputn(const char*, std::streamsize count) override { return count; }
-  };
-
-  NullBuffer null_;
   NullDescriptor input_;
   NullDescriptor output_;
   std::streambuf* inputBuffer_ = nullptr;
