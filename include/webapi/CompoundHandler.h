@@ -56,6 +56,8 @@ class WEBAPI_API CompoundHandler {
   void Output(_tag_WEBAPI_ERR code);
 
  private:
+  void PrepareEnvironment();
+  void RepairRequest();
   void TakeEntry(const Json::Value& entry);
   int RefuseEntry(int code, const char* message, unsigned index);
   int ForkEntry(unsigned index);

@@ -37,10 +37,19 @@ static void bytes(QELO::APIRequest* request, QELO::APIResponse* response) {
   response->SetSuccess("printed");
 }
 
-/// Prints "text" as it is.
+/// Prints "text" as it is, at once.
 static void bare(QELO::APIRequest* request, QELO::APIResponse* response) {
-  std::fputs(request->GetParam("text").asCString(), stdout);
+  const std::string text = request->GetParam("text").asString();
+  [[maybe_unused]] const ssize_t count = write(STDOUT_FILENO, text.data(), text.size());
   response->SetSuccess("printed");
+}
+
+/// Sends its errors where its output goes, prints "body" and answers a text of "size" bytes.
+static void shared(QELO::APIRequest* request, QELO::APIResponse* response) {
+  dup2(STDOUT_FILENO, STDERR_FILENO);
+  const std::string text = kHead + request->GetParam("body").asString();
+  [[maybe_unused]] const ssize_t count = write(STDERR_FILENO, text.data(), text.size());
+  response->SetSuccess(std::string(request->GetParam("size").asUInt(), 'x'));
 }
 
 /// Prints a head whose end comes in two pieces.
@@ -63,8 +72,12 @@ static void broken(QELO::APIRequest*, QELO::APIResponse*) {
   { "QELO.Test.Download", 1, #method, method }
 
 PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
-  static QELO::_tag_API_TABLE table[] = {DOWNLOAD(print),  DOWNLOAD(bytes),
-                                         DOWNLOAD(bare),   DOWNLOAD(split),
-                                         DOWNLOAD(broken), {nullptr, 0, nullptr, nullptr}};
+  static QELO::_tag_API_TABLE table[] = {DOWNLOAD(print),
+                                         DOWNLOAD(bytes),
+                                         DOWNLOAD(bare),
+                                         DOWNLOAD(split),
+                                         DOWNLOAD(broken),
+                                         DOWNLOAD(shared),
+                                         {nullptr, 0, nullptr, nullptr}};
   return table;
 }

@@ -36,6 +36,17 @@ static void large(QELO::APIRequest* request, QELO::APIResponse* response) {
   response->SetSuccess(std::string(request->GetParam("size").asUInt(), 'x'));
 }
 
+/// Answers that many "levels" of lists, one within the other.
+static void deep(QELO::APIRequest* request, QELO::APIResponse* response) {
+  Json::Value data(Json::arrayValue);
+  for (unsigned level = request->GetParam("levels").asUInt(); level > 1; --level) {
+    Json::Value outer;
+    outer[0].swap(data);
+    data.swap(outer);
+  }
+  response->SetSuccess(data);
+}
+
 /// Takes "ms" milliseconds.
 static void slow(QELO::APIRequest* request, QELO::APIResponse* response) {
   usleep(request->GetParam("ms").asUInt() * 1000);
@@ -45,6 +56,29 @@ static void slow(QELO::APIRequest* request, QELO::APIResponse* response) {
 static void restart(QELO::APIRequest*, QELO::APIResponse* response) {
   response->SetHttpdRestart(true);
   response->SetSuccess();
+}
+
+/// Sets the header "X-Mark".
+static void mark(QELO::APIRequest*, QELO::APIResponse* response) {
+  response->SetHeader("X-Mark", "set");
+  response->SetSuccess();
+}
+
+/// Answers what it finds set in the response.
+static void found(QELO::APIRequest*, QELO::APIResponse* response) {
+  Json::Value data;
+  data["serverError"] = response->GetServerError();
+  data["mark"] = response->GetHeader("X-Mark", "");
+  data["restart"] = response->GetHttpdRestart();
+  response->SetSuccess(data);
+}
+
+/// Answers attributes and the session's state of the request.
+static void forged(QELO::APIRequest* request, QELO::APIResponse* response) {
+  Json::Value data;
+  data["mark"] = request->GetAttr("mark");
+  data["isTimeout"] = request->IsTimeout();
+  response->SetSuccess(data);
 }
 
 static void silent(QELO::APIRequest*, QELO::APIResponse*) {}
@@ -88,6 +122,10 @@ PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
                                          BOTH_VERSIONS(process),
                                          BOTH_VERSIONS(fail),
                                          BOTH_VERSIONS(large),
+                                         BOTH_VERSIONS(deep),
+                                         BOTH_VERSIONS(mark),
+                                         BOTH_VERSIONS(found),
+                                         BOTH_VERSIONS(forged),
                                          BOTH_VERSIONS(slow),
                                          BOTH_VERSIONS(restart),
                                          BOTH_VERSIONS(silent),

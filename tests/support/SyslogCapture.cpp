@@ -53,7 +53,7 @@ void collect(int priority, const char* format, va_list args) {
   vsnprintf(text, sizeof text, format, args);  // NOLINT: "%m" is glibc's here as in syslog
   SyslogCapture::Messages().push_back({priority, text});
   if (SyslogCapture::Copy() >= 0) {
-    const std::string line = std::string(text) + "\n";
+    const std::string line = "<" + std::to_string(priority) + ">" + text + "\n";
     [[maybe_unused]] const ssize_t count = write(SyslogCapture::Copy(), line.data(), line.size());
   }
 }

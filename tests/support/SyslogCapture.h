@@ -22,8 +22,8 @@ struct SyslogCapture {
   static std::string& Identity();
   /// Forgets messages and openings.
   static void Clear();
-  /// Where messages are written as well, a line each, so that those of child processes are seen;
-  /// -1: nowhere.
+  /// Where messages are written as well, a line "<priority>text" each, so that those of child
+  /// processes are seen; -1: nowhere.
   static int& Copy();
   /// How many messages contain this text.
   static int Count(const std::string& part);

@@ -149,7 +149,10 @@ void CompoundHandler::SendAnswer(Pipe& pipe) {
     return;
   }
   WEBAPI_LOG(kSource, "write json failed");
-  // Most likely there was no room for it: say that much.
+  if (pipe.HasWritten()) {
+    return;  // the reader would take a second message for the rest of the first
+  }
+  // There was no room for it, or no reader would take it: say that much.
   entryResponse_->SetError(WEBAPI_ERR_NO_ANSWER);
   PrepareCompundResponse(message["result"], message["info"]);
   pipe.WriteJson(message);
@@ -178,6 +181,9 @@ void CompoundHandler::PrepareCompundResponse(unsigned index) {
 
 void CompoundHandler::PrepareCompundResponse(Json::Value& result, Json::Value& info) {
   result = entryResponse_->GetBody();
+  if (!result.isObject()) {  // a method may change the record in place
+    result = Json::Value(Json::objectValue);
+  }
   const std::string api = entryRequest_->GetAPIClass();
   const int version = entryRequest_->GetAPIVersion();
   const std::string method = entryRequest_->GetAPIMethod();

@@ -72,15 +72,7 @@ int CompoundHandler::PrepareNewCompReqResp() {
     WEBAPI_LOG(kSource, "new APIRequest Fail");
     return WEBAPI_ERR_NO_ANSWER;
   }
-  Json::Value environment = request_->GetEnv("");
-  if (!environment.isObject()) {
-    environment = Json::Value(Json::objectValue);
-  }
-  environment.removeMember("QUERY_STRING");
-  environment["REQUEST_METHOD"] = "POST";
-  // The copy has the outer request's environment, into which this would only be merged.
-  entryRequest_->Serialize()["environ"] = Json::Value(Json::objectValue);
-  entryRequest_->InitEnv(environment);
+  PrepareEnvironment();
   entryRequest_->InitParam(asPostParameters(Json::Value(Json::objectValue)), false);
   entryResponse_.reset(new (std::nothrow) APIResponse(entryRequest_.get()));
   if (entryResponse_ == nullptr) {
@@ -90,8 +82,32 @@ int CompoundHandler::PrepareNewCompReqResp() {
   return WEBAPI_ERR_NONE;
 }
 
+void CompoundHandler::PrepareEnvironment() {
+  Json::Value environment = request_->GetEnv("");
+  if (!environment.isObject()) {
+    environment = Json::Value(Json::objectValue);
+  }
+  environment.removeMember("QUERY_STRING");
+  environment["REQUEST_METHOD"] = "POST";
+  // The copy has the outer request's environment, into which this would only be merged.
+  entryRequest_->Serialize()["environ"] = Json::Value(Json::objectValue);
+  entryRequest_->InitEnv(environment);
+}
+
+/// A method may change the record in place, to what can take no entry.
+void CompoundHandler::RepairRequest() {
+  const Json::Value& record = entryRequest_->Serialize();
+  if (!JsonHelper::member(record, "private").isObject() ||
+      !JsonHelper::member(record, "param").isObject()) {
+    Json::Value fresh = request_->Serialize();
+    entryRequest_->Deserialize(fresh);
+    PrepareEnvironment();
+  }
+}
+
 /// What an entry does not name must not come from the one before it, which would run again.
 void CompoundHandler::TakeEntry(const Json::Value& entry) {
+  RepairRequest();
   Json::Value& call = entryRequest_->Serialize()["private"];
   for (const char* key : {"api", "version", "method"}) {
     call.removeMember(key);
@@ -121,10 +137,9 @@ void CompoundHandler::PreloadLibs(const Json::Value& value, bool top) {
   TakeEntry(value);
   runner_->GetMethod(entryRequest_->GetAPIClass(), entryRequest_->GetAPIVersion(),
                      entryRequest_->GetAPIMethod());
+  runner_->AddAPIInfo(entryRequest_.get());
   void* handle = nullptr;
-  if (runner_->AddAPIInfo(entryRequest_.get())) {
-    runner_->CacheLib(entryRequest_.get(), &handle);
-  }
+  runner_->CacheLib(entryRequest_.get(), &handle);
 }
 
 int CompoundHandler::CompoundProcess() {

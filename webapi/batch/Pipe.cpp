@@ -6,6 +6,7 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
@@ -18,6 +19,7 @@
 namespace QELO {
 namespace {
 
+constexpr char kSource[] = "APIUtilsPrivate.cpp";
 /// More the kernel neither writes nor reads at once.
 constexpr size_t kLargestText = 0x7ffff000;
 
@@ -80,6 +82,16 @@ bool replaceBySockets(const int (&ends)[2], int room) {
   return true;
 }
 
+/// Whether arrays and objects nest within so many levels.
+bool nestsWithin(const Json::Value& value, int levels) {
+  if (!value.isArray() && !value.isObject()) {
+    return true;
+  }
+  return levels > 0 && std::all_of(value.begin(), value.end(), [&](const Json::Value& member) {
+           return nestsWithin(member, levels - 1);
+         });
+}
+
 /// One read of all the text: a pipe holds it, a socket is told to wait for it.
 ssize_t readText(int end, char* text, size_t length) {
   const ssize_t count = TEMP_FAILURE_RETRY(recv(end, text, length, MSG_WAITALL));
@@ -88,7 +100,7 @@ ssize_t readText(int end, char* text, size_t length) {
 
 }  // namespace
 
-Pipe::Pipe() : readEnd_(-1), writeEnd_(-1) {}
+Pipe::Pipe() : readEnd_(-1), writeEnd_(-1), hasWritten_(false) {}
 
 Pipe::~Pipe() {
   Close();
@@ -121,6 +133,7 @@ void Pipe::Take(const int (&ends)[2]) {
   Close();
   readEnd_ = ends[0];
   writeEnd_ = ends[1];
+  hasWritten_ = false;
 }
 
 void Pipe::ReadOnly(int fd) {
@@ -153,12 +166,18 @@ bool Pipe::HasRoomFor(size_t size) {
     return size <= kLargestText;  // not a pipe
   }
   const size_t page = static_cast<size_t>(sysconf(_SC_PAGESIZE));
-  const size_t needed = page + (size + page - 1) / page * page;  // the length has a page of its own
+  // What a text has beyond whole pages goes into the length's page if it can, else into one of its
+  // own.
+  const size_t needed = (sizeof(uint32_t) + size + page - 1) / page * page;
   return static_cast<size_t>(room) >= needed ||
          (needed <= kLargestText && fcntl(writeEnd_, F_SETPIPE_SZ, static_cast<int>(needed)) >= 0);
 }
 
 bool Pipe::WriteJson(const Json::Value& value) {
+  if (!nestsWithin(value, JsonHelper::kMaxDepth)) {
+    WEBAPI_LOG(kSource, "json nests deeper than %d", JsonHelper::kMaxDepth);
+    return false;
+  }
   const std::string text = JsonHelper::toString(value);
   if (!HasRoomFor(text.size())) {
     return false;
@@ -168,11 +187,11 @@ bool Pipe::WriteJson(const Json::Value& value) {
   if (TEMP_FAILURE_RETRY(write(writeEnd_, &length, sizeof length)) != sizeof length) {
     return false;
   }
+  hasWritten_ = true;
   return TEMP_FAILURE_RETRY(write(writeEnd_, text.data(), length)) == static_cast<ssize_t>(length);
 }
 
 bool Pipe::ReadJson(Json::Value& value) {
-  constexpr char kSource[] = "APIUtilsPrivate.cpp";
   uint32_t length = 0;
   if (TEMP_FAILURE_RETRY(read(readEnd_, &length, sizeof length)) != sizeof length) {
     WEBAPI_LOG(kSource, "protocol failed");

@@ -44,10 +44,12 @@ class RunAsRoot {
 
  private:
   bool GiveBack() const {
-    if (getegid() != group_ && !((geteuid() == 0 || becomeUser(0)) && becomeGroup(group_))) {
-      return false;
-    }
-    return geteuid() == user_ || ((geteuid() == 0 || becomeUser(0)) && becomeUser(user_));
+    const bool group =
+        getegid() == group_ || ((geteuid() == 0 || becomeUser(0)) && becomeGroup(group_));
+    // Also without the group: else the caller would go on as root.
+    const bool user =
+        geteuid() == user_ || ((geteuid() == 0 || becomeUser(0)) && becomeUser(user_));
+    return group && user;
   }
 
   uid_t user_;

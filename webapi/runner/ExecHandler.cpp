@@ -1,7 +1,9 @@
 #include "webapi/ExecHandler.h"
 
 #include <errno.h>
+#include <fcntl.h>
 #include <poll.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -63,6 +65,30 @@ void reap(pid_t child, bool isEnding) {
   }
   for (int i = 0; i < kReapTries && waitpid(child, nullptr, WNOHANG) == 0; ++i) {
     usleep(kReapPauseMicroseconds);
+  }
+}
+
+bool isSameFile(int left, int right) {
+  struct stat first {};
+  struct stat second {};
+  return fstat(left, &first) == 0 && fstat(right, &second) == 0 && first.st_dev == second.st_dev &&
+         first.st_ino == second.st_ino;
+}
+
+/// The parent takes the result when it has seen the end of the output, so who still has to write
+/// the result must not hold the output.
+void letGoOfOutput() {
+  const bool isShared = isSameFile(STDOUT_FILENO, STDERR_FILENO);
+  const int null = open("/dev/null", O_WRONLY | O_CLOEXEC);
+  for (const int descriptor : {STDOUT_FILENO, STDERR_FILENO}) {
+    if (descriptor == STDERR_FILENO && !isShared) {
+      continue;
+    }
+    if (null < 0) {
+      close(descriptor);
+    } else {
+      dup2(null, descriptor);
+    }
   }
 }
 
@@ -195,11 +221,14 @@ void ExecHandler::RunChild(Pipe& result) noexcept {
   Run(true);
   std::cout.flush();
   fflush(stdout);
+  letGoOfOutput();
   if (!result.WriteJson(result_)) {
     WEBAPI_LOG(kSource, "write json failed");
-    // Most likely there was no room for it: say that much.
-    Fail(WEBAPI_ERR_NO_ANSWER);
-    result.WriteJson(result_);
+    if (!result.HasWritten()) {
+      // There was no room for it, or no reader would take it: say that much.
+      Fail(WEBAPI_ERR_NO_ANSWER);
+      result.WriteJson(result_);
+    }
   }
   _exit(0);
 }

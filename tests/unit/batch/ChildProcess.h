@@ -1,7 +1,10 @@
 #pragma once
 
+#include <fcntl.h>
 #include <grp.h>
 #include <gtest/gtest.h>
+#include <linux/capability.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -20,6 +23,18 @@ inline bool becomeOrdinary() {
   return geteuid() != 0 ||
          (setgroups(0, nullptr) == 0 && setresgid(kOrdinaryId, kOrdinaryId, kOrdinaryId) == 0 &&
           setresuid(kOrdinaryId, kOrdinaryId, kOrdinaryId) == 0);
+}
+
+/// Takes a capability below 32 from the process for good.
+inline bool dropCapability(unsigned capability) {
+  __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
+  __user_cap_data_struct data[_LINUX_CAPABILITY_U32S_3] = {};
+  if (syscall(SYS_capget, &header, data) != 0) {
+    return false;
+  }
+  data[0].effective &= ~(1u << capability);
+  data[0].permitted &= ~(1u << capability);
+  return syscall(SYS_capset, &header, data) == 0;
 }
 
 /// @return the child's status as waitpid(2) gives it
@@ -48,6 +63,7 @@ inline std::set<int> openDescriptors() {
   for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
     found.insert(atoi(entry.path().filename().c_str()));
   }
+  std::erase_if(found, [](int fd) { return fcntl(fd, F_GETFD) < 0; });  // the listing's own
   return found;
 }
 

@@ -46,8 +46,8 @@ class CompoundTest : public RunnerTest {
 
   static void DescribeEntries() {
     WriteDescription(Listing("entries",
-                             {"echo", "process", "fail", "large", "slow", "restart", "silent",
-                              "later", "refused", "upload", "download"},
+                             {"echo", "process", "fail", "large", "slow", "deep", "mark", "found",
+                              "restart", "silent", "later", "refused", "upload", "download"},
                              R"({"1": {}, "2": {"grantable": true}})"),
                      "QELO.Test.Entries");
   }
@@ -118,10 +118,16 @@ class CompoundTest : public RunnerTest {
     return JsonHelper::asInt(JsonHelper::member(JsonHelper::member(result, "error"), "code"), -1);
   }
 
-  /// How many messages of this and all child processes contain the text.
-  int Logged(const std::string& part) const {
+  /// The messages of this and all child processes, "<priority>text" a line.
+  std::string Log() const {
     std::string text(static_cast<size_t>(lseek(log_, 0, SEEK_END)), '\0');
     EXPECT_EQ(pread(log_, text.data(), text.size(), 0), static_cast<ssize_t>(text.size()));
+    return text;
+  }
+
+  /// How many of them contain the text.
+  int Logged(const std::string& part) const {
+    const std::string text = Log();
     int count = 0;
     for (size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) {
       ++count;

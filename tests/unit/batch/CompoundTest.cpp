@@ -1,6 +1,7 @@
 // The compound request as a whole: its parameters, where entries run, what each shows of itself
 // and how they make the outer answer.
 
+#include <dlfcn.h>
 #include <syslog.h>
 
 #include <algorithm>
@@ -325,6 +326,22 @@ TEST_F(Compound, SequentialRequestLoadsAllLibrariesBeforeItsFirstEntry) {
     EXPECT_EQ(Code(result[1]), 0) << JsonHelper::toString(result);
     EXPECT_FALSE(std::filesystem::exists(directory / "copy.so"));
     std::filesystem::copy_file(std::string(TEST_PLUGIN_DIR) + "/state.so", directory / "copy.so");
+  }
+}
+
+TEST_F(Compound, ParallelRequestLoadsNothingAhead) {
+  const std::string file = directory / "copy.so";
+  std::filesystem::copy_file(std::string(TEST_PLUGIN_DIR) + "/entries.so", file);
+  Json::Value description = Listing("entries", {"echo"}, R"({"1": {}})");
+  description["lib"] = file;
+  WriteDescription(description, "QELO.Test.Entries");
+  for (const char* more : {kParallel, "{}"}) {
+    EXPECT_EQ(Code(RunCompound(List({Entry("echo")}), more)[0]), 0);
+    void* loaded = dlopen(file.c_str(), RTLD_LAZY | RTLD_NOLOAD);
+    EXPECT_EQ(loaded != nullptr, more != kParallel);
+    if (loaded != nullptr) {
+      dlclose(loaded);
+    }
   }
 }
 

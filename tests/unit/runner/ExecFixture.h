@@ -22,8 +22,9 @@ class ExecTest : public RunnerTest {
   void SetUp() override {
     RunnerTest::SetUp();
     WriteLibDef("{}");
-    Describe(kEntries, "entries", {"echo", "process", "fail", "large", "restart", "silent"});
-    Describe(kDownload, "downloads", {"print", "bytes", "bare", "split", "broken"},
+    Describe(kEntries, "entries",
+             {"echo", "process", "fail", "large", "deep", "forged", "restart", "silent"});
+    Describe(kDownload, "downloads", {"print", "bytes", "bare", "split", "broken", "shared"},
              R"({"allowDownload": true})");
     Describe("QELO.Test.Losing", "losing", {"killed", "ended", "hangsUp", "rubbish", "scalar"});
     unsetenv("QELO_WEBAPI_USERNAME");

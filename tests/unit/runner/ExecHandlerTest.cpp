@@ -118,6 +118,15 @@ TEST_F(Exec, EnvironmentOfTheCallCountsAndItIsAPost) {
   EXPECT_EQ(data["hasQuery"], Json::Value(true));
 }
 
+TEST_F(Exec, AttributesAndASessionThatIsNotTimedOutReachTheMethod) {
+  for (const int version : {1, 2}) {
+    const ExecParam param = Call("forged", version).SetAttr(Parse(R"({"mark": [1, "x"]})"));
+    const Json::Value data = APIRunner::Exec(param)["data"];
+    EXPECT_EQ(data["mark"], Parse(R"([1, "x"])"));
+    EXPECT_EQ(data["isTimeout"], Json::Value(false));
+  }
+}
+
 TEST_F(Exec, BrokenRecordDoesNoHarm) {
   ExecParam param = Call("echo");
   param.Serialize()["env"] = "text";
@@ -231,21 +240,43 @@ TEST_F(Exec, FailedForkIs117) {
   }
 }
 
-TEST_F(Exec, WithoutDescriptorsItIs117) {
-  rlimit former{};
-  getrlimit(RLIMIT_NOFILE, &former);
-  for (const int output : {-1, 2}) {
-    const ExecParam param = Call("echo", 1).SetOutputFd(output);
-    ExecHandler handler(param);
-    ASSERT_TRUE(handler.CheckParams());
-    handler.PrepareReq();
-    const rlimit none{3, former.rlim_max};
-    ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &none), 0);
-    output < 0 ? handler.RunFork() : handler.RunForkForStdout();
-    setrlimit(RLIMIT_NOFILE, &former);
+/// Leaves so many descriptors to the process while it lives.
+class FewDescriptors {
+ public:
+  explicit FewDescriptors(unsigned left) {
+    getrlimit(RLIMIT_NOFILE, &former_);
+    rlimit few = former_;
+    for (few.rlim_cur = 0; left > 0; ++few.rlim_cur) {
+      left -= fcntl(static_cast<int>(few.rlim_cur), F_GETFD) < 0 ? 1 : 0;
+    }
+    setrlimit(RLIMIT_NOFILE, &few);
   }
-  EXPECT_EQ(SyslogCapture::Count("fork failed"), 2);
+  FewDescriptors(const FewDescriptors&) = delete;
+  FewDescriptors& operator=(const FewDescriptors&) = delete;
+  ~FewDescriptors() { setrlimit(RLIMIT_NOFILE, &former_); }
+
+ private:
+  rlimit former_{};
+};
+
+TEST_F(Exec, WithoutDescriptorsItIs117) {
+  // One is the working directory's, as long as the call lasts, and one more serves to read files.
+  for (const auto& [output, left] : {std::pair(-1, 2u), {2, 2u}, {2, 4u}}) {
+    SyslogCapture::Clear();
+    const ExecParam param = Call("echo", 1).SetOutputFd(output);
+    Json::Value result;
+    {
+      const FewDescriptors few(left);
+      result = APIRunner::Exec(param);
+    }
+    EXPECT_EQ(result, Failure(117)) << output << " " << left;
+    EXPECT_EQ(SyslogCapture::Count("ExecHandler.cpp:"), 1);
+    EXPECT_EQ(SyslogCapture::Count("fork failed"), 1);
+    EXPECT_EQ(std::filesystem::current_path(), directory);
+  }
   EXPECT_EQ(Forks(), 0);
+  const FewDescriptors enough(12);
+  EXPECT_TRUE(APIRunner::Exec(Call("echo", 1).SetOutputFd(2))["success"].asBool());
 }
 
 TEST_F(Exec, LostChildIs117) {

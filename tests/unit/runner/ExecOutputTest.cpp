@@ -75,6 +75,51 @@ TEST_F(ExecOutput, HeadWhoseEndIsSplitDropsAll) {
   EXPECT_EQ(result["data"], Json::Value("printed"));
 }
 
+TEST_F(ExecOutput, HeadLongerThanAReadEndsInALaterOne) {
+  Json::Value params;
+  params["text"] = "X-Long: " + std::string(4990, 'h') + "\r\n\r\nbody";
+  EXPECT_EQ(Printed("bare", params), "body");
+  params["text"] = "X-Long: " + std::string(10000, 'h') + "\r\n\r\n" + std::string(9000, 'b');
+  EXPECT_EQ(Printed("bare", params), std::string(9000, 'b'));
+}
+
+TEST_F(ExecOutput, HeadWhoseEndStraddlesTheEndOfAReadDropsAll) {
+  // A read takes 4095 bytes.
+  for (const size_t length : {4092u, 4093u, 4094u}) {
+    Json::Value params;
+    params["text"] = std::string(length, 'h') + "\r\n\r\nbody";
+    EXPECT_EQ(Printed("bare", params), "") << length;
+    EXPECT_EQ(result["data"], Json::Value("printed"));
+  }
+  for (const size_t length : {4091u, 4095u}) {
+    Json::Value params;
+    params["text"] = std::string(length, 'h') + "\r\n\r\nbody";
+    EXPECT_EQ(Printed("bare", params), "body") << length;
+  }
+}
+
+TEST_F(ExecOutput, HeadWhoseEndIsSplitEndsAtTheNextEmptyLineOfTheBody) {
+  Json::Value params;
+  params["text"] = std::string(4093, 'h') + "\r\n\r\nfirst\r\n\r\nsecond\r\n\r\nthird";
+  EXPECT_EQ(Printed("bare", params), "second\r\n\r\nthird");
+}
+
+TEST_F(ExecOutput, DescriptorMayBeZero) {
+  const int former = fcntl(STDIN_FILENO, F_DUPFD_CLOEXEC, 3);
+  const int file = memfd_create("zero", MFD_CLOEXEC);
+  ASSERT_EQ(dup2(file, STDIN_FILENO), STDIN_FILENO);
+  ExecParam print = Call("print", 1, R"({"body": "at zero"})", kDownload);
+  EXPECT_EQ(APIRunner::Exec(print.SetOutputFd(0))["data"], Json::Value("printed"));
+  EXPECT_NE(APIRunner::Exec(Call("process", 2).SetOutputFd(0))["data"]["pid"].asInt(), getpid());
+  EXPECT_EQ(Forks(), 2);
+  dup2(former, STDIN_FILENO);
+  close(former);
+  char text[64] = {};
+  EXPECT_EQ(pread(file, text, sizeof text, 0), 7);
+  EXPECT_EQ(std::string(text), "at zero");
+  close(file);
+}
+
 TEST_F(ExecOutput, MethodThatMayNotDownloadPrintsNothing) {
   Describe(kDownload, "downloads", {"print"});
   Json::Value params;

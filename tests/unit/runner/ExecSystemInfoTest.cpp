@@ -8,6 +8,7 @@
 
 #include "tests/support/FakePlatform.h"
 #include "tests/support/SyslogCapture.h"
+#include "tests/unit/batch/ChildProcess.h"
 #include "webapi/APIUtils.h"
 
 namespace QELO {
@@ -104,6 +105,19 @@ TEST_F(QeloInfo, FailureToGiveBackIsLoggedAsCritical) {
       return setresgid(5, 5, 5) == 0 && setresuid(5, 5, 5) == 0 ? 0 : -1;
     };
     return Set() && SyslogCapture::Messages().size() == 1 &&
+           SyslogCapture::Messages()[0].priority == (LOG_AUTH | LOG_CRIT) &&
+           SyslogCapture::Count("APIUtils.cpp:") == 1 &&
+           SyslogCapture::Count(" ERROR: ~IF_RUN_AS(4242, 4343)") == 1;
+  });
+}
+
+TEST_F(QeloInfo, GivesTheUserBackAlsoWhenTheGroupIsNotToBeHad) {
+  RunAs(kUser, kGroup, true, [this] {
+    platform->setKeyValue = [](const std::string&, const std::string&) {
+      // Root stays within reach, the group does not.
+      return setresgid(0, 0, 0) == 0 && dropCapability(CAP_SETGID) ? 0 : -1;
+    };
+    return Set() && geteuid() == kUser && getegid() == 0 && SyslogCapture::Messages().size() == 1 &&
            SyslogCapture::Messages()[0].priority == (LOG_AUTH | LOG_CRIT) &&
            SyslogCapture::Count("APIUtils.cpp:") == 1 &&
            SyslogCapture::Count(" ERROR: ~IF_RUN_AS(4242, 4343)") == 1;

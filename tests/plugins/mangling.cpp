@@ -1,0 +1,42 @@
+// The characteristics of this library are: its methods put the parameter "value" where a record has
+// something of another type.
+
+#include "PluginTable.h"
+
+static void body(QELO::APIRequest* request, QELO::APIResponse* response) {
+  response->SetSuccess();
+  response->Serialize()["body"] = request->GetParam("value");
+}
+
+static void response(QELO::APIRequest* request, QELO::APIResponse* response) {
+  response->SetSuccess();
+  response->Serialize() = request->GetParam("value");
+}
+
+static void call(QELO::APIRequest* request, QELO::APIResponse* response) {
+  request->Serialize()["private"] = request->GetParam("value");
+  response->SetSuccess();
+}
+
+static void params(QELO::APIRequest* request, QELO::APIResponse* response) {
+  request->Serialize()["param"] = request->GetParam("value");
+  response->SetSuccess();
+}
+
+static void request(QELO::APIRequest* request, QELO::APIResponse* response) {
+  const Json::Value value = request->GetParam("value");
+  request->Serialize() = value;
+  response->SetSuccess();
+}
+
+#define BOTH_VERSIONS(method)                   \
+  {"QELO.Test.Mangling", 1, #method, method}, { \
+    "QELO.Test.Mangling", 2, #method, method    \
+  }
+
+PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
+  static QELO::_tag_API_TABLE table[] = {BOTH_VERSIONS(body),    BOTH_VERSIONS(response),
+                                         BOTH_VERSIONS(call),    BOTH_VERSIONS(params),
+                                         BOTH_VERSIONS(request), {nullptr, 0, nullptr, nullptr}};
+  return table;
+}
