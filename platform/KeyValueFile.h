@@ -16,6 +16,7 @@ class KeyValueFile {
   /// Larger files, in bytes, are taken for empty, as are files that cannot be read.
   static constexpr size_t kMaxSize = 1 << 20;
 
+  KeyValueFile() = default;
   explicit KeyValueFile(const char* path);
 
   /// @return false, and `value` unchanged, when the key is not there

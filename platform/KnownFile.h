@@ -7,7 +7,7 @@
 namespace QELO::Platform {
 
 /// What a file holds, kept by the process until the file changes: one request asks a dozen times.
-/// @tparam Content  made from the path; a file that cannot be read is a Content too
+/// @tparam Content  made from the path; by default what a missing file holds
 template <typename Content>
 class KnownFile {
  public:
@@ -16,14 +16,15 @@ class KnownFile {
 
   std::shared_ptr<const Content> Get() {
     struct stat now {};
-    if (stat(path_, &now) != 0) {
+    const bool there = stat(path_, &now) == 0;
+    if (!there) {
       now = {};
     }
     // A file that is replaced has another inode, one that is written another time or size.
     if (content_ == nullptr || now.st_ino != known_.st_ino || now.st_dev != known_.st_dev ||
         now.st_size != known_.st_size || now.st_mtim.tv_sec != known_.st_mtim.tv_sec ||
         now.st_mtim.tv_nsec != known_.st_mtim.tv_nsec) {
-      content_ = std::make_shared<const Content>(path_);
+      content_ = there ? std::make_shared<const Content>(path_) : std::make_shared<const Content>();
       known_ = now;
     }
     return content_;

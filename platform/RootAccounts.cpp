@@ -22,6 +22,7 @@ struct Group {
 };
 
 struct AccountFile {
+  AccountFile() = default;
   explicit AccountFile(const char* path) {
     readable = readDatabaseFile<passwd>(path, fgetpwent_r, [this](const passwd& entry) {
       entries.push_back({entry.pw_name, entry.pw_uid, entry.pw_gid, entry.pw_dir, entry.pw_shell});
@@ -34,6 +35,7 @@ struct AccountFile {
 };
 
 struct GroupFile {
+  GroupFile() = default;
   explicit GroupFile(const char* path) {
     readable = readDatabaseFile<group>(path, fgetgrent_r, [this](const group& entry) {
       Group& added = entries.emplace_back(Group{entry.gr_name, entry.gr_gid, {}});

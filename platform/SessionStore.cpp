@@ -73,7 +73,7 @@ bool writeRecord(int dir, const std::string& id, const std::string& text) {
 
 }  // namespace
 
-long Session::SecondsLeft(int timeout) const {
+long secondsLeft(const timespec& lastUse, int timeout) {
   const long idle = time(nullptr) - lastUse.tv_sec;
   return timeout - std::max(idle, 0L);
 }
@@ -111,6 +111,19 @@ SessionStore::Result SessionStore::Read(const std::string& id, Session& session)
   found.file = std::move(file);
   found.lastUse = info.st_mtim;
   session = std::move(found);
+  return Result::kGood;
+}
+
+SessionStore::Result SessionStore::ReadLastUse(const std::string& id, timespec& lastUse) const {
+  if (!isSecretText(id)) {
+    return Result::kMalformed;
+  }
+  struct stat info {};
+  if (!dir_ || fstatat(dir_.Get(), id.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0 ||
+      !S_ISREG(info.st_mode)) {
+    return Result::kAbsent;
+  }
+  lastUse = info.st_mtim;
   return Result::kGood;
 }
 

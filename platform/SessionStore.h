@@ -8,6 +8,9 @@
 
 namespace QELO::Platform {
 
+/// Seconds until the idle time-out; negative when past it.
+long secondsLeft(const timespec& lastUse, int timeout);
+
 /// A login session, as read from its file.
 struct Session {
   std::string user;
@@ -21,7 +24,7 @@ struct Session {
   timespec lastUse{};
 
   /// Seconds until the idle time-out; negative when past it.
-  long SecondsLeft(int timeout) const;
+  long SecondsLeft(int timeout) const { return secondsLeft(lastUse, timeout); }
   /// Counts now as the last use. @return false when that cannot be written
   bool Refresh();
 };
@@ -41,6 +44,8 @@ class SessionStore {
   explicit SessionStore(bool create = false);
 
   Result Read(const std::string& id, Session& session) const;
+  /// When the session was last used; all else of it is not looked at.
+  Result ReadLastUse(const std::string& id, timespec& lastUse) const;
   /// @param id, token  receive the new secrets
   bool Create(const Session& session, std::string& id, std::string& token) const;
   bool Remove(const std::string& id) const;

@@ -53,11 +53,11 @@ int QeloSessionRefresh(const char* id) {
 }
 
 long QeloSessionSecondsLeft(const char* id) {
-  Session session;
-  if (SessionStore().Read(id, session) != SessionStore::Result::kGood) {
+  timespec lastUse{};
+  if (SessionStore().ReadLastUse(id, lastUse) != SessionStore::Result::kGood) {
     return -1;
   }
-  return session.SecondsLeft(Settings().SessionTimeout());
+  return secondsLeft(lastUse, Settings().SessionTimeout());
 }
 
 }  // extern "C"

@@ -130,7 +130,8 @@ class WEBAPI_API APIRunner {
   /// GetMethod(), or the defaults where a description gives the method no object.
   const Json::Value& GetAttributes(const std::string& api, int version, const std::string& method);
   void* FindFunction(void* handle, const char* name);
-  void AddDescriptions(Json::Value& catalogue, const Json::Value& file) const;
+  /// @param file  is taken apart
+  void AddDescriptions(Json::Value& catalogue, Json::Value& file) const;
 
   Json::Value libDef;
   Json::Value catalogue;

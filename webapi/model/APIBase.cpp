@@ -108,12 +108,16 @@ const Json::Value& APIBase::GetData(const std::string& section,
 }
 
 bool APIBase::InitField(const std::string& section) {
-  if (section.empty() || !(store_.isObject() || store_.isNull()) ||
-      JsonHelper::hasMember(store_, section)) {
+  if (section.empty() || !(store_.isObject() || store_.isNull())) {
     return false;
   }
-  store_[section] = Json::Value(Json::objectValue);
-  return true;
+  const Json::ArrayIndex former = store_.size();
+  Json::Value& field = store_[section];
+  const bool isNew = store_.size() != former;
+  if (isNew) {
+    field = Json::Value(Json::objectValue);
+  }
+  return isNew;
 }
 
 }  // namespace QELO

@@ -73,7 +73,7 @@ Json::Value& APIRunner::ApplyLibDef(Json::Value& description) const {
   return description;
 }
 
-void APIRunner::AddDescriptions(Json::Value& target, const Json::Value& file) const {
+void APIRunner::AddDescriptions(Json::Value& target, Json::Value& file) const {
   if (!file.isObject()) {
     return;
   }
@@ -82,9 +82,8 @@ void APIRunner::AddDescriptions(Json::Value& target, const Json::Value& file) co
       WEBAPI_LOG("APIRunner.cpp", "WebAPI description %s is not valid.", it.name().c_str());
       continue;
     }
-    Json::Value description = *it;
-    ApplyLibDef(description);
-    target[it.name()] = std::move(description);
+    ApplyLibDef(*it);
+    target[it.name()].swap(*it);
   }
 }
 
