@@ -26,9 +26,12 @@ Json::Value listTasks(const std::string& owner, const char* prefix, bool unended
       stores->List({store, owner, prefix != nullptr ? prefix : "", unended}, tasks);
     }
   }
-  std::stable_sort(tasks.begin(), tasks.end(), [](const ListedTask& left, const ListedTask& right) {
+  const auto isOlder = [](const ListedTask& left, const ListedTask& right) {
     return left.created < right.created;
-  });
+  };
+  if (!std::is_sorted(tasks.begin(), tasks.end(), isOlder)) {  // one store's are
+    std::stable_sort(tasks.begin(), tasks.end(), isOlder);
+  }
   for (const ListedTask& task : tasks) {
     ids.append(task.id);
   }

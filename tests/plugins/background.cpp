@@ -1,6 +1,7 @@
 // A well-behaved library whose method goes on in the background, as its parameters ask. One
 // function serves several methods, which their description gives different credentials.
 
+#include <signal.h>
 #include <unistd.h>
 #include <webapi/APIPolling.h>
 #include <webapi/JsonHelper.h>
@@ -41,6 +42,9 @@ static void start(APIRequest* request, APIResponse* response) {
     return;
   }
   polling.Start(response, work, nullptr);
+  if (asBool(request->GetParam("die"))) {
+    kill(getpid(), SIGKILL);
+  }
 }
 
 static QELO::_tag_API_TABLE table[] = {{"QELO.Test.Background", 1, "start", start},

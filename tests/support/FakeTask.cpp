@@ -60,6 +60,12 @@ std::string fileOf(const std::string& directory, const std::string& owner,
   return directory + "/" + QELO::WebAPIUtil::URLEncode(owner + "/" + taskId);
 }
 
+/// What is left of a record that was removed: an update does not make it again.
+std::string removedFileOf(const std::string& directory, const std::string& owner,
+                          const std::string& taskId) {
+  return directory + "/removed/" + QELO::WebAPIUtil::URLEncode(owner + "/" + taskId);
+}
+
 /// Alive, and not merely waiting to be collected by its parent.
 bool isAlive(int pid) {
   std::ifstream stat("/proc/" + std::to_string(pid) + "/stat");
@@ -92,7 +98,7 @@ FakeTask& FakeTask::Reset() {
   FakeTask& fake = Get();
   fake = FakeTask();
   fake.directory = all.path + "/" + std::to_string(++count);
-  std::filesystem::create_directory(fake.directory);
+  std::filesystem::create_directories(fake.directory + "/removed");
   return fake;
 }
 
@@ -107,7 +113,7 @@ void FakeTask::Put(const std::string& owner, const std::string& taskId,
   const std::string file = fileOf(directory, owner, taskId);
   const Lock lock(directory);
   if (record.isNull()) {
-    unlink(file.c_str());
+    rename(file.c_str(), removedFileOf(directory, owner, taskId).c_str());
   } else {
     QELO::JsonHelper::toFile(file, record);
   }
@@ -179,7 +185,9 @@ bool Task::endUpdate() {
   if (!FakeTask::Get().endUpdate || text.size() > FakeTask::Get().largestUpdate) {
     return false;
   }
-  const bool isNew = private_->record.isNull();  // one that was removed is not made again
+  const bool isNew =
+      access(removedFileOf(FakeTask::Get().directory, private_->owner, private_->id).c_str(),
+             F_OK) != 0;
   const bool stored =
       FakeTask::Get().Change(private_->owner, private_->id, isNew, [&](Json::Value& record) {
         for (const std::string& name : private_->pending.getMemberNames()) {
