@@ -5,10 +5,11 @@ import os
 import shutil
 import subprocess
 import time
+from urllib.parse import urlencode
 
 import pytest
 
-from conftest import ROOT, needs_root
+from conftest import BUILD, ROOT, answer_of, needs_root, run_entry
 from tasks import TASK, User, started  # noqa: F401  (a fixture)
 
 API = "QELO.Work.Checksum"
@@ -221,3 +222,26 @@ def test_Checksum_FiveAtOnce_IsRefused(alice, home):
     again = alice.call(API, "start", path=home)
     assert again.code == 0
     alice.started.append((alice, again.data["task_id"]))
+
+
+def test_Checksum_OfAUserWithoutTasks_LogsNoErrorOfTasks(alice, home, tmp_path):
+    assert alice.call(TASK, "list", prefix="checksum_").data["user"] == []
+    log = tmp_path / "log"
+    environment = {
+        "LD_PRELOAD": str(BUILD / "tests" / "integration" / "log_file.so"),
+        "ASAN_OPTIONS": "verify_asan_link_order=0",
+        "LOG_FILE": str(log),
+    }
+
+    def entry(**parameters):
+        query = urlencode({"version": 1, "_sid": alice.sid, **parameters})
+        return answer_of(run_entry(query, **environment))
+
+    answer = entry(api=API, method="start", path=str(home))
+    assert answer["success"], answer
+    full_id = answer["data"]["task_id"]
+    alice.started.append((alice, full_id))
+    alice.wait_for_end(full_id)
+    assert not log.exists() or "APIPolling.cpp:" not in log.read_text()
+    assert not entry(api=TASK, method="status", task_id="alice")["success"]
+    assert "APIPolling.cpp:" in log.read_text(), "what is logged is seen"
