@@ -16,7 +16,7 @@ ALLOWED = {
     "webapi/json": {PUBLIC},
     "webapi/platform": {PUBLIC},
     "webapi/model": {PUBLIC, "webapi/platform"},
-    "webapi/runner": {PUBLIC, "webapi/platform", "webapi/model"},
+    "webapi/runner": {PUBLIC, "webapi/json", "webapi/platform", "webapi/model"},
     "webapi/batch": {PUBLIC, "webapi/platform", "webapi/model", "webapi/runner"},
     "webapi/transfer": {PUBLIC, "webapi/platform", "webapi/model", "webapi/runner"},
     "webapi/entry": {PUBLIC, "webapi/platform", "webapi/model", "webapi/runner", "webapi/batch",

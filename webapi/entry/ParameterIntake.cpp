@@ -12,9 +12,8 @@
 #include "webapi/WebAPIError.h"
 #include "webapi/WebEntry.h"
 #include "webapi/entry/RequestBody.h"
+#include "webapi/model/CipherEnvelope.h"
 #include "webapi/platform/Cgi.h"
-#include "webapi/platform/Credential.h"
-#include "webapi/platform/Token.h"
 #include "webapi/platform/WebAPIUtil.h"
 
 namespace QELO {
@@ -23,11 +22,7 @@ namespace {
 constexpr char kQueryString[] = "QUERY_STRING";
 constexpr char kUploadContentType[] = "text/plain; charset=\"UTF-8\"";
 constexpr char kEnvelope[] = "webapi";
-constexpr char kCipherText[] = "__cIpHeRtExT";
 constexpr char kCipherToken[] = "__cIpHeRtOkEn";
-constexpr char kAesToken[] = "__nEkOtReHpIc";
-constexpr char kAesText[] = "__tXeTrEhPiC";
-constexpr int kAesKeySize = 33;      ///< bytes of the key's text with its NUL
 constexpr int kExceptionLine = 275;  ///< administrators' log filters know the message by this line
 
 /// The member `name` of the parameters, an object from now on.
@@ -45,18 +40,6 @@ Json::Value& sectionOf(Json::Value& params, const char* name) {
 bool namesCall(const Json::Value& section) {
   return JsonHelper::hasMember(section, "api") && JsonHelper::hasMember(section, "version") &&
          JsonHelper::hasMember(section, "method");
-}
-
-/// Removes the member from an object that has it and gives its text.
-std::string takeText(Json::Value& section, const char* name) {
-  Json::Value value;
-  section.removeMember(name, &value);
-  return JsonHelper::asString(value);
-}
-
-/// Adds a parameter line's names and values to the section.
-bool parseLine(const std::string& line, Json::Value& section) {
-  return WebAPIUtil::strPairToJsonObj(line, section, true, true);
 }
 
 }  // namespace
@@ -113,44 +96,28 @@ bool WebEntry::InitPostParam(Json::Value& section) {
 bool WebEntry::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {
   std::string copy = line;
   // Deciphered in place: the text ends at its first NUL, before and after.
-  if (QeloCgiDetectAndDecryptParamLine(copy.data()) == 0 || !parseLine(copy.c_str(), section)) {
+  if (QeloCgiDetectAndDecryptParamLine(copy.data()) == 0 ||
+      !CipherEnvelope::addLine(copy.c_str(), section)) {
     return false;
   }
   if (!section.empty() && !DecryptAESParam(section)) {
     return false;
   }
-  if (!JsonHelper::hasMember(JsonHelper::member(section, kEnvelope), kCipherText)) {
+  if (!JsonHelper::hasMember(JsonHelper::member(section, kEnvelope), CipherEnvelope::kCipherText)) {
     return true;
   }
-  const std::string cipher = takeText(section[kEnvelope], kCipherText);
+  const std::string cipher = CipherEnvelope::take(section[kEnvelope], CipherEnvelope::kCipherText);
   DecryptParam(cipher, section[kEnvelope]);  // one that cannot be deciphered is left out
   section[kEnvelope].removeMember(kCipherToken);
   return true;
 }
 
 bool WebEntry::DecryptParam(const std::string& text, Json::Value& section) {
-  std::string copy = text;
-  if (QeloCgiDecryptParam(copy.data()) == 0 || !parseLine(copy.c_str(), section)) {
-    return false;
-  }
-  return section.empty() || DecryptAESParam(section);
+  return CipherEnvelope::openText(text, section) && (section.empty() || DecryptAESParam(section));
 }
 
 bool WebEntry::DecryptAESParam(Json::Value& section) {
-  if (!JsonHelper::hasMember(section, kAesToken) || !JsonHelper::hasMember(section, kAesText)) {
-    return true;
-  }
-  const std::string token = takeText(section, kAesToken);
-  const std::string text = takeText(section, kAesText);
-  if (token.empty() || text.empty()) {
-    return false;
-  }
-  char key[kAesKeySize] = {};
-  if (QELOCloudServiceZttokenGenerateToken(token.c_str(), key, kAesKeySize) < 0) {
-    return false;
-  }
-  std::string plain;
-  return CredRequestUtil::GetDecryptAESString(key, text, plain) && parseLine(plain, section);
+  return CipherEnvelope::openAes(section);
 }
 
 }  // namespace QELO

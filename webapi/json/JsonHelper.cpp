@@ -11,6 +11,7 @@
 #include <limits>
 #include <utility>
 
+#include "webapi/json/FileText.h"
 #include "webapi/json/JsonReader.h"
 
 namespace QELO::JsonHelper {
@@ -49,18 +50,6 @@ bool readAll(const std::string& path, std::string& text) {
   }
   close(fd);
   return good;
-}
-
-bool writeAll(int fd, const std::string& text) {
-  size_t done = 0;
-  while (done < text.size()) {
-    const ssize_t count = TEMP_FAILURE_RETRY(write(fd, text.data() + done, text.size() - done));
-    if (count <= 0) {
-      return false;
-    }
-    done += static_cast<size_t>(count);
-  }
-  return true;
 }
 
 /// The number that the whole text is, or nothing.
@@ -110,20 +99,7 @@ bool fromFile(const std::string& path, Json::Value& value) {
 }
 
 bool toFile(const std::string& path, const Json::Value& value) {
-  struct stat old {};
-  const std::string text = toString(value);
-  const mode_t mode = stat(path.c_str(), &old) == 0 ? old.st_mode & 07777 : 0600;
-  std::string temporary = path + ".XXXXXX";
-  const int fd = mkostemp(temporary.data(), O_CLOEXEC);
-  if (fd < 0) {
-    return false;
-  }
-  const bool written = writeAll(fd, text) && fchmod(fd, mode) == 0;
-  if (close(fd) != 0 || !written || rename(temporary.c_str(), path.c_str()) != 0) {
-    unlink(temporary.c_str());
-    return false;
-  }
-  return true;
+  return replaceText(path, toString(value), false);
 }
 
 const Json::Value* find(const Json::Value& value, std::string_view key) {

@@ -1,16 +1,11 @@
 #include "webapi/runner/UsageCounter.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <cstdio>
 #include <ctime>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/json/FileText.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
 
@@ -42,46 +37,6 @@ void countIn(Json::Value& counters, const std::string& name) {
   counter["ctime"] = Json::Int64(time(nullptr));
 }
 
-/// A new file of this name. One that a killed process left is removed; nothing is followed.
-int createFresh(const std::string& path) {
-  const int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  const int fd = open(path.c_str(), flags, 0600);
-  if (fd >= 0 || errno != EEXIST || unlink(path.c_str()) != 0) {
-    return fd;
-  }
-  return open(path.c_str(), flags, 0600);
-}
-
-bool writeAll(int fd, const std::string& text) {
-  size_t done = 0;
-  while (done < text.size()) {
-    const ssize_t count = TEMP_FAILURE_RETRY(write(fd, text.data() + done, text.size() - done));
-    if (count <= 0) {
-      return false;
-    }
-    done += static_cast<size_t>(count);
-  }
-  return true;
-}
-
-/// Replaces a file's text in one step. The caller holds the file's lock, so that one name serves
-/// every process for the new text and a killed one leaves no more than that.
-bool replaceText(const std::string& path, const std::string& text) {
-  struct stat old {};
-  const mode_t mode = stat(path.c_str(), &old) == 0 ? old.st_mode & 07777 : 0600;
-  const std::string fresh = path + ".new";
-  const int fd = createFresh(fresh);
-  if (fd < 0) {
-    return false;
-  }
-  const bool written = writeAll(fd, text) && fchmod(fd, mode) == 0;
-  if (close(fd) != 0 || !written || rename(fresh.c_str(), path.c_str()) != 0) {
-    unlink(fresh.c_str());
-    return false;
-  }
-  return true;
-}
-
 }  // namespace
 
 bool UsageCounter::PrepareDirectory() {
@@ -110,7 +65,7 @@ bool UsageCounter::Increase(const std::string& api, const std::string& method, i
     counters = Json::Value(Json::objectValue);
   }
   countIn(counters, api + "_" + std::to_string(version) + "_" + method);
-  const bool written = replaceText(path, JsonHelper::toString(counters));
+  const bool written = JsonHelper::replaceText(path, JsonHelper::toString(counters), true);
   QLIBCFileUnlockByFile(lock);
   return written;
 }
