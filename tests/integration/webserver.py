@@ -30,9 +30,12 @@ class WebServer:
         self.configuration.write_text(text + extra)
         self.process = None
 
-    def start(self):
+    def start(self, *wrapper, **identity):
+        """Runs it by a wrapping command, as another user; both optional, as Popen has them."""
         self.process = subprocess.Popen(
-            ["/usr/sbin/lighttpd", "-D", "-f", self.configuration], stdin=subprocess.DEVNULL
+            [*wrapper, "/usr/sbin/lighttpd", "-D", "-f", self.configuration],
+            stdin=subprocess.DEVNULL,
+            **identity,
         )
         deadline = time.monotonic() + 10
         while time.monotonic() < deadline:

@@ -73,6 +73,15 @@ static void found(QELO::APIRequest*, QELO::APIResponse* response) {
   response->SetSuccess(data);
 }
 
+/// Answers how many descriptors its process has open.
+static void descriptors(QELO::APIRequest*, QELO::APIResponse* response) {
+  int count = 0;
+  for (int fd = 0; fd < 4096; ++fd) {
+    count += fcntl(fd, F_GETFD) >= 0 ? 1 : 0;
+  }
+  response->SetSuccess(count);
+}
+
 /// Answers attributes and the session's state of the request.
 static void forged(QELO::APIRequest* request, QELO::APIResponse* response) {
   Json::Value data;
@@ -126,6 +135,7 @@ PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
                                          BOTH_VERSIONS(mark),
                                          BOTH_VERSIONS(found),
                                          BOTH_VERSIONS(forged),
+                                         BOTH_VERSIONS(descriptors),
                                          BOTH_VERSIONS(slow),
                                          BOTH_VERSIONS(restart),
                                          BOTH_VERSIONS(silent),
