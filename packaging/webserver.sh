@@ -3,13 +3,13 @@
 
 webserver_pid=
 
-# webserver_start DIR PORT ENTRY [EXTRA]: serves ENTRY as /webapi/entry.cgi, with configuration and
-# logs in DIR; EXTRA is a file of further configuration. The server ends with this shell, however
+# webserver_start DIR PORT ENTRY PID [EXTRA]: serves ENTRY as /webapi/entry.cgi, with configuration
+# and logs in DIR; PID is the file for its process id, EXTRA one of further configuration. The server ends with this shell, however
 # that ends. Says why when it cannot start.
 webserver_start() {
-  local dir=$1 port=$2 entry=$3 extra=${4:-} tries
+  local dir=$1 port=$2 entry=$3 pid=$4 extra=${5:-} tries
   mkdir -p "$dir/www" "$dir/uploads"
-  sed -e "s|@DIR@|$dir|g; s|@PORT@|$port|g; s|@ENTRY@|$entry|g" \
+  sed -e "s|@DIR@|$dir|g; s|@PORT@|$port|g; s|@ENTRY@|$entry|g; s|@PID@|$pid|g" \
     "$(dirname "${BASH_SOURCE[0]}")/lighttpd.conf.in" > "$dir/lighttpd.conf"
   [[ -z $extra ]] || cat "$extra" >> "$dir/lighttpd.conf"
   if webserver_port_is_taken "$port"; then

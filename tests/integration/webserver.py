@@ -18,13 +18,14 @@ def free_port():
 class WebServer:
     """Serves one entry.cgi from a directory of its own until it is stopped."""
 
-    def __init__(self, directory, entry, extra=""):
+    def __init__(self, directory, entry, extra="", pid=None):
         self.directory = Path(directory)
         self.port = free_port()
         for folder in ("www", "uploads"):
             (self.directory / folder).mkdir(parents=True, exist_ok=True)
         text = TEMPLATE.read_text()
-        for name, value in (("DIR", directory), ("PORT", self.port), ("ENTRY", entry)):
+        values = {"DIR": directory, "PORT": self.port, "ENTRY": entry, "PID": pid or f"{directory}/pid"}
+        for name, value in values.items():
             text = text.replace(f"@{name}@", str(value))
         self.configuration = self.directory / "lighttpd.conf"
         self.configuration.write_text(text + extra)

@@ -73,6 +73,10 @@ bool Credentials::HaveChanged() const {
 }
 
 void Credentials::GiveBack() const {
+  // The user's supplementary groups must not stay with the next call, and root alone sets them.
+  if (user_.effective != 0 && setresuid(kUnchanged, 0, kUnchanged) == 0) {
+    setgroups(supplementary_.size(), supplementary_.data());
+  }
   if (setresgid(group_.real, group_.effective, group_.saved) != 0) {
     logFailure("resgid", group_.real, group_.effective, group_.saved, __LINE__);
   } else if (group_.effective == 0) {
@@ -82,7 +86,6 @@ void Credentials::GiveBack() const {
     logFailure("resuid", user_.real, user_.effective, user_.saved, __LINE__);
   } else if (user_.effective == 0) {
     logChange("resuid", user_.real, user_.effective, user_.saved, __LINE__);
-    // The user's supplementary groups must not stay with the next call.
     setgroups(supplementary_.size(), supplementary_.data());
   }
 }

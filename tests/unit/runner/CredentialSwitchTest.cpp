@@ -80,6 +80,15 @@ TEST_F(CredentialSwitch, GrantableGivesTheIdsOfASetUserIdProgramBack) {
   });
 }
 
+TEST_F(CredentialSwitch, GrantableGivesIdsAndGroupsBackToAProcessThatCanBecomeRoot) {
+  const Ids started{kCaller, kCaller, 0, kCaller, kCaller, 0};
+  InChild(started, [&] {
+    const std::vector<gid_t> groups = CurrentGroups();
+    return groups.size() == 2 && ProcessPlugin("state", kGrantable) && RanAsUser() &&
+           CurrentIds() == started && CurrentGroups() == groups;
+  });
+}
+
 TEST_F(CredentialSwitch, GrantableServesASecondCall) {
   InChild({0, 0, 0, 0, 0, 0}, [&] {
     return ProcessPlugin("state", kGrantable) && RanAsUser() &&
