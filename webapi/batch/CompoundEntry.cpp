@@ -6,6 +6,9 @@
 #include <signal.h>
 #include <unistd.h>
 
+#include <ctime>
+#include <string>
+
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/APIRunner.h"
@@ -34,6 +37,13 @@ void releaseStandardDescriptors() {
       dup2(null, descriptor);
     }
   }
+}
+
+/// What every child would find out anew: the time zone for its log, the files of accounts.
+void lookAhead(const APIRequest& request) {
+  tzset();
+  const std::string user = request.GetLoginUserName();
+  QLIBGroupIsAdminGroupMem(user.empty() ? "root" : user.c_str(), 0);
 }
 
 /// A process that gave up root may not signal its parent, which is still there then; and the
@@ -77,6 +87,9 @@ int CompoundHandler::CompoundProcessEntry(const Json::Value& entry, unsigned ind
 }
 
 int CompoundHandler::ForkEntry(unsigned index) {
+  if (children_.empty()) {
+    lookAhead(*entryRequest_);
+  }
   Child child;
   if (!InitNewPipe(child, index)) {
     WEBAPI_LOG(kSource, "pipe init Fail");

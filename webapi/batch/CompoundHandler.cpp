@@ -3,7 +3,6 @@
 
 #include "webapi/CompoundHandler.h"
 
-#include <ctime>
 #include <new>
 
 #include "webapi/APIRequest.h"
@@ -143,7 +142,6 @@ void CompoundHandler::PreloadLibs(const Json::Value& value, bool top) {
 }
 
 int CompoundHandler::CompoundProcess() {
-  tzset();  // else the log reads the time zone in every child anew
   data_["result"] = Json::Value(Json::arrayValue);
   if (!parallel_) {
     PreloadLibs();
