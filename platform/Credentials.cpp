@@ -65,16 +65,30 @@ bool switchAsRoot(const Account& account, bool keepPrivilege) {
 bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
   using namespace QELO::Platform;
   Account account;
-  if (findAccount(name, account) != Lookup::kFound) {
-    return false;
+  switch (findAccount(name, account)) {
+    case Lookup::kFound:
+      break;
+    case Lookup::kAbsent:
+      PLATFORM_LOG(kSource, "there is no account %s", name);
+      errno = ENOENT;
+      return false;
+    default:
+      PLATFORM_LOG(kSource, "cannot look up the account %s", name);
+      errno = EIO;
+      return false;
   }
   // To the kernel -1 means "leave as it is", so such an account would keep root's rights.
   if (account.uid == kSameUid || account.gid == kSameGid) {
+    errno = EINVAL;
     return false;
   }
   if (geteuid() == 0) {
     return switchAsRoot(account, keepPrivilege);
   }
-  return account.uid == geteuid() && account.gid == getegid() &&
-         (keepPrivilege || setIds(account, false));
+  if (account.uid != geteuid() || account.gid != getegid()) {
+    PLATFORM_LOG(kSource, "cannot become %s without root's rights", name);
+    errno = EPERM;
+    return false;
+  }
+  return keepPrivilege || setIds(account, false);
 }

@@ -106,6 +106,10 @@ def test_QueryOfTenMebibytes_IsRefusedByTheServer(client):
     assert answer.split()[1] in (b"400", b"413", b"414", b"431")
 
 
+def test_QueryOfSixtyKilobytes_IsAnsweredThroughTheServer(client):
+    assert client.get(f"{OPEN}&x={'a' * 60_000}").code == 0
+
+
 def test_QueryOfTheLargestSize_IsAnswered(root):
     query = f"{OPEN}&x="
     query += "a" * (LARGEST_VARIABLE - len("QUERY_STRING=") - len(query) - 1)

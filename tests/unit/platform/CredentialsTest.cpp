@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <set>
 #include <vector>
 
@@ -106,7 +107,26 @@ TEST_F(Credentials, RootToRootWorks) {
 TEST_F(Credentials, UnknownUserChangesNothing) {
   EXPECT_EQ(InChild([] {
               const Ids before = Ids::Now();
-              return !ResetCredentialsByName("zoe", false) && Ids::Now() == before ? 0 : 1;
+              SyslogCapture::Clear();
+              return !ResetCredentialsByName("zoe", false) && errno == ENOENT &&
+                             SyslogCapture::Count("there is no account zoe") == 1 &&
+                             Ids::Now() == before
+                         ? 0
+                         : 1;
+            }),
+            0);
+}
+
+TEST_F(Credentials, WithoutRootsRightsTheLogSaysSo) {
+  EXPECT_EQ(InChild([] {
+              if (!ResetCredentialsByName("alice", false)) {
+                return 1;
+              }
+              SyslogCapture::Clear();
+              return !ResetCredentialsByName("bob", false) && errno == EPERM &&
+                             SyslogCapture::Count("cannot become bob without root's rights") == 1
+                         ? 0
+                         : 2;
             }),
             0);
 }
