@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+#include "programs/webapi-exec-accounts.h"
+#include "programs/webapi-exec-call.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIErrorText.h"
 
@@ -66,17 +68,31 @@ int codeOf(const Json::Value& answer) {
   return JsonHelper::asInt(member(member(answer, "error"), "code"), WEBAPI_ERR_NO_ANSWER);
 }
 
-std::string outcome(const Json::Value& result) {
+/// What the code of an answer that failed means; a call that was not run may have lacked rights.
+/// @param call  its "api", "version" and "method"
+std::string meaningOf(const Json::Value& answer, const Json::Value& call, const Options& options) {
+  const int code = codeOf(answer);
+  std::string text = "error " + std::to_string(code) + ": " + WebAPIErrorText(code);
+  std::string user;
+  if (code == WEBAPI_ERR_NO_ANSWER && findUser(options, user).empty()) {
+    const std::string missing = missingRights(JsonHelper::asString(member(call, "api")),
+                                              JsonHelper::asInt(member(call, "version")),
+                                              JsonHelper::asString(member(call, "method")), user);
+    text += missing.empty() ? "" : "; " + missing;
+  }
+  return text;
+}
+
+std::string outcome(const Json::Value& result, const Json::Value& call, const Options& options) {
   if (result.isNull()) {
     return "no answer";
   }
-  return succeeded(result)
-             ? "ok"
-             : "error " + std::to_string(codeOf(result)) + ": " + WebAPIErrorText(codeOf(result));
+  return succeeded(result) ? "ok" : meaningOf(result, call, options);
 }
 
-void sayError(const Json::Value& answer) {
-  fprintf(stderr, "webapi-exec: error %d: %s\n", codeOf(answer), WebAPIErrorText(codeOf(answer)));
+ExitCode sayError(const std::string& meaning) {
+  fprintf(stderr, "webapi-exec: %s\n", meaning.c_str());
+  return kFailed;
 }
 
 void printRows(const std::vector<Row>& rows) {
@@ -103,18 +119,23 @@ void printAnswer(const Json::Value& answer) {
 
 ExitCode showAnswer(const Json::Value& answer) {
   printAnswer(answer);
-  if (succeeded(answer)) {
-    return kDone;
-  }
-  sayError(answer);
-  return kFailed;
+  return succeeded(answer) ? kDone : sayError(meaningOf(answer, Json::Value(), Options()));
 }
 
-ExitCode showTable(const Json::Value& calls, const Json::Value& answer) {
+ExitCode showAnswer(const Options& options, const Json::Value& answer) {
+  printAnswer(answer);
+  Json::Value call;
+  call["api"] = options.api;
+  call["version"] = options.version != 0 ? options.version : 1;
+  call["method"] = options.method;
+  return succeeded(answer) ? kDone : sayError(meaningOf(answer, call, options));
+}
+
+ExitCode showTable(const Options& options, const Json::Value& answer) {
   if (!succeeded(answer)) {
-    sayError(answer);
-    return kFailed;
+    return sayError(meaningOf(answer, Json::Value(), options));
   }
+  const Json::Value& calls = options.calls;
   const Json::Value& results = member(member(answer, "data"), "result");
   std::vector<Row> rows = {{"#", "API", "VERSION", "METHOD", "RESULT"}};
   size_t failed = 0;
@@ -122,7 +143,7 @@ ExitCode showTable(const Json::Value& calls, const Json::Value& answer) {
     const Json::Value result = results.isArray() ? results.get(i, Json::Value()) : Json::Value();
     rows.push_back({std::to_string(i + 1), cell(member(calls[i], "api")),
                     cell(member(calls[i], "version")), cell(member(calls[i], "method")),
-                    outcome(result)});
+                    outcome(result, calls[i], options)});
     failed += succeeded(result) ? 0 : 1;
   }
   printRows(rows);

@@ -7,6 +7,7 @@
 #include <cerrno>
 #include <cstring>
 
+#include "programs/webapi-exec-accounts.h"
 #include "webapi/APIRunner.h"
 #include "webapi/ExecParam.h"
 #include "webapi/platform/Core.h"
@@ -24,16 +25,26 @@ std::string ownName() {
   return account != nullptr ? account->pw_name : "";
 }
 
+/// What to do about a user who does not exist. The accounts of a private root are few, and none of
+/// the host's.
+std::string adviceOnUsers() {
+  std::string names;
+  for (const std::string& name : callableUsers()) {
+    names += (names.empty() ? "" : ", ") + name;
+  }
+  return names.empty() ? "--user names another" : "--user takes one of " + names;
+}
+
 /// Whether the caller may call as this user. No permission is checked behind this.
 /// @return why not, or ""
 std::string checkUser(const std::string& user) {
   uid_t uid = 0;
   gid_t gid = 0;
   if (user.empty()) {
-    return "the calling account has no name; --user takes one";
+    return "the calling account has no name; " + adviceOnUsers();
   }
   if (QELOUserGetUGID(user.c_str(), &uid, &gid) != 0) {
-    return "there is no user " + user + "; --user names another";
+    return "there is no user " + user + " here; " + adviceOnUsers();
   }
   return geteuid() == 0 || uid == geteuid() ? "" : "only root may call as another user";
 }

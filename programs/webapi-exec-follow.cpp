@@ -26,7 +26,7 @@ ExitCode start(const Options& options, std::string& id) {
   if (!id.empty()) {
     return kDone;
   }
-  if (showAnswer(answer) == kDone) {
+  if (showAnswer(options, answer) == kDone) {
     fprintf(stderr, "webapi-exec: --follow needs a method that starts a task; this one did not\n");
   }
   return kFailed;

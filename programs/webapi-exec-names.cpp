@@ -32,6 +32,22 @@ std::set<std::string> methodsOf(const Json::Value& description, int version) {
   return names;
 }
 
+/// @return false, with a message, when the options name a version that the API does not have
+bool checkVersion(const Options& options, const Json::Value& description) {
+  const Json::Value& versions = JsonHelper::member(description, "methods");
+  if (options.version == 0 ||
+      JsonHelper::member(versions, std::to_string(options.version)).isArray()) {
+    return true;
+  }
+  std::string known;
+  for (const std::string& key : versions.getMemberNames()) {
+    known += (known.empty() ? "" : ", ") + key;
+  }
+  fprintf(stderr, "webapi-exec: no such version: %s has %s\n", options.api.c_str(),
+          known.empty() ? "none" : known.c_str());
+  return false;
+}
+
 }  // namespace
 
 ExitCode listNames(const Options& options) {
@@ -45,11 +61,13 @@ ExitCode listNames(const Options& options) {
   if (options.api.empty()) {
     const std::vector<std::string> apis = catalogue.getMemberNames();
     names.insert(apis.begin(), apis.end());
-  } else if (JsonHelper::hasMember(catalogue, options.api)) {
-    names = methodsOf(catalogue[options.api], options.version);
-  } else {
+  } else if (!JsonHelper::hasMember(catalogue, options.api)) {
     fprintf(stderr, "webapi-exec: there is no API %s\n", options.api.c_str());
     return kFailed;
+  } else if (!checkVersion(options, catalogue[options.api])) {
+    return kFailed;
+  } else {
+    names = methodsOf(catalogue[options.api], options.version);
   }
   for (const std::string& name : names) {
     printf("%s\n", name.c_str());

@@ -19,7 +19,8 @@ const char kHelp[] =
     "    Makes one call and prints its answer, for people on a terminal, else as one line of "
     "JSON.\n"
     "    --version N         version of the API, 1 when not given\n"
-    "    --user NAME         user to call as; only root may name another account\n"
+    "    --user NAME         user to call as; only root may name another account. In an ordinary\n"
+    "                        user's private root that user may name any account of it\n"
     "    --param NAME=VALUE  parameter; a value that is a JSON text counts as that, like on the\n"
     "                        wire: 5 is a number, true a boolean, '\"5\"' and five are texts\n"
     "    --json FILE         object of parameters, \"-\" for standard input; --param counts "
@@ -39,7 +40,7 @@ const char kHelp[] =
     "    --param stop_when_error=true   none after the first that fails\n"
     "webapi-exec --list [--api API [--version N]]\n"
     "    Prints the names of the APIs, or of an API's methods.\n"
-    "webapi-exec --help\n"
+    "webapi-exec --help, -h\n"
     "\n"
     "Exit status: 0 success; 1 the call, one of the batch, or the task failed or could not be "
     "made;\n"
@@ -48,8 +49,8 @@ const char kHelp[] =
 namespace {
 
 enum Option {
-  kHelpOption,
-  kList,
+  kHelpOption = 'h',
+  kList = 256,  // no character, which would be a short option
   kApi,
   kVersion,
   kMethod,
@@ -203,7 +204,7 @@ std::string take(int option, const std::string& argument, Options& options, std:
 std::string readOptions(int argc, char** argv, Options& options) {
   std::string json;
   int option = 0;
-  while ((option = getopt_long(argc, argv, "", kOptions, nullptr)) != -1) {
+  while ((option = getopt_long(argc, argv, "h", kOptions, nullptr)) != -1) {
     const std::string wrong = take(option, optarg != nullptr ? optarg : "", options, json);
     if (!wrong.empty() || options.help) {
       return wrong;

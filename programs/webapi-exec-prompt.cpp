@@ -1,7 +1,6 @@
 #include "programs/webapi-exec-prompt.h"
 
 #include <fcntl.h>
-#include <termios.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -16,6 +15,7 @@ constexpr char kTerminal[] = "/dev/tty";  // standard input may be a file
 }  // namespace
 
 StopPrompt::~StopPrompt() {
+  GiveKeysBack();
   if (terminal_ >= 0) {
     close(terminal_);
   }
@@ -27,21 +27,58 @@ bool StopPrompt::Ask() {
   }
   isAsking_ = terminal_ >= 0;
   if (isAsking_) {
+    TakeKeys();
     tcflush(terminal_, TCIFLUSH);
     fprintf(stderr, "%s", kQuestion);
   }
   return isAsking_;
 }
 
+/// Ctrl-C stays a signal, and so the program gets to give the keys back. The keys that would stop
+/// or end it without that are off meanwhile.
+void StopPrompt::TakeKeys() {
+  if (hasKeys_ || tcgetattr(terminal_, &former_) != 0) {
+    return;
+  }
+  termios now = former_;
+  now.c_lflag &= ~static_cast<tcflag_t>(ICANON);
+  now.c_cc[VMIN] = 1;
+  now.c_cc[VTIME] = 0;
+  now.c_cc[VQUIT] = _POSIX_VDISABLE;
+  now.c_cc[VSUSP] = _POSIX_VDISABLE;
+  hasKeys_ = tcsetattr(terminal_, TCSANOW, &now) == 0;
+}
+
+void StopPrompt::GiveKeysBack() {
+  // In the background the terminal is the shell's, which has made it its own.
+  if (hasKeys_ && tcgetpgrp(terminal_) == getpgrp()) {
+    tcsetattr(terminal_, TCSANOW, &former_);
+  }
+  hasKeys_ = false;
+}
+
 StopPrompt::Choice StopPrompt::Read() {
-  char line[256];
-  const ssize_t count = TEMP_FAILURE_RETRY(read(terminal_, line, sizeof line));
-  if (count <= 0) {
+  char keys[256];
+  const ssize_t count = TEMP_FAILURE_RETRY(read(terminal_, keys, sizeof keys));
+  if (count <= 0 || (hasKeys_ && static_cast<cc_t>(keys[0]) == former_.c_cc[VEOF])) {
     Cancel();
     return Choice::kLeave;
   }
-  isAsking_ = false;
-  switch (line[0]) {
+  const Choice choice = ChoiceOf(keys[0]);
+  if (keys[count - 1] != '\n') {
+    fputc('\n', stderr);
+  }
+  if (choice == Choice::kNone) {
+    Ask();
+  } else {
+    isAsking_ = false;
+    GiveKeysBack();
+  }
+  return choice;
+}
+
+StopPrompt::Choice StopPrompt::ChoiceOf(char key) {
+  switch (key) {
     case 's':
     case 'S':
       return Choice::kStop;
@@ -52,7 +89,6 @@ StopPrompt::Choice StopPrompt::Read() {
     case 'C':
       return Choice::kGoOn;
     default:
-      Ask();
       return Choice::kNone;
   }
 }
@@ -62,6 +98,7 @@ void StopPrompt::Cancel() {
     fputc('\n', stderr);
     isAsking_ = false;
   }
+  GiveKeysBack();
 }
 
 }  // namespace QELO::ExecProgram

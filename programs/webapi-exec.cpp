@@ -26,7 +26,7 @@ static ExitCode run(const Options& options) {
     fprintf(stderr, "webapi-exec: %s\n", wrong.c_str());
     return kFailed;
   }
-  return options.batch.empty() ? showAnswer(answer) : showTable(options.calls, answer);
+  return options.batch.empty() ? showAnswer(options, answer) : showTable(options, answer);
 }
 
 int main(int argc, char** argv) {

@@ -68,6 +68,9 @@ class Terminal:
         self.columns = columns
         fcntl.ioctl(self.leader, termios.TIOCSWINSZ, struct.pack("HHHH", 24, columns, 0, 0))
 
+    def settings(self):
+        return termios.tcgetattr(self.leader)
+
     def type(self, text):
         os.write(self.leader, text.encode())
 

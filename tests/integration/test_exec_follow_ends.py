@@ -84,14 +84,14 @@ def interrupted(terminal):
 def test_Interrupt_ThenStop_EndsTheTask(work, follow):
     terminal = follow(*work(counts(1, 4)).arguments())
     _, pid = interrupted(terminal)
-    terminal.type("s\n")
+    terminal.type("s")
     status, output = terminal.finish()
     assert (status, json.loads(output)["data"]["files"]) == (1, {"done": 1, "total": 4})
     assert terminal.screen()[-2] == "webapi-exec: the task was stopped"
     assert_ends(pid)
 
 
-@pytest.mark.parametrize("answer", ["l\n", INTERRUPT, "\x04"], ids=["l", "Ctrl-C", "Ctrl-D"])
+@pytest.mark.parametrize("answer", ["l", INTERRUPT, "\x04"], ids=["l", "Ctrl-C", "Ctrl-D"])
 @pytest.mark.parametrize("keep", [True, False])
 def test_Interrupt_ThenLeave_LetsTheTaskGoOn(work, follow, answer, keep):
     steps = work(counts(1, 4), counts(4, 4), keep=keep)
@@ -115,9 +115,9 @@ def test_Interrupt_ThenContinue_GoesOnWatching(work, follow):
     steps = work(counts(1, 4), counts(3, 4), counts(4, 4))
     terminal = follow(*steps.arguments())
     interrupted(terminal)
-    terminal.type("what?\n")
+    terminal.type("w")
     terminal.wait_for(QUESTION, times=2)
-    terminal.type("c\n")
+    terminal.type("c")
     steps.open(1)
     terminal.wait_until(shown(75))
     terminal.type(INTERRUPT)
@@ -130,9 +130,9 @@ def test_Interrupt_ThenContinue_GoesOnWatching(work, follow):
 def test_WhatWasTypedBeforeTheQuestion_IsNoAnswer(work, follow):
     terminal = follow(*work(counts(1, 4)).arguments())
     terminal.wait_until(shown(25))
-    terminal.type("s\n")
+    terminal.type("s")
     _, pid = interrupted(terminal)
-    terminal.type("l\n")
+    terminal.type("l")
     assert terminal.finish()[0] == 130
     assert is_running(pid)
 
@@ -152,7 +152,7 @@ def test_Interrupt_WhileTheTaskIsStarted_AsksWhenItsIdIsKnown(follow):
     while not pid:
         pid = status_of(terminal.task_id()).get("data", {}).get("pid")
     assert os.getsid(pid) == pid
-    terminal.type("s\n")
+    terminal.type("s")
     assert terminal.finish()[0] == 1
     assert_ends(pid)
 
@@ -179,6 +179,60 @@ def test_OtherSignal_LeavesTheTask(work, follow, number):
     assert terminal.finish() == (128 + number, "")
     status = status_of(full_id)
     assert (status["finish"], status["auto_remove"]) == (False, True)
+
+
+# The terminal's own ways, which the question changes
+
+
+@pytest.mark.parametrize("number", [signal.SIGTERM, signal.SIGHUP], ids=["TERM", "HUP"])
+def test_OtherSignal_AtTheQuestion_LeavesTheTerminalAsItWas(work, follow, number):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    before = terminal.settings()
+    interrupted(terminal)
+    assert terminal.settings() != before
+    terminal.process.send_signal(number)
+    assert terminal.finish() == (128 + number, "")
+    assert terminal.settings() == before
+
+
+@pytest.mark.parametrize("answer", ["s", "l", INTERRUPT, "\x04"], ids=["s", "l", "Ctrl-C", "Ctrl-D"])
+def test_Answer_LeavesTheTerminalAsItWas(work, follow, answer):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    before = terminal.settings()
+    interrupted(terminal)
+    terminal.type(answer)
+    assert terminal.finish()[0] == (1 if answer == "s" else 130)
+    assert terminal.settings() == before
+
+
+def test_Continue_GivesTheTerminalBackAtOnce(work, follow):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    before = terminal.settings()
+    interrupted(terminal)
+    terminal.type("c")
+    terminal.wait_until(shown(25))
+    terminal.wait_until(lambda screen: terminal.settings() == before)
+    assert terminal.process.poll() is None
+
+
+def test_TaskThatEndsAtTheQuestion_LeavesTheTerminalAsItWas(work, follow):
+    steps = work(counts(1, 4), counts(4, 4))
+    terminal = follow(*steps.arguments())
+    before = terminal.settings()
+    interrupted(terminal)
+    steps.open()
+    assert terminal.finish()[0] == 0
+    assert terminal.settings() == before
+
+
+@pytest.mark.parametrize("key", ["\x1a", "\x1c"], ids=["Ctrl-Z", "Ctrl-Backslash"])
+def test_KeyThatWouldStopTheProgram_AtTheQuestion_IsNoAnswer(work, follow, key):
+    terminal = follow(*work(counts(1, 4)).arguments())
+    interrupted(terminal)
+    terminal.type(key)
+    terminal.wait_for(QUESTION, times=2)
+    terminal.type("l")
+    assert terminal.finish()[0] == 130
 
 
 # Without a terminal

@@ -32,7 +32,9 @@ def test_User_IsWhomRootNames(user):
 def test_User_WhoDoesNotExist_IsAFailure():
     process = call(ENTRIES, "echo", user="nobody-here")
     assert (process.returncode, process.stdout) == (1, "")
-    assert process.stderr == "webapi-exec: there is no user nobody-here; --user names another\n"
+    users = "admin, alice, bob"
+    assert process.stderr == (
+        f"webapi-exec: there is no user nobody-here here; --user takes one of {users}\n")
 
 
 def reachable(path):
@@ -59,8 +61,45 @@ def test_User_OtherThanOneself_IsForRootAlone():
     # The rights are the operating system's: what runs as another account cannot be run.
     plain = as_alice("plain", "--user", "alice")
     assert json.loads(plain.stdout)["error"]["code"] == 117
+    assert plain.stderr == (
+        "webapi-exec: error 117: the method could not be run or gave no answer; "
+        "the method runs as system: call it as root\n")
     # The private root's accounts are none of the host, so the caller's own has no name here.
-    assert as_alice("asUser").returncode == 1
+    nameless = as_alice("asUser")
+    assert nameless.returncode == 1
+    assert nameless.stderr.endswith("; --user takes one of alice\n")
+
+
+@needs_root
+@pytest.mark.parametrize(
+    "attributes, account_name",
+    [({"runAs": "bob"}, "bob"), ({"grantByDefault": True}, "root"), ({}, "admin"),
+     ({"runAs": "nobody-here"}, None)],
+)
+def test_MethodThatRunsAsAnotherAccount_IsNoUsersOwn(describe, attributes, account_name):
+    if not reachable(EXEC):
+        pytest.skip("the build tree cannot be read by others")
+    describe(ENTRIES, "entries.so", runAs="admin", methods={"1": [{"echo": attributes}]})
+    uid, gid = account("alice")
+    process = run("--api", ENTRIES, "--method", "echo", "--user", "alice", cwd="/",
+                  user=uid, group=gid, extra_groups=[])
+    assert json.loads(process.stdout)["error"]["code"] == 117
+    reason = f"{account_name}: call it as root" if account_name else (
+        "nobody-here, and there is no such account")
+    assert process.stderr.endswith(f"gave no answer; the method runs as {reason}\n")
+    calls = json.dumps([{"api": ENTRIES, "version": 1, "method": "echo"}])
+    table = run("--batch", "-", "--user", "alice", text=calls, cwd="/",
+                user=uid, group=gid, extra_groups=[]).stdout
+    assert table.endswith(f"gave no answer; the method runs as {reason}\n")
+
+
+@needs_root
+def test_MethodThatRunsAsNobodyKnown_IsSaidToRootToo(describe):
+    describe(ENTRIES, "entries.so", runAs="nobody-here", methods={"1": ["echo"]})
+    process = call(ENTRIES, "echo")
+    assert process.returncode == 1
+    assert process.stderr.endswith(
+        "; the method runs as nobody-here, and there is no such account\n")
 
 
 # Names and help
@@ -81,6 +120,12 @@ def test_List_OfAnUnknownAPI_Fails():
     assert process.stderr == "webapi-exec: there is no API QELO.Test.Nowhere\n"
 
 
+def test_List_OfAnUnknownVersion_Fails():
+    process = run("--list", "--api", ENTRIES, "--version", "3")
+    assert (process.returncode, process.stdout) == (1, "")
+    assert process.stderr == f"webapi-exec: no such version: {ENTRIES} has 1, 2\n"
+
+
 def test_List_WithoutDescriptions_Fails():
     moved = DESCRIPTIONS.with_name("webapi.moved")
     DESCRIPTIONS.rename(moved)
@@ -92,9 +137,11 @@ def test_List_WithoutDescriptions_Fails():
     assert "there are no APIs" in process.stderr
 
 
-def test_Help_NamesEveryOption():
-    process = run("--help")
+@pytest.mark.parametrize("option", ["--help", "-h"])
+def test_Help_NamesEveryOption(option):
+    process = run(option)
     assert (process.returncode, process.stderr) == (0, "")
+    assert "private root" in process.stdout
     for option in ("api", "method", "version", "user", "param", "json", "output", "batch", "list",
                    "follow", "task"):
         assert f"--{option}" in process.stdout
