@@ -1,13 +1,20 @@
 #include "programs/webapi-token-commands.h"
 
+#include <fcntl.h>
+#include <json/json.h>
 #include <time.h>
+#include <unistd.h>
 
+#include <algorithm>
+#include <cerrno>
 #include <charconv>
 #include <map>
 
 #include "platform/PlatformPaths.h"
 #include "platform/modules/tokens/TokenStore.h"
+#include "webapi/JsonHelper.h"
 #include "webapi/platform/Core.h"
+#include "webapi/platform/WebAPIUtil.h"
 
 namespace QELO::TokenProgram {
 namespace {
@@ -20,16 +27,19 @@ constexpr int64_t kDaySeconds = 86400;
 constexpr mode_t kStateDirMode = 0711;  // the groups' directories stand there too
 
 constexpr char kHelp[] =
-    "Access tokens stand for a user in API calls.\n"
+    "Access tokens stand for a user in API calls. A call sends its token as the parameter "
+    "tid=TOKEN,\n"
+    "instead of a login. The commands need root's rights.\n"
     "\n"
     "webapi-token create --user USER [--api API] [--method METHOD] [--days N]\n"
     "    Makes a token and prints it, this once: only a hash of it is kept.\n"
     "    --api, --method  the one API or method that it is for; \"*\", the default: all\n"
     "    --days           how long it is good, 90 when not given; 0: for ever\n"
     "webapi-token list\n"
-    "    Lists the tokens: number, user, API, method, when made, until when good (UTC).\n"
+    "    Lists the tokens, below a line of headings; columns end with a tab.\n"
     "webapi-token revoke ID\n"
-    "    Removes the token with this number.\n";
+    "    Removes the token with this number.\n"
+    "webapi-token --help, -h\n";
 
 struct Streams {
   FILE* output;
@@ -53,8 +63,33 @@ bool parse(const std::string& text, T lowest, T highest, T& number) {
   return result.ec == std::errc() && result.ptr == end && number >= lowest && number <= highest;
 }
 
+/// Whether the database, or the directory that is to have it, is another account's.
+bool lacksRights(const TokenStore& store) {
+  const char* path = store.Missing() ? Paths::kStateDir : Paths::kTokenDatabase;
+  return faccessat(AT_FDCWD, path, R_OK | W_OK, AT_EACCESS) != 0 && errno == EACCES;
+}
+
 std::string databaseError(const TokenStore& store) {
-  return std::string(Paths::kTokenDatabase) + ": " + store.Error();
+  return std::string(Paths::kTokenDatabase) + ": " + store.Error() +
+         (lacksRights(store) ? "; root's rights are needed" : "");
+}
+
+/// Whether calls find a description of this API: in the file that is named after it, else after
+/// what stands before its last dots.
+bool isDescribed(const std::string& api) {
+  if (api.find('/') != std::string::npos) {
+    return false;
+  }
+  for (size_t end = api.size(); end != std::string::npos && end > 0;
+       end = api.find_last_of('.', end - 1)) {
+    const std::string file = Paths::kDescriptionDir + api.substr(0, end) + ".lib";
+    if (QLIBCFileExist(file.c_str()) == 1) {
+      Json::Value descriptions;
+      return WebAPIUtil::ReadJsonFile(file, descriptions) &&
+             JsonHelper::hasMember(descriptions, api);
+    }
+  }
+  return false;
 }
 
 std::string timeText(int64_t seconds) {
@@ -122,6 +157,10 @@ ExitCode create(const std::vector<std::string>& arguments, const Streams& stream
   if (QELOUserGetUGID(entry.user.c_str(), &uid, &gid) != 0) {
     return failed(streams, "there is no user " + entry.user);
   }
+  if (entry.api != "*" && !isDescribed(entry.api)) {
+    fprintf(streams.messages, "webapi-token: there is no API %s; the token is made all the same\n",
+            entry.api.c_str());
+  }
   QELOFSMkdirP(Paths::kStateDir, 1, 0, static_cast<uid_t>(-1), static_cast<gid_t>(-1),
                kStateDirMode);
   TokenStore store;
@@ -142,6 +181,7 @@ ExitCode list(const Streams& streams) {
   if ((!opened && !store.Missing()) || (opened && !store.List(entries))) {
     return failed(streams, databaseError(store));
   }
+  fprintf(streams.output, "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\n");
   for (const TokenStore::Entry& entry : entries) {
     fprintf(streams.output, "%lld\t%s\t%s\t%s\t%s\t%s\n", static_cast<long long>(entry.id),
             entry.user.c_str(), entry.api.c_str(), entry.method.c_str(),
@@ -169,7 +209,9 @@ ExitCode revoke(const std::string& number, const Streams& streams) {
 ExitCode run(const std::vector<std::string>& arguments, FILE* output, FILE* messages) {
   const Streams streams{output, messages};
   const std::string command = arguments.empty() ? "" : arguments[0];
-  if (command == "--help" || command == "-h") {
+  if (std::any_of(arguments.begin(), arguments.end(), [](const std::string& argument) {
+        return argument == "--help" || argument == "-h";
+      })) {
     fputs(kHelp, output);
     return kDone;
   }

@@ -1,3 +1,5 @@
+#include <unistd.h>
+
 #include <cstdio>
 #include <filesystem>
 
@@ -6,6 +8,9 @@
 #include "webapi/platform/Token.h"
 
 namespace {
+
+constexpr char kHeadings[] = "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\n";
+constexpr uid_t kOrdinaryUser = 65534;
 
 class TokenProgram : public PrivateRoot {
  protected:
@@ -16,6 +21,26 @@ class TokenProgram : public PrivateRoot {
     fclose(output);
     fclose(messages);
     output_ = Read("var/output");
+    messages_ = Read("var/messages");
+    return code;
+  }
+
+  /// Run() by a user who may neither read nor write what the tokens are in.
+  int RunWithoutRights(const std::vector<std::string>& arguments) {
+    const std::string closed = Path(HasDatabase() ? "var/lib/webapi/tokens.db" : "var/lib/webapi");
+    EXPECT_EQ(chmod(closed.c_str(), HasDatabase() ? 0000 : 0555), 0);
+    FILE* output = fopen(Path("var/output").c_str(), "w");
+    FILE* messages = fopen(Path("var/messages").c_str(), "w");
+    const int code = InChild([&] {
+      if (IsRoot() && setresuid(kOrdinaryUser, kOrdinaryUser, kOrdinaryUser) != 0) {
+        return -1;
+      }
+      const int result = QELO::TokenProgram::run(arguments, output, messages);
+      fclose(messages);
+      return result;
+    });
+    fclose(output);
+    fclose(messages);
     messages_ = Read("var/messages");
     return code;
   }
@@ -82,20 +107,44 @@ TEST_F(TokenProgram, CreateForAnUnknownUserFails) {
   EXPECT_FALSE(HasDatabase());
 }
 
+TEST_F(TokenProgram, CreateForAnApiWithoutDescriptionWarns) {
+  Write("usr/qelo/qeloman/webapi/QELO.X.lib", R"({"QELO.X": {}, "QELO.X.Y": {}})");
+  for (const char* api : {"QELO.X", "QELO.X.Y", "*"}) {
+    EXPECT_EQ(Run({"create", "--user", "alice", "--api", api}), 0);
+    EXPECT_EQ(messages_.find("Token "), 0U) << messages_;
+  }
+  for (const std::string api : {"QELO.X.Z", "Nope.Nope", "nope", "../webapi/QELO.X"}) {
+    EXPECT_EQ(Run({"create", "--user", "alice", "--api", api}), 0);
+    EXPECT_EQ(output_.size(), 44U);
+    EXPECT_EQ(messages_.find("webapi-token: there is no API " + api + "; "), 0U) << messages_;
+  }
+}
+
+TEST_F(TokenProgram, CallsWithoutRightsSaySo) {
+  EXPECT_EQ(RunWithoutRights({"create", "--user", "alice"}), 1);
+  EXPECT_NE(messages_.find("; root's rights are needed\n"), std::string::npos) << messages_;
+  EXPECT_EQ(chmod(Path("var/lib/webapi").c_str(), 0711), 0);
+  ASSERT_EQ(Run({"create", "--user", "alice"}), 0);
+  EXPECT_EQ(RunWithoutRights({"list"}), 1);
+  EXPECT_EQ(messages_, "webapi-token: " + Path("var/lib/webapi/tokens.db") +
+                           ": unable to open database file; root's rights are needed\n");
+}
+
 TEST_F(TokenProgram, ListShowsEverythingButTheTokens) {
   ASSERT_EQ(Run({"create", "--user", "alice"}), 0);
   const std::string token = output_.substr(0, 43);
   ASSERT_EQ(Run({"create", "--user", "bob", "--api", "QELO.X", "--days", "0"}), 0);
   EXPECT_EQ(Run({"list"}), 0);
-  EXPECT_EQ(output_.find("1\talice\t*\t*\t2"), 0U) << output_;
+  EXPECT_EQ(output_.find(kHeadings), 0U) << output_;
+  EXPECT_NE(output_.find("\n1\talice\t*\t*\t2"), std::string::npos) << output_;
   EXPECT_NE(output_.find("\n2\tbob\tQELO.X\t*\t2"), std::string::npos) << output_;
   EXPECT_NE(output_.find("\tnever\n"), std::string::npos) << output_;
   EXPECT_EQ(output_.find(token), std::string::npos);
 }
 
-TEST_F(TokenProgram, ListWithoutTokensIsEmpty) {
+TEST_F(TokenProgram, ListWithoutTokensHasHeadingsAlone) {
   EXPECT_EQ(Run({"list"}), 0);
-  EXPECT_EQ(output_, "");
+  EXPECT_EQ(output_, kHeadings);
   EXPECT_FALSE(HasDatabase());
 }
 
@@ -142,10 +191,14 @@ TEST_F(TokenProgram, DatabaseThatCannotBeMadeIsNamed) {
       << messages_;
 }
 
-TEST_F(TokenProgram, HelpTellsTheCommands) {
-  EXPECT_EQ(Run({"--help"}), 0);
-  for (const char* command : {"create --user", "list", "revoke ID"}) {
-    EXPECT_NE(output_.find(command), std::string::npos) << command;
+TEST_F(TokenProgram, HelpTellsTheCommandsAndHowTokensAreSent) {
+  for (const std::vector<std::string>& call :
+       {std::vector<std::string>{"--help"}, {"-h"}, {"create", "--help"}, {"list", "-h"}}) {
+    EXPECT_EQ(Run(call), 0);
+    EXPECT_EQ(messages_, "");
+    for (const char* text : {"create --user", "list", "revoke ID", "tid=TOKEN"}) {
+      EXPECT_NE(output_.find(text), std::string::npos) << text;
+    }
   }
 }
 
