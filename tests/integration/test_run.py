@@ -8,6 +8,7 @@ import signal
 import socket
 import subprocess
 import tempfile
+from contextlib import contextmanager
 from pathlib import Path
 
 import pytest
@@ -35,10 +36,21 @@ def checkout():
     shutil.rmtree(parent)
 
 
+def as_user(*words):
+    """A command line of the ordinary user."""
+    return ["runuser", "-u", ORDINARY_USER, "--", *words] if os.geteuid() == 0 else list(words)
+
+
 def command(*arguments):
     """./run as the ordinary user."""
-    words = ["./run", *map(str, arguments)]
-    return ["runuser", "-u", ORDINARY_USER, "--", *words] if os.geteuid() == 0 else words
+    return as_user("./run", *map(str, arguments))
+
+
+def answer_of(line):
+    """What the ordinary user's shell prints for lines."""
+    return subprocess.run(
+        as_user("bash", "-c", line), cwd="/", capture_output=True, text=True, check=True
+    ).stdout
 
 
 def run(checkout, *arguments):
@@ -113,26 +125,79 @@ def test_WrongArguments_AreRefused(checkout, arguments):
     assert run(checkout, *arguments).returncode == 2
 
 
-def test_Serving_PrintsLinesThatWork_AndLeavesNothingBehind(checkout):
-    port = free_port()
+def test_PortThatIsTaken_IsSaidBeforeAnythingIsBuilt(tmp_path):
+    copy = tmp_path / "tree"
+    shutil.copytree(SOURCE / "packaging", copy / "packaging")
+    shutil.copy(SOURCE / "run", copy)
+    with socket.socket() as taken:
+        taken.bind(("127.0.0.1", 0))
+        taken.listen()
+        result = subprocess.run(["./run", "--port", str(taken.getsockname()[1])], cwd=copy,
+                                capture_output=True, text=True, timeout=60, check=False)
+    assert result.returncode == 1
+    assert "is taken by another program" in result.stderr
+    assert result.stdout == ""
+    assert not (copy / "build").exists()
+
+
+@pytest.mark.parametrize("program", ["run", "test"])
+@pytest.mark.parametrize("option", ["-h", "--help"])
+def test_Help_IsPrinted(program, option):
+    result = subprocess.run([SOURCE / program, option], capture_output=True, text=True, check=False)
+    assert (result.returncode, result.stderr) == (0, "")
+    assert f"Usage: ./{program} [" in result.stdout
+    assert all(part in result.stdout for part in ("-h", "--help"))
+
+
+@contextmanager
+def serving(checkout, port):
+    """./run until the end of the block; gives what it printed and its process."""
     process = subprocess.Popen(
         command("--port", port), cwd=checkout, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
         stderr=subprocess.STDOUT, text=True, start_new_session=True,
     )
-    printed = ""
-    for line in process.stdout:
-        printed += line
-        if "Ctrl-C" in line:
-            break
-    lines = re.findall(r"^  ((?:SID=|curl ).*)$", printed, re.MULTILINE)
-    assert len(lines) == 3, printed
-    answers = subprocess.run(
-        ["bash", "-c", "\n".join(lines)], capture_output=True, text=True, check=True
-    ).stdout
-    assert '"user":"alice"' in answers and '"api":"QELO.Catalog.API"' in answers
-    for account in ("admin", "alice", "bob"):
-        assert re.search(rf"^ +{account} +{account}-pw", printed, re.MULTILINE)
-
-    os.killpg(process.pid, signal.SIGINT)
-    assert process.wait(timeout=20) != 0
+    try:
+        printed = ""
+        for line in process.stdout:
+            printed += line
+            if "Ctrl-C" in line:
+                break
+        yield printed
+    finally:
+        os.killpg(process.pid, signal.SIGINT)
+        status = process.wait(timeout=20)
+        process.stdout.close()
+    assert status != 0
     assert is_free(port)
+
+
+def test_Serving_PrintsLinesThatWork_AndLeavesNothingBehind(checkout):
+    with serving(checkout, free_port()) as printed:
+        lines = re.findall(r"^  ((?:SID=|curl |/\S+/webapi-exec ).*)$", printed, re.MULTILINE)
+        assert len(lines) == 4, printed
+        answer = answer_of("\n".join(lines[:3]))
+        assert '"user":"alice"' in answer and '"api":"QELO.Catalog.API"' in answer
+        assert '"user":"alice"' in answer_of(lines[3])
+        for account in ("admin", "alice", "bob"):
+            assert re.search(rf"^ +{account} +{account}-pw", printed, re.MULTILINE)
+
+
+def test_SecondServer_HasADirectoryAndAProcessIdOfItsOwn(checkout):
+    build = checkout / "build" / "dev"
+    ports = free_port(), free_port()
+    note = "Another server of this tree gets the restarts that methods ask for"
+    with serving(checkout, ports[0]) as first:
+        pid = build / "root" / "run" / "web-server.pid"
+        process = pid.read_text()
+        with serving(checkout, ports[1]) as second:
+            assert note not in first and note in second
+            assert pid.read_text() == process
+            own = build / f"server-{ports[1]}"
+            assert (own / "web-server.pid").read_text() != process
+            for port in ports:
+                assert (build / f"server-{port}" / "lighttpd.conf").exists()
+                assert not is_free(port)
+                assert f"Logs are in {build}/server-{port}." in first + second
+        assert not is_free(ports[0])
+    with serving(checkout, ports[1]) as third:
+        assert note not in third
