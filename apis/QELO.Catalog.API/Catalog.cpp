@@ -44,17 +44,24 @@ class Catalogue {
     }
     Json::Value result(Json::objectValue);
     result["api"] = api;
-    for (const char* key :
-         {"minVersion", "maxVersion", "authLevel", "allowUser", "appPriv", "requestFormat"}) {
+    for (const char* key : {"minVersion", "maxVersion", "authLevel", "appPriv", "requestFormat"}) {
       if (JsonHelper::hasMember(description, key)) {
         result[key] = description[key];
       }
+    }
+    if (!IsForEverybody(description) && JsonHelper::hasMember(description, "allowUser")) {
+      result["allowUser"] = description["allowUser"];
     }
     result["methods"] = methods;
     return result;
   }
 
  private:
+  /// Whether nobody is asked who he is, so that "allowUser" means nothing.
+  static bool IsForEverybody(const Json::Value& description) {
+    return JsonHelper::member(description, "authLevel") == Json::Value(0);
+  }
+
   Json::Value Versions(const std::string& api, const Json::Value& description) {
     const int last = JsonHelper::asInt(JsonHelper::member(description, "maxVersion"));
     const Json::Value& listed = JsonHelper::member(description, "methods");
@@ -98,8 +105,9 @@ class Catalogue {
       return;
     }
     Json::Value& shown = methods[method] = Json::Value(Json::objectValue);
+    const bool showsUsers = !IsForEverybody(description);
     for (auto it = attributes.begin(); it != attributes.end(); ++it) {
-      if (it->isBool() || it.name() == "allowUser") {
+      if (it->isBool() || (it.name() == "allowUser" && showsUsers)) {
         shown[it.name()] = *it;
       }
     }

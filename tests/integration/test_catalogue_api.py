@@ -35,6 +35,18 @@ def test_List_TellsAttributes(client, admin):
     assert methods["asAlice"] == {}
 
 
+def test_List_TellsAllowUserOnlyWhereItIsAsked(client, alice, describe):
+    users = ["admin.local", "normal.local"]
+    methods = {"1": ["plain", {"own": {"allowUser": users, "allowTimeout": True}}]}
+    for level in (0, 1, 2):
+        describe("QELO.Test.Asked", "identity.so", authLevel=level, allowUser=users, methods=methods)
+        api = listed(client, alice)["QELO.Test.Asked"]
+        assert api["authLevel"] == level
+        asked = {"allowUser": users} if level else {}
+        assert api["methods"]["1"] == {"plain": {}, "own": {"allowTimeout": True, **asked}}
+        assert api.get("allowUser") == asked.get("allowUser")
+
+
 def test_List_WithPrefix_ShowsOnlyThose(client, alice):
     assert set(listed(client, alice, prefix="QELO.Acc")) == {"QELO.Access.Session"}
     assert set(listed(client, alice, prefix="NoSuch")) == set()
