@@ -43,10 +43,8 @@ install(CODE "execute_process(COMMAND chmod 1733 \"\$ENV{DESTDIR}${webapi_task_d
                               COMMAND_ERROR_IS_FATAL ANY)")
 get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
 install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
-file(GLOB webapi_api_readmes RELATIVE ${PROJECT_SOURCE_DIR} apis/*/README.md)
-foreach(readme ${webapi_api_readmes})
-  get_filename_component(folder ${readme} DIRECTORY)
-  get_filename_component(api ${folder} NAME)
-  install(FILES ${readme} DESTINATION ${CMAKE_INSTALL_DOCDIR}/apis RENAME ${api}.md)
-endforeach()
-install(FILES README.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR} OPTIONAL)
+
+# The documents stand to each other as in the source tree, so their links work.
+install(FILES README.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
+install(FILES packaging/lighttpd.conf.in DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
+install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)

@@ -1,13 +1,17 @@
 """What is installed on a host serves, and API libraries are built against it outside of this tree."""
 
 import ctypes
+import json
 import os
 import re
 import subprocess
+import textwrap
 
 import pytest
 
 from conftest import BUILD, SOURCE, answer_of, needs_root
+from documents import broken_links
+from webserver import free_port
 
 PLUGINS = SOURCE / "tests" / "plugins"
 DESCRIPTION = """
@@ -23,6 +27,18 @@ add_library(outside MODULE outside.cpp)
 set_target_properties(outside PROPERTIES PREFIX "")
 target_link_libraries(outside PRIVATE webapi::webapi)
 target_link_options(outside PRIVATE -Wl,--no-undefined)
+"""
+
+GUIDE = (SOURCE / "docs" / "installing.md").read_text()
+# Nothing that the guide does reaches the host: each directory is laid over with an empty one.
+OVERLAYS = """
+set -e
+mount -t tmpfs none {work}
+for name in usr etc var run; do
+  mkdir {work}/$name.upper {work}/$name.work
+  mount -t overlay overlay /$name \\
+    -o lowerdir=/$name,upperdir={work}/$name.upper,workdir={work}/$name.work
+done
 """
 
 
@@ -99,7 +115,25 @@ def test_Install_HoldsLibraryProgramsAndDescriptions(stage, prefix):
     assert "password_crypt.so" not in modules
     descriptions = {path.name for path in (stage / "usr/qelo/qeloman/webapi").iterdir()}
     assert {"lib.def", "QELO.Entry.Request.lib", "QELO.Access.Session.lib"} <= descriptions
-    assert next(prefix.rglob("QELO.Host.Info.md"))
+
+
+def test_InstalledDocuments_LeadToEachOther(prefix):
+    documents = prefix / "share" / "doc" / "webapi-ARDO5"
+    names = {str(path.relative_to(documents)) for path in documents.rglob("*") if path.is_file()}
+    assert {"README.md", "docs/description.md", "apis/QELO.Host.Info/README.md"} <= names
+    assert broken_links(sorted(documents.rglob("*.md"))) == []
+
+
+def test_Install_BelowAnotherPrefix_IsRefusedAndWritesNothing(stage, tmp_path):
+    """What is built names the configured prefix."""
+    result = subprocess.run(
+        ["cmake", "--install", BUILD / "host", "--prefix", tmp_path / "elsewhere"],
+        env={**os.environ, "DESTDIR": str(tmp_path / "stage")},
+        capture_output=True, text=True, check=False,
+    )
+    assert result.returncode != 0
+    assert "-DCMAKE_INSTALL_PREFIX=" in result.stderr
+    assert list(tmp_path.iterdir()) == []
 
 
 def test_Install_MakesTheDirectoryOfTaskRecords(stage):
@@ -157,3 +191,40 @@ def test_InstalledEntry_ServesAnApiLibraryBuiltOutside(stage, prefix, outside):
         check=True,
     )
     assert answer_of(result.stdout)["data"]["x"] == 5
+
+
+def step(name):
+    found = re.search(rf"<!-- test: {name} -->\n *```\w*\n(.*?)```", GUIDE, re.DOTALL)
+    return textwrap.dedent(found[1]).replace("build/host", str(BUILD / "host"))
+
+
+@needs_root
+def test_InstallingGuide_EndsWithALogin(stage, tmp_path):
+    """Its commands as they stand, by accounts of the host and PAM, the program set-user-id."""
+    work = tmp_path / "work"
+    work.mkdir()
+    overlays = OVERLAYS.format(work=work)
+    if subprocess.run(["unshare", "-m", "sh", "-c", overlays], capture_output=True).returncode != 0:
+        pytest.skip("files cannot be laid over the host's here: no overlay mount")
+    port = free_port()
+    configuration = step("lighttpd").replace("server.port = 80", f"server.port = {port}")
+    call = step("call").replace("127.0.0.1/", f"127.0.0.1:{port}/")
+    call = call.replace("NAME", "tina").replace("PASSWORD", "one 2 three")
+    script = "\n".join([
+        overlays,
+        "{",
+        "{ userdel -f tina; userdel -f system; groupdel administrators; } 2> /dev/null || true",
+        "useradd --no-create-home tina && echo 'tina:one 2 three' | chpasswd",
+        step("accounts"), step("install"), step("pam"), step("rights"),
+        "mkdir -p /var/www/html /var/log/lighttpd /var/cache/lighttpd/uploads",
+        "chown -R www-data: /var/log/lighttpd /var/cache/lighttpd",
+        f"cat > /etc/lighttpd/lighttpd.conf << 'END'\n{configuration}END",
+        "} > /dev/null",
+        "/usr/sbin/lighttpd -D -f /etc/lighttpd/lighttpd.conf & server=$!",
+        "trap 'kill $server' EXIT",
+        f"for i in $(seq 100); do (: > /dev/tcp/127.0.0.1/{port}) 2> /dev/null && break",
+        "  sleep 0.05; done",
+        call,
+    ])
+    answer = json.loads(run("unshare", "-m", "bash", "-c", script, cwd=tmp_path))
+    assert answer["data"]["user"] == "tina"
