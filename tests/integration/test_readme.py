@@ -4,10 +4,13 @@ import json
 import re
 import shutil
 import subprocess
+from pathlib import Path
 
-from conftest import DESCRIPTIONS, SOURCE
+from conftest import BUILD, DESCRIPTIONS, SOURCE
+from documents import broken_links
 
 README = (SOURCE / "README.md").read_text()
+DESCRIPTION = (SOURCE / "docs" / "description.md").read_text()
 PORT = "127.0.0.1:8080"
 
 
@@ -20,7 +23,7 @@ def block(name, text=README):
 
 def run(script, directory, port):
     script = "set -e\n" + script.replace(PORT, f"127.0.0.1:{port}")
-    script = script.replace("build/dev/root/usr/qelo/qeloman/webapi", str(DESCRIPTIONS))
+    script = script.replace("build/dev", str(BUILD))
     result = subprocess.run(
         ["bash", "-c", script], cwd=directory, capture_output=True, text=True, check=False
     )
@@ -35,11 +38,18 @@ def test_FirstCalls_Work(server, tmp_path):
     while output:
         answer, end = decoder.raw_decode(output)
         answers.append(answer["data"])
-        output = output[end:]
+        assert output[end] == "\n", "else the reader's prompt stands behind the answer"
+        output = output[end + 1 :]
     login, current, catalogue = answers
     assert set(login) == {"sid", "token", "user"}
     assert current["user"] == "alice"
     assert "QELO.Catalog.API" in {api["api"] for api in catalogue["apis"]}
+
+
+def test_CallWithAccessToken_Works(server, root, tmp_path):
+    preamble = f"URL=http://{PORT}/webapi/entry.cgi\n"
+    answer = json.loads(run(preamble + block("token"), tmp_path, server.port))
+    assert "hostName" in answer["data"]
 
 
 def test_CompoundExample_Works(server, alice, tmp_path):
@@ -61,13 +71,37 @@ def test_FirstApiLibrary_IsBuiltAndAnswers(server, tmp_path):
         run(block("build"), tmp_path, server.port)
         answer = json.loads(run(block("greeting"), tmp_path, server.port))
         assert answer == {"success": True, "data": {"greeting": "Hello, Ann"}}
+        number = block("greeting").replace("name=Ann", "name=5")
+        assert json.loads(run(number, tmp_path, server.port))["error"]["code"] == 101
+        text = block("greeting").replace("name=Ann", "name=%225%22")
+        answer = json.loads(run(text, tmp_path, server.port))
+        assert answer["data"]["greeting"] == "Hello, 5"
     finally:
         for name in ("Hello.so", "QELO.Hello.World.lib"):
+            (DESCRIPTIONS / name).unlink(missing_ok=True)
+
+
+def test_Download_IsBuiltAndSendsTheFile(server, alice, tmp_path):
+    (tmp_path / "Download.cpp").write_text(block("download-library", DESCRIPTION))
+    (tmp_path / "QELO.Hello.Download.lib").write_text(block("download-description", DESCRIPTION))
+    shutil.copytree(SOURCE / "include", tmp_path / "include")
+    preamble = f"URL=http://{PORT}/webapi/entry.cgi\nSID={alice['sid']}\n"
+    call = block("download-call", DESCRIPTION)
+    try:
+        run(block("download-build", DESCRIPTION), tmp_path, server.port)
+        run(preamble + call, tmp_path, server.port)
+        assert (tmp_path / "hostname").read_bytes() == Path("/etc/hostname").read_bytes()
+        absent = call.replace("/etc/hostname", "/no/such/file")
+        run(preamble + absent, tmp_path, server.port)
+        assert json.loads((tmp_path / "hostname").read_text())["error"]["code"] == 400
+    finally:
+        for name in ("Download.so", "QELO.Hello.Download.lib"):
             (DESCRIPTIONS / name).unlink(missing_ok=True)
 
 
 def test_Commands_AndLinks_Exist():
     for command in re.findall(r"^\./(\w+)", README, re.MULTILINE):
         assert (SOURCE / command).exists(), command
-    for link in re.findall(r"\]\(([^)#]+)\)", README):
-        assert link.startswith("http") or (SOURCE / link).exists(), link
+    folders = ("docs", "apis")
+    documents = [path for folder in folders for path in (SOURCE / folder).rglob("*.md")]
+    assert broken_links([SOURCE / "README.md", *sorted(documents)]) == []
