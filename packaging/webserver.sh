@@ -4,8 +4,8 @@
 webserver_pid=
 
 # webserver_start DIR PORT ENTRY PID [EXTRA]: serves ENTRY as /webapi/entry.cgi, with configuration
-# and logs in DIR; PID is the file for its process id, EXTRA one of further configuration. The server
-# ends with this shell, however that ends. Says why when it cannot start.
+# and logs in DIR; PID is the file for its process id, EXTRA one of further configuration. The
+# server ends with this shell, however that ends. Says why when it cannot start.
 webserver_start() {
   local dir=$1 port=$2 entry=$3 pid=$4 extra=${5:-} tries
   mkdir -p "$dir/www" "$dir/uploads"

@@ -39,7 +39,8 @@ def test_List_TellsAllowUserOnlyWhereItIsAsked(client, alice, describe):
     users = ["admin.local", "normal.local"]
     methods = {"1": ["plain", {"own": {"allowUser": users, "allowTimeout": True}}]}
     for level in (0, 1, 2):
-        describe("QELO.Test.Asked", "identity.so", authLevel=level, allowUser=users, methods=methods)
+        describe("QELO.Test.Asked", "identity.so",
+                 authLevel=level, allowUser=users, methods=methods)
         api = listed(client, alice)["QELO.Test.Asked"]
         assert api["authLevel"] == level
         asked = {"allowUser": users} if level else {}

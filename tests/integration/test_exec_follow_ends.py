@@ -195,7 +195,8 @@ def test_OtherSignal_AtTheQuestion_LeavesTheTerminalAsItWas(work, follow, number
     assert terminal.settings() == before
 
 
-@pytest.mark.parametrize("answer", ["s", "l", INTERRUPT, "\x04"], ids=["s", "l", "Ctrl-C", "Ctrl-D"])
+@pytest.mark.parametrize(
+    "answer", ["s", "l", INTERRUPT, "\x04"], ids=["s", "l", "Ctrl-C", "Ctrl-D"])
 def test_Answer_LeavesTheTerminalAsItWas(work, follow, answer):
     terminal = follow(*work(counts(1, 4)).arguments())
     before = terminal.settings()
