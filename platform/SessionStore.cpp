@@ -114,13 +114,13 @@ SessionStore::Result SessionStore::Read(const std::string& id, Session& session)
   return Result::kGood;
 }
 
-SessionStore::Result SessionStore::ReadLastUse(const std::string& id, timespec& lastUse) const {
+SessionStore::Result SessionStore::ReadLastUse(const std::string& id, timespec& lastUse) {
   if (!isSecretText(id)) {
     return Result::kMalformed;
   }
   struct stat info {};
-  if (!dir_ || fstatat(dir_.Get(), id.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0 ||
-      !S_ISREG(info.st_mode)) {
+  const std::string path = std::string(Paths::kSessionDir) + "/" + id;
+  if (lstat(path.c_str(), &info) != 0 || !S_ISREG(info.st_mode)) {
     return Result::kAbsent;
   }
   lastUse = info.st_mtim;

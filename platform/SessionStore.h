@@ -45,7 +45,7 @@ class SessionStore {
 
   Result Read(const std::string& id, Session& session) const;
   /// When the session was last used; all else of it is not looked at.
-  Result ReadLastUse(const std::string& id, timespec& lastUse) const;
+  static Result ReadLastUse(const std::string& id, timespec& lastUse);
   /// @param id, token  receive the new secrets
   bool Create(const Session& session, std::string& id, std::string& token) const;
   bool Remove(const std::string& id) const;

@@ -54,7 +54,7 @@ int QeloSessionRefresh(const char* id) {
 
 long QeloSessionSecondsLeft(const char* id) {
   timespec lastUse{};
-  if (SessionStore().ReadLastUse(id, lastUse) != SessionStore::Result::kGood) {
+  if (SessionStore::ReadLastUse(id, lastUse) != SessionStore::Result::kGood) {
     return -1;
   }
   return secondsLeft(lastUse, Settings().SessionTimeout());

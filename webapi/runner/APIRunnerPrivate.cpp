@@ -6,7 +6,6 @@
 #include <syslog.h>
 #include <unistd.h>
 
-#include <cstdio>
 #include <cstring>
 
 #include "webapi/model/Log.h"
@@ -56,13 +55,15 @@ void APIRunnerPrivate::SetArgv0(const std::string& name) {
     return;
   }
   memset(argv0_, 0, argv0Length_);
-  snprintf(argv0_, argv0Length_, "%s", name.c_str());
+  if (argv0Length_ > 0) {
+    strncpy(argv0_, name.c_str(), argv0Length_ - 1);
+  }
 }
 
 void APIRunnerPrivate::SetLogIdentity(const std::string& text) {
   static char identity[1024];  // syslog keeps the pointer
   closelog();
-  snprintf(identity, sizeof identity, "%s", LogText(text).c_str());
+  strncpy(identity, LogText(text).c_str(), sizeof identity - 1);
   openlog(identity, LOG_PID | LOG_CONS, 0);
 }
 

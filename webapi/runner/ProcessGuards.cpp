@@ -25,18 +25,15 @@ std::FILE* revived(std::FILE* stream, int descriptor, const char* mode) {
 
 }  // namespace
 
-bool NullDescriptor::Replace(int descriptor) {
-  const int former = fcntl(descriptor, F_DUPFD_CLOEXEC, kFirstOther);
-  if (former < 0 && errno != EBADF) {
+bool NullDescriptor::Replace(int descriptor, int null) {
+  // A descriptor that was closed is the lowest free one, so that /dev/null may stand there already.
+  const bool isInPlace = null == descriptor;
+  const int former = isInPlace ? -1 : fcntl(descriptor, F_DUPFD_CLOEXEC, kFirstOther);
+  if (!isInPlace && former < 0 && errno != EBADF) {
     return false;
   }
-  const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-  // The lowest number is free when the descriptor was closed before: then it is in place already.
-  const bool replaced = null == descriptor ? fcntl(null, F_SETFD, 0) == 0
-                                           : null >= 0 && dup2(null, descriptor) == descriptor;
-  if (null >= 0 && null != descriptor) {
-    close(null);
-  }
+  const bool replaced =
+      isInPlace ? fcntl(null, F_SETFD, 0) == 0 : null >= 0 && dup2(null, descriptor) == descriptor;
   if (!replaced) {
     if (former >= 0) {
       close(former);
@@ -71,15 +68,21 @@ StandardStreams* StandardStreams::innermost_ = nullptr;
 
 StandardStreams::StandardStreams(bool shutInput, bool shutOutput) : outer_(innermost_) {
   innermost_ = this;
+  const int null = shutInput || shutOutput ? open("/dev/null", O_RDWR | O_CLOEXEC) : -1;
   if (shutInput) {
     inputBuffer_ = std::cin.rdbuf();
-    isShut_ = input_.Replace(STDIN_FILENO);
+    isShut_ = input_.Replace(STDIN_FILENO, null);
   }
   if (shutOutput) {
     std::cout.flush();
     std::fflush(stdout);
     outputBuffer_ = std::cout.rdbuf();
-    isShut_ = output_.Replace(STDOUT_FILENO) && isShut_;
+    isShut_ = output_.Replace(STDOUT_FILENO, null) && isShut_;
+  }
+  const bool isInPlace =
+      (shutInput && null == STDIN_FILENO) || (shutOutput && null == STDOUT_FILENO);
+  if (null >= 0 && !isInPlace) {
+    close(null);
   }
 }
 

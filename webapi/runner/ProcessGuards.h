@@ -13,8 +13,9 @@ class NullDescriptor {
   NullDescriptor& operator=(const NullDescriptor&) = delete;
   ~NullDescriptor();
 
+  /// @param null  /dev/null, which the caller closes unless it is `descriptor` itself
   /// @return false, and the descriptor as it was, when it cannot be kept or replaced
-  bool Replace(int descriptor);
+  bool Replace(int descriptor, int null);
   /// Closes the former one, which then is not given back.
   void LetGo();
 
