@@ -70,6 +70,7 @@ class WEBAPI_API WebEntry : public APIRunner {
   int Authorise(bool allowTimeout);
   void FillSession(const std::string& user, bool isAuthorized);
   bool CoversInnerCall(const APIRequest& request);
+  bool KeepsIdle();
   bool IsAllowedUser(APIRequest* request);
 
   Json::Value temporaryFiles_;

@@ -267,6 +267,19 @@ def test_Watching_IsNoUseOfTheSession(alice, method):
     assert file.stat().st_mtime > before + 290
 
 
+@pytest.mark.parametrize("others, is_use", [([], False), (["list"], True)])
+def test_Watching_WithinACompoundRequest_IsUseOnlyWithOtherCalls(alice, others, is_use):
+    file = SESSIONS / alice.sid
+    os.utime(file, (time.time() - 300, time.time() - 300))
+    before = file.stat().st_mtime
+    entries = [
+        {"api": TASK, "version": 1, "method": method, "task_id": "alice/none", "timeout": 0}
+        for method in ("status", "wait", *others)
+    ]
+    alice.call("QELO.Entry.Request", "request", compound=json.dumps(entries))
+    assert (file.stat().st_mtime > before) == is_use
+
+
 @pytest.mark.parametrize("method", ["list", "stop"])
 def test_OtherCalls_AreUseOfTheSession(alice, method):
     file = SESSIONS / alice.sid

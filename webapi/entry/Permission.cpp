@@ -2,6 +2,7 @@
 
 #include <syslog.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <utility>
@@ -21,6 +22,7 @@
 namespace QELO {
 namespace {
 
+constexpr char kCompoundAPI[] = "QELO.Entry.Request";
 constexpr int kOptionSize = 1024;    ///< bytes of a session's option with its NUL
 constexpr int kTokenFailLine = 577;  ///< administrators' log filters know the message by this line
 
@@ -193,8 +195,7 @@ int WebEntry::Authorise(bool allowTimeout) {
   int result = AUTHORIZED_NO_SESSION;
   char user[kUserNameSize] = {};
   if (!request->GetSessionID().empty()) {
-    const QeloCgiAuthFlags flags{IsSessionFromParameter(*request) ? 1U : 0U,
-                                 GetMethodAttr(request, "keepIdle") ? 1U : 0U};
+    const QeloCgiAuthFlags flags{IsSessionFromParameter(*request) ? 1U : 0U, KeepsIdle() ? 1U : 0U};
     result = QeloCgiIsAuthorizedEx(Context(), &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
                                    GetMethodAttr(request, "skipCheckIP") ? 0 : 1);
   }
@@ -216,6 +217,21 @@ int WebEntry::Authorise(bool allowTimeout) {
   }
   FillSession(user, errorOf(result) == WEBAPI_ERR_NONE);
   return result;
+}
+
+/// Whether the request is no use of the session: its method says so, or those of all its entries
+/// do.
+bool WebEntry::KeepsIdle() {
+  constexpr char kAttribute[] = "keepIdle";
+  const Json::Value& entries = Request()->GetParamRef("compound", Json::Value::nullSingleton());
+  if (Request()->GetAPIClass() != kCompoundAPI || !entries.isArray()) {
+    return GetMethodAttr(Request(), kAttribute);
+  }
+  return std::all_of(entries.begin(), entries.end(), [&](const Json::Value& entry) {
+    return GetMethodAttr(JsonHelper::asString(JsonHelper::member(entry, "api")),
+                         JsonHelper::asInt(JsonHelper::member(entry, "version")),
+                         JsonHelper::asString(JsonHelper::member(entry, "method")), kAttribute);
+  });
 }
 
 void WebEntry::FillSession(const std::string& user, bool isAuthorized) {

@@ -166,6 +166,27 @@ TEST_F(Permission, CgiLibraryIsToldThatTheMethodKeepsTheSessionIdle) {
   EXPECT_EQ(platform->calls[platform->calls.size() - 2], "QeloCgiIsAuthorizedEx(0, 0, 1, idle)");
 }
 
+TEST_F(Permission, CompoundRequestKeepsTheSessionIdleWhenAllItsEntriesDo) {
+  Describe(kOpenToAll, R"({"keepIdle": true})");
+  const auto asked = [&](const std::string& entries) {
+    platform->calls.clear();
+    TestEntry entry;
+    MakeRequest(entry);
+    Json::Value params;
+    params["getParam"] = Parse(R"({"api": "QELO.Entry.Request", "version": 1, "method": "request",
+                                   "compound": )" +
+                               entries + "}");
+    entry.Request()->InitParam(params, false);
+    entry.CheckPermission(false);
+    return platform->calls.size() < 2 ? "" : platform->calls[platform->calls.size() - 2];
+  };
+  const std::string idle = R"({"api": "QELO.Test.Good", "version": 1, "method": "echo"})";
+  const std::string other = R"({"api": "QELO.Test.Good", "version": 1, "method": "other"})";
+  EXPECT_EQ(asked("[" + idle + "," + idle + "]"), "QeloCgiIsAuthorizedEx(0, 0, 1, idle)");
+  EXPECT_EQ(asked("[" + idle + "," + other + "]"), "QeloCgiIsAuthorizedEx(0, 0, 1)");
+  EXPECT_EQ(asked("[" + idle + ", 5]"), "QeloCgiIsAuthorizedEx(0, 0, 1)");
+}
+
 TEST_F(Permission, SecondCheckWithTheSameAllowanceAsksNobody) {
   Describe(kOpenToAll);
   MakeRequest(*entry_);
