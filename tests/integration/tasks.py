@@ -44,6 +44,21 @@ class User:
 
 
 @pytest.fixture
+def alice(client, started):
+    return User(client, "alice", started)
+
+
+@pytest.fixture
+def bob(client, started):
+    return User(client, "bob", started)
+
+
+@pytest.fixture
+def admin(client, started):
+    return User(client, "admin", started)
+
+
+@pytest.fixture
 def started():
     tasks = []
     yield tasks

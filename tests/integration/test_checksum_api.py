@@ -10,14 +10,9 @@ from urllib.parse import urlencode
 import pytest
 
 from conftest import BUILD, ROOT, answer_of, needs_root, run_entry
-from tasks import TASK, User, started  # noqa: F401  (a fixture)
+from tasks import TASK, alice, started  # noqa: F401  (fixtures)
 
 API = "QELO.Work.Checksum"
-
-
-@pytest.fixture
-def alice(client, started):  # noqa: F811
-    return User(client, "alice", started)
 
 
 @pytest.fixture

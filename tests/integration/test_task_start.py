@@ -11,17 +11,7 @@ import pytest
 
 from conftest import ENTRY, needs_root
 from exec_program import call
-from tasks import LONG, TASK, WORK, User, started  # noqa: F401
-
-
-@pytest.fixture
-def alice(client, started):  # noqa: F811
-    return User(client, "alice", started)
-
-
-@pytest.fixture
-def bob(client, started):  # noqa: F811
-    return User(client, "bob", started)
+from tasks import LONG, TASK, WORK, alice, bob, started  # noqa: F401
 
 
 def fastest(user, tries, **parameters):

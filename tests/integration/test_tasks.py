@@ -8,22 +8,8 @@ import time
 import pytest
 
 from conftest import SESSIONS
-from tasks import LONG, TASK, WORK, User, assert_ends, is_running, started  # noqa: F401
-
-
-@pytest.fixture
-def alice(client, started):  # noqa: F811
-    return User(client, "alice", started)
-
-
-@pytest.fixture
-def bob(client, started):  # noqa: F811
-    return User(client, "bob", started)
-
-
-@pytest.fixture
-def admin(client, started):  # noqa: F811
-    return User(client, "admin", started)
+from tasks import LONG, TASK, WORK, assert_ends, is_running
+from tasks import admin, alice, bob, started  # noqa: F401  (fixtures)
 
 
 # Status
