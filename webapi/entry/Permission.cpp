@@ -18,11 +18,11 @@
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Token.h"
+#include "webapi/runner/CompoundCall.h"
 
 namespace QELO {
 namespace {
 
-constexpr char kCompoundAPI[] = "QELO.Entry.Request";
 constexpr int kOptionSize = 1024;    ///< bytes of a session's option with its NUL
 constexpr int kTokenFailLine = 577;  ///< administrators' log filters know the message by this line
 

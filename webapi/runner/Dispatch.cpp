@@ -13,13 +13,12 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/platform/Core.h"
+#include "webapi/runner/CompoundCall.h"
 #include "webapi/runner/Fence.h"
 
 namespace QELO {
 namespace {
 
-constexpr char kEntryAPI[] = "QELO.Entry.Request";
-constexpr char kEntryMethod[] = "request";
 /// The answer goes first: callbacks may restart the server that carries it.
 constexpr unsigned kCallbackDelaySeconds = 1;
 
@@ -43,7 +42,7 @@ bool APIRunner::Process(APIRequest* request, APIResponse* response) {
     return false;
   }
   bool result = false;
-  if (request->GetAPIClass() == kEntryAPI) {
+  if (request->GetAPIClass() == kCompoundAPI) {
     result = ProcessEntry(request, response);
   } else if (CanProcessSocket(request)) {
     result = ProcessSocket(request, response);
@@ -55,7 +54,7 @@ bool APIRunner::Process(APIRequest* request, APIResponse* response) {
 }
 
 bool APIRunner::ProcessEntry(APIRequest* request, APIResponse* response) {
-  if (request->GetAPIMethod() != kEntryMethod) {
+  if (request->GetAPIMethod() != kCompoundMethod) {
     return false;
   }
   if (!request->HasParam("compound")) {
