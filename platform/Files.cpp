@@ -7,7 +7,7 @@
 #include <cstring>
 #include <string>
 
-#include "platform/KeyValueFile.h"
+#include "platform/Settings.h"
 #include "platform/UniqueFd.h"
 #include "webapi/platform/Core.h"
 
@@ -71,7 +71,7 @@ int QLIBCFileTouch(const char* path) {
 
 int QLIBCFileCheckKeyValue(const char* file, const char* key, const char* value, int ignoreCase) {
   std::string found;
-  if (!QELO::Platform::KeyValueFile(file).Get(key, found)) {
+  if (!QELO::Platform::readKeyValueFile(file)->Get(key, found)) {
     return 0;
   }
   const int order =

@@ -3,6 +3,7 @@
 #include <strings.h>
 
 #include <charconv>
+#include <cstring>
 
 #include "platform/KnownFile.h"
 #include "platform/PlatformPaths.h"
@@ -24,6 +25,10 @@ std::shared_ptr<const KeyValueFile> own() {
 }  // namespace
 
 Settings::Settings() : own_(own()) {}
+
+std::shared_ptr<const KeyValueFile> readKeyValueFile(const char* path) {
+  return strcmp(path, Paths::kSystemInfo) == 0 ? own() : std::make_shared<const KeyValueFile>(path);
+}
 
 std::string Settings::Get(std::string_view key, const char* fallback) const {
   std::string value;

@@ -31,4 +31,7 @@ class Settings {
   std::shared_ptr<const KeyValueFile> own_;
 };
 
+/// What a file of keys and values holds: of the settings' own file, what the process knows of it.
+std::shared_ptr<const KeyValueFile> readKeyValueFile(const char* path);
+
 }  // namespace QELO::Platform

@@ -224,7 +224,7 @@ int WebEntry::Authorise(bool allowTimeout) {
 bool WebEntry::KeepsIdle() {
   constexpr char kAttribute[] = "keepIdle";
   const Json::Value& entries = Request()->GetParamRef("compound", Json::Value::nullSingleton());
-  if (Request()->GetAPIClass() != kCompoundAPI || !entries.isArray()) {
+  if (!entries.isArray() || Request()->GetAPIClass() != kCompoundAPI) {
     return GetMethodAttr(Request(), kAttribute);
   }
   return std::all_of(entries.begin(), entries.end(), [&](const Json::Value& entry) {

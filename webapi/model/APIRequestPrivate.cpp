@@ -63,8 +63,8 @@ void APIRequestPrivate::InitParam(const Json::Value& params, bool replace) {
   }
   for (Json::Value& section : sections) {
     DecryptParam(section);
-    SetData("param", section, false);
     SetAPIDesc(section);
+    TakeData("param", std::move(section), false);
   }
 }
 

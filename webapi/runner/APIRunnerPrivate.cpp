@@ -13,20 +13,32 @@
 namespace QELO {
 namespace {
 
-/// The first argument up to its first space; "" when it cannot be read.
-std::string firstArgument() {
-  char text[1024] = {};
+constexpr size_t kLongestArgument = 1023;
+
+/// The process's arguments as the kernel shows them, up to the first NUL; "" when they cannot be
+/// read.
+std::string shownArgument() {
+  char text[kLongestArgument + 1] = {};
   const int fd = open("/proc/self/cmdline", O_RDONLY | O_CLOEXEC);
   if (fd < 0) {
     return "";
   }
-  const ssize_t count = read(fd, text, sizeof text - 1);
+  const ssize_t count = read(fd, text, kLongestArgument);
   close(fd);
-  if (count <= 0) {
-    return "";
+  return count > 0 ? text : "";
+}
+
+/// The first argument up to its first space. The kernel shows the memory that the C library's
+/// pointer leads to, but makes files for it that each process pays for: a hundredth of a call.
+/// Whether they can be read matters with a space alone, up to which the C library's name goes on.
+std::string firstArgument() {
+  const std::string own(program_invocation_name,
+                        strnlen(program_invocation_name, kLongestArgument));
+  if (own.find(' ') == std::string::npos) {
+    return own;
   }
-  const std::string argument = text;
-  return argument.substr(0, argument.find(' '));
+  const std::string shown = shownArgument();
+  return shown.substr(0, shown.find(' '));
 }
 
 }  // namespace
