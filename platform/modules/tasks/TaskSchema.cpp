@@ -197,19 +197,27 @@ bool renameToOld(int directory) {
   return true;
 }
 
-/// Renames the file that is open as the database, unless another process did before.
-bool setAside(const StoreDirectory& directory, sqlite3* database, const DatabaseFile& file,
+/// Sets a database that another version made aside. Another process may have done so at any moment
+/// since the file was found, and what it leaves fails in many ways.
+/// @param database  null when the file could not be opened
+/// @return whether the file is gone from its name now
+bool makeRoom(const StoreDirectory& directory, sqlite3* database, const DatabaseFile& file,
               std::string& error) {
   const UniqueFd lock = lockDirectory(directory);
-  if (lock && !(findDatabaseFile(directory) == file)) {
+  const int lockError = errno;
+  const DatabaseFile now = findDatabaseFile(directory);
+  if (lock && (!(now == file) || now == DatabaseFile{})) {
     return true;
+  }
+  if (database == nullptr || !isOfAnotherVersion(database)) {
+    return false;
   }
   if (lock) {
     // So that the file is whole by itself. Not before it is known to be the one with this log.
     sqlite3_wal_checkpoint_v2(database, nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
   }
   if (!lock || !renameToOld(directory.Fd())) {
-    error = strerror(errno);
+    error = strerror(lock ? errno : lockError);
     return false;
   }
   PLATFORM_LOG("TaskModule.cpp",
@@ -234,7 +242,7 @@ bool prepare(sqlite3* database, std::string& error) {
          hasOurSchema(database, error);
 }
 
-/// @param again  receives whether the database was set aside, and there may be another now
+/// @param again  receives whether the database was set aside, and there may be another
 sqlite3* openOnce(const StoreDirectory& directory, uid_t store, bool create, bool& missing,
                   std::string& error, bool& again) {
   missing = false;
@@ -248,10 +256,10 @@ sqlite3* openOnce(const StoreDirectory& directory, uid_t store, bool create, boo
   missing = false;
   const DatabaseFile file = findDatabaseFile(directory);
   sqlite3* database = openFile(directory.Path() + "/" + kTaskDatabase, error);
-  if (database == nullptr || prepare(database, error)) {
+  if (database != nullptr && prepare(database, error)) {
     return database;
   }
-  again = isOfAnotherVersion(database) && setAside(directory, database, file, error);
+  again = makeRoom(directory, database, file, error);
   sqlite3_close(database);
   return nullptr;
 }
