@@ -71,6 +71,7 @@ StandardStreams::StandardStreams(bool shutInput, bool shutOutput) : outer_(inner
   const int null = shutInput || shutOutput ? open("/dev/null", O_RDWR | O_CLOEXEC) : -1;
   if (shutInput) {
     inputBuffer_ = std::cin.rdbuf();
+    readAhead_.Hide();
     isShut_ = input_.Replace(STDIN_FILENO, null);
   }
   if (shutOutput) {
@@ -97,6 +98,7 @@ StandardStreams::~StandardStreams() {
   if (inputBuffer_ != nullptr) {
     std::cin.rdbuf(inputBuffer_);
     stdin = revived(stdin, STDIN_FILENO, "r");
+    readAhead_.GiveBack();
   }
 }
 

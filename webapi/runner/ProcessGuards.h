@@ -2,6 +2,8 @@
 
 #include <streambuf>
 
+#include "webapi/runner/ReadAhead.h"
+
 namespace QELO {
 
 /// Puts /dev/null in the place of one standard descriptor, and gives the former one back at the
@@ -28,7 +30,7 @@ class NullDescriptor {
 ///
 /// Each stream exists three times, and an API library may use any of them: the C++ stream, the C
 /// stream and the descriptor. The first two end in the third, which is /dev/null meanwhile; what
-/// was written before goes out before.
+/// was written before goes out before, and what was read before stays for who comes after.
 class StandardStreams {
  public:
   StandardStreams(bool shutInput, bool shutOutput);
@@ -46,6 +48,7 @@ class StandardStreams {
  private:
   NullDescriptor input_;
   NullDescriptor output_;
+  ReadAhead readAhead_;
   std::streambuf* inputBuffer_ = nullptr;
   std::streambuf* outputBuffer_ = nullptr;
   bool isShut_ = true;

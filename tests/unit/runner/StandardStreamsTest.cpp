@@ -1,5 +1,8 @@
 #include <fcntl.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
+#include <functional>
 #include <iostream>
 
 #include "tests/unit/runner/RunnerFixture.h"
@@ -74,6 +77,37 @@ TEST_F(Streams, DownloadMethodPrints) {
 TEST_F(Streams, MethodReadsEndOfFileAtOnce) {
   Output("reading", "{}");
   EXPECT_EQ(Data(), Parse(R"({"stream": "", "file": 0, "descriptor": 0})"));
+}
+
+/// In a process of its own, whose streams nothing else has used.
+int inChild(const std::function<bool()>& succeeds) {
+  const pid_t child = fork();
+  if (child == 0) {
+    _exit(succeeds() ? 0 : 1);
+  }
+  int status = -1;
+  waitpid(child, &status, 0);
+  return status;
+}
+
+TEST_F(Streams, MethodReadsNothingOfWhatTheProcessHasReadAhead) {
+  Write((directory / "words").string(), "first second third");
+  for (const bool synchronised : {true, false}) {
+    EXPECT_EQ(inChild([&] {
+                std::ios::sync_with_stdio(synchronised);
+                const int words = open((directory / "words").c_str(), O_RDONLY);
+                dup2(words, 0);
+                std::string former;
+                std::string next;
+                std::cin >> former;
+                ProcessPlugin("reading", "{}");
+                std::cin >> next;
+                return former == "first" && next == "second" &&
+                       Data() == Parse(R"({"stream": "", "file": 0, "descriptor": 0})");
+              }),
+              0)
+        << synchronised;
+  }
 }
 
 TEST_F(Streams, UploadMethodReadsTheInput) {
