@@ -4,7 +4,7 @@
 #include <errno.h>
 #include <glob.h>
 
-#include <algorithm>
+#include <string_view>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIRunner.h"
@@ -19,12 +19,10 @@ namespace {
 constexpr int kMaxPriority = 10;
 constexpr int kMaxCandidates = 4;
 
-/// API names become file names, and clients choose them: nothing that leads out of the directory.
+/// API names become file names, and clients choose them: nothing that leads out of the directory,
+/// and nothing that ends a path before its suffix.
 bool isFileName(const std::string& api) {
-  return std::all_of(api.begin(), api.end(), [](unsigned char c) {
-    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' ||
-           c == '_' || c == '-';
-  });
+  return api.find_first_of(std::string_view("/\0", 2)) == std::string::npos;
 }
 
 /// The description file of an API: of QELO.A.lib, QELO.A.B.lib, ... the longest that exists.
@@ -64,6 +62,9 @@ bool APIRunner::CheckLibDescription(const Json::Value& description) const {
 }
 
 Json::Value& APIRunner::ApplyLibDef(Json::Value& description) const {
+  if (!description.isObject() && !description.isNull()) {
+    return description;
+  }
   for (const char* key : {"authLevel", "allowUser", "requestFormat", "priority"}) {
     if (!JsonHelper::hasMember(description, key)) {
       description[key] = key == std::string("requestFormat") ? Json::Value("JSON")
@@ -74,7 +75,7 @@ Json::Value& APIRunner::ApplyLibDef(Json::Value& description) const {
 }
 
 void APIRunner::AddDescriptions(Json::Value& target, Json::Value& file) const {
-  if (!file.isObject()) {
+  if (!file.isObject() || !(target.isObject() || target.isNull())) {
     return;
   }
   for (auto it = file.begin(); it != file.end(); ++it) {

@@ -200,11 +200,32 @@ TEST_F(Catalogue, NameThatLeavesTheDirectoryIsNeverOpened) {
   WriteNamed("QELO.A.lib", "QELO.A", "x");
   std::filesystem::current_path(outside);
   TestRunner tested;
-  for (const std::string& api : {std::string("../QELO.A"), directory.string() + "/QELO.A",
-                                 std::string("QELO.A\0x", 8), std::string("QELO A")}) {
+  for (const std::string& api :
+       {std::string("../QELO.A"), directory.string() + "/QELO.A", std::string("QELO.A\0x", 8)}) {
     EXPECT_FALSE(tested.InitLibDesc(catalogue, api)) << api;
   }
   EXPECT_TRUE(catalogue.empty());
+}
+
+TEST_F(Catalogue, NameOfAnyLettersFindsItsFile) {
+  TestRunner tested;
+  for (const char* api : {"QELO.My API", "QELO.B+C", "QELO.\xc3\x84", "QELO.x~y"}) {
+    WriteNamed(std::string(api) + ".lib", api, "x");
+    EXPECT_TRUE(tested.InitLibDesc(catalogue, api)) << api;
+    EXPECT_TRUE(JsonHelper::hasMember(catalogue, api)) << api;
+  }
+}
+
+TEST_F(Catalogue, WhatCanHoldNoDescriptionsStaysAsItIs) {
+  TestRunner tested;
+  WriteNamed("QELO.A.lib", "QELO.A", "x");
+  for (const char* text : {"[]", "3", "\"s\"", "true"}) {
+    Json::Value value = Parse(text);
+    EXPECT_EQ(tested.ApplyLibDef(value), Parse(text));
+    EXPECT_TRUE(tested.InitLibDesc(value, "QELO.A"));
+    EXPECT_TRUE(tested.InitLibDesc(value));
+    EXPECT_EQ(value, Parse(text));
+  }
 }
 
 TEST_F(Catalogue, LoadingAllReadsEveryGoodFile) {
