@@ -12,6 +12,7 @@
 
 namespace QELO {
 
+class APIPollingPrivate;
 class APIRequest;
 class APIResponsePrivate;
 
@@ -87,6 +88,8 @@ class WEBAPI_API APIResponse {
   void Deserialize(Json::Value& record);
 
  private:
+  friend class APIPollingPrivate;  // asks what became of the last result
+
   std::unique_ptr<APIResponsePrivate> private_;
 };
 

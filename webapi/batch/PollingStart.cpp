@@ -14,7 +14,7 @@
 #include "webapi/batch/APIPollingPrivate.h"
 #include "webapi/batch/PollingPipes.h"
 #include "webapi/batch/PollingTerms.h"
-#include "webapi/model/APIResponseTask.h"
+#include "webapi/model/APIResponsePrivate.h"
 #include "webapi/model/Log.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Task.h"
@@ -173,9 +173,7 @@ void APIPollingPrivate::FinishTask(ARDO::Task& task, APIResponse* response, bool
   if (!task.reload()) {
     return;  // it was removed meanwhile
   }
-  const bool refused = JsonHelper::asBool(
-      JsonHelper::member(JsonHelper::member(response->Serialize(), "option"), kResultRefused));
-  if (!returned || refused || !task.hasProperty("task_run")) {
+  if (!returned || response->private_->TaskLacksResult() || !task.hasProperty("task_run")) {
     response->SetError(WEBAPI_ERR_NO_ANSWER);
   }
   if (task.reload() && !task.finish(task.getBoolProperty("auto_remove", false)) && task.reload()) {

@@ -35,6 +35,8 @@ class APIResponsePrivate : public APIBase {
   void SetCallbackFunc(APIResponse::CallbackFunc function, void* argument);
 
   APIResponse::CallbackList& callbacks() { return callbacks_; }
+  /// Whether a background task could not store the result that it was given last.
+  bool TaskLacksResult() const { return lacksResult_; }
 
  private:
   /// "; expires=..." of a cookie, or "".
@@ -49,6 +51,7 @@ class APIResponsePrivate : public APIBase {
   APIResponse* owner_;
   std::unique_ptr<ARDO::Task> task_;  ///< null until a background task sets a result
   pid_t taskProcess_ = 0;             ///< the one that made the handle
+  bool lacksResult_ = false;
   APIResponse::CallbackList callbacks_;
 };
 

@@ -1,7 +1,5 @@
 // A response within a background task: each result it is given is the task's at once.
 
-#include "webapi/model/APIResponseTask.h"
-
 #include <unistd.h>
 
 #include "webapi/APIRequest.h"
@@ -37,15 +35,11 @@ void APIResponsePrivate::UpdateTask() {
   task_->beginUpdate();
   task_->setProperty("body", store_["body"]);
   task_->setProperty("task_run", true);
-  Json::Value& option = store_["option"];
-  if (task_->endUpdate()) {
-    if (JsonHelper::hasMember(option, kResultRefused)) {
-      option.removeMember(kResultRefused);
-    }
-  } else if (task_->reload()) {  // else it was removed, and nobody wants its results
+  // One that was removed is no failure: nobody wants its results.
+  lacksResult_ = !task_->endUpdate() && task_->reload();
+  if (lacksResult_) {
     WEBAPI_LOG("APIPolling.cpp", "cannot store a result of task id[%s]",
                LogText(task_->getTaskId()).c_str());
-    option[kResultRefused] = true;
   }
 }
 

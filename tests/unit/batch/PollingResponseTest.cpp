@@ -87,5 +87,23 @@ TEST_F(PollingResponse, IsSetAlsoWhenTheTaskCannotBeStored) {
   EXPECT_TRUE(Property("alice", "1", "body").isNull());
 }
 
+TEST_F(PollingResponse, AddsNothingToTheRecordWhateverItHolds) {
+  for (const bool stored : {true, false}) {
+    tasks->endUpdate = stored;
+    for (const char* option : {"{}", "null", "\"text\"", "[1]", "7"}) {
+      Json::Value record = Parse(R"({"code":0,"headers":{}})");
+      record["option"] = Parse(option);
+      response->Deserialize(record);
+      response->SetSuccess("x");
+      EXPECT_EQ(response->Serialize()["option"], Parse(option)) << stored;
+    }
+    Json::Value bare = Parse(R"({"code":0,"headers":{}})");
+    response->Deserialize(bare);
+    response->SetSuccess("x");
+    EXPECT_EQ(response->Serialize().getMemberNames(),
+              (std::vector<std::string>{"body", "code", "headers"}));
+  }
+}
+
 }  // namespace
 }  // namespace QELO
