@@ -68,7 +68,7 @@ class WEBAPI_API WebEntry : public APIRunner {
   bool RewriteCredentials();
   const Json::Value& KnownResult(bool allowTimeout) const;
   int Authorise(bool allowTimeout);
-  void FillSession(const std::string& user, bool isAuthorized);
+  void FillSession(const std::string& user, const std::string& language, bool isAuthorized);
   bool CoversInnerCall(const APIRequest& request);
   bool KeepsIdle();
   bool IsAllowedUser(APIRequest* request);

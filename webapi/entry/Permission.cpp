@@ -194,6 +194,7 @@ int WebEntry::Authorise(bool allowTimeout) {
   APIRequest* request = Request();
   int result = AUTHORIZED_NO_SESSION;
   char user[kUserNameSize] = {};
+  const std::string language = QeloCgiGetLang(Context());
   if (!request->GetSessionID().empty()) {
     const QeloCgiAuthFlags flags{IsSessionFromParameter(*request) ? 1U : 0U, KeepsIdle() ? 1U : 0U};
     result = QeloCgiIsAuthorizedEx(Context(), &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
@@ -204,10 +205,12 @@ int WebEntry::Authorise(bool allowTimeout) {
     if (token == nullptr || *token == '\0') {
       return result;
     }
-    // Nothing of a refused session may stay: a method could act on it in the token's name.
-    memset(user, 0, sizeof user);
-    request->SetCookie("id", "");
-    QeloCgiInit("", Context());
+    if (!request->GetSessionID().empty()) {
+      // Nothing of a refused session may stay: a method could act on it in the token's name.
+      memset(user, 0, sizeof user);
+      request->SetCookie("id", "");
+      QeloCgiInit("", Context());
+    }
     const bool granted = IsTokenGranted(*request, user, kUserNameSize);
     result = granted ? AUTHORIZED_YES : AUTHORIZED_UNAUTHENTICATED;
     permission_["token"] = granted;
@@ -215,7 +218,7 @@ int WebEntry::Authorise(bool allowTimeout) {
       user[0] = '\0';
     }
   }
-  FillSession(user, errorOf(result) == WEBAPI_ERR_NONE);
+  FillSession(user, language, errorOf(result) == WEBAPI_ERR_NONE);
   return result;
 }
 
@@ -234,7 +237,8 @@ bool WebEntry::KeepsIdle() {
   });
 }
 
-void WebEntry::FillSession(const std::string& user, bool isAuthorized) {
+void WebEntry::FillSession(const std::string& user, const std::string& language,
+                           bool isAuthorized) {
   setenv("QELO_WEBAPI_USERNAME", user.c_str(), 1);
   Json::Value session(Json::objectValue);
   session["username"] = user;
@@ -244,7 +248,7 @@ void WebEntry::FillSession(const std::string& user, bool isAuthorized) {
   session["timeout"] =
       static_cast<Json::Int64>(strtol(optionOf(Context(), "timeout", "0").c_str(), nullptr, 10));
   session["isSkipCheckIP"] = optionOf(Context(), "skipcheckip") == "1";
-  session["uiLang"] = QeloCgiGetLang(Context());
+  session["uiLang"] = language;
   session["app"] = optionOf(Context(), "app");
   session["webapi"] = optionOf(Context(), "webapi");
   session["isAuthorized"] = isAuthorized;

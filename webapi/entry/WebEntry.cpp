@@ -43,7 +43,7 @@ std::string environmentText(const char* name) {
 /// @return false, logged, when the variable cannot be set
 bool putEnvironment(const char* name, const std::string& value) {
   if (setenv(name, value.c_str(), 1) != 0) {
-    WEBAPI_LOG("WebEntry", "cannot set %s [%m]", name);
+    WEBAPI_LOG("WebEntry.cpp", "cannot set %s [%m]", name);
     return false;
   }
   return true;
@@ -90,7 +90,7 @@ bool WebEntry::Run(const Json::Value&) {
   try {
     Serve();
   } catch (const std::exception& error) {  // no memory, most likely; the client gets an answer
-    WEBAPI_LOG("WebEntry", "%s", error.what());
+    WEBAPI_LOG("WebEntry.cpp", "%s", error.what());
     Response()->SetError(WEBAPI_ERR_NO_ANSWER);
   }
   if (Response()->IsEnableOutput()) {

@@ -5,6 +5,7 @@
 #include <sys/prctl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <utility>
 
 #include "webapi/APIRequest.h"
@@ -17,6 +18,11 @@
 #include "webapi/runner/APIRunnerPrivate.h"
 
 namespace QELO {
+namespace {
+
+constexpr size_t kLongestName = 1023;  ///< bytes
+
+}  // namespace
 
 APIRunner::APIRunner()
     : libDef(Json::objectValue),
@@ -119,9 +125,12 @@ bool APIRunner::SetProcessName(APIRequest* request, APIResponse* response) {
     response->SetError(WEBAPI_ERR_BAD_REQUEST);
     return false;
   }
-  const std::string call =
-      api + "_" + std::to_string(request->GetAPIVersion()) + "_" + request->GetAPIMethod();
-  const std::string full = private_->GetProcName() + "_" + call;
+  // Names are C text to the system: each part ends at its NUL, and none is endless.
+  const std::string call = std::string(api.c_str()) + "_" +
+                           std::to_string(request->GetAPIVersion()) + "_" +
+                           request->GetAPIMethod().c_str();
+  std::string full = private_->GetProcName() + "_" + call;
+  full.resize(std::min(full.size(), kLongestName));
   APIRunnerPrivate::SetLogIdentity(full);
   private_->SetArgv0(full);
   if (prctl(PR_SET_NAME, call.substr(0, 16).c_str()) != 0) {
