@@ -166,7 +166,8 @@ bool APIRequestPrivate::IsUploadRequest() const {
 }
 
 bool APIRequestPrivate::IsSliceUploadRequest() const {
-  return strcasecmp(Text("environ", "HTTP_X_TYPE_NAME").c_str(), "SLICEUPLOAD") == 0;
+  const std::string type = Text("environ", "HTTP_X_TYPE_NAME");
+  return !type.empty() && strcasecmp(type.c_str(), "SLICEUPLOAD") == 0;
 }
 
 std::string APIRequestPrivate::GetCookie(const std::string& name, const std::string& def) const {
