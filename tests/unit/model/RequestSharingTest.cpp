@@ -115,6 +115,15 @@ TEST(RequestSharingUrl, OfACopyIsComputedForTheRequestCopiedFrom) {
   EXPECT_EQ(copy.GetSharingURL(""), "sharing:first");
 }
 
+TEST(RequestSharingUrl, TypeComputedBeforeTheCopyIsTheCopysToo) {
+  FakePlatform::Reset();
+  const APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas","REWRITE_APP":"photo"})");
+  EXPECT_EQ(request.GetSharingURLType(), sharing::SHARING_URL_REWRITE);
+  const APIRequest copy(request);
+  EXPECT_EQ(copy.GetSharingURLType(), sharing::SHARING_URL_REWRITE);
+  EXPECT_EQ(FakePlatform::Get().calls.size(), 1u);
+}
+
 TEST(RequestSharingUrl, TravelsWithTheRecordAndIsNotAskedForAgain) {
   FakePlatform::Reset();
   APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas","HOST":"h"})");
