@@ -135,6 +135,17 @@ TEST(ResponseStatus, IsRefusedWhenTheHeaderCannotBeStored) {
   EXPECT_EQ(response.Serialize(), json(R"({"option":{}})"));
 }
 
+TEST(ResponseStatus, IsRefusedWhenItsMessageAloneCannotBeStored) {
+  APIResponse response(nullptr);
+  for (const char* text : {R"({"headers":{}})", R"({"headers":{},"option":"text"})",
+                           R"({"headers":{},"option":[]})"}) {
+    Json::Value record = json(text);
+    response.Deserialize(record);
+    EXPECT_FALSE(response.SetStatus(HTTP_STATUS_NOT_FOUND, "gone")) << text;
+    EXPECT_EQ(response.GetHeader("Status", ""), "404") << text;
+  }
+}
+
 TEST(ResponseRedirect, NamesTheHostThatTheClientCalledAndSetsTheStatus) {
   APIRequest request = requestWithEnv(R"({"HTTP_HOST":"nas:5001","HTTPS":"on"})");
   APIResponse response(&request);
