@@ -85,6 +85,10 @@ void note(const std::string& call) {
   FakeTask::Get().calls.push_back(call);
 }
 
+void noteStep(const std::string& step) {
+  FakeTask::Get().updateSteps.push_back(step);
+}
+
 }  // namespace
 
 FakeTask& FakeTask::Get() {
@@ -165,6 +169,7 @@ Task::Task(const std::string& owner, const std::string& taskId)
 Task::~Task() = default;
 
 void Task::beginUpdate() {
+  noteStep("beginUpdate");
   private_->updating = true;
   private_->pending = Json::Value(Json::objectValue);
 }
@@ -174,11 +179,13 @@ bool Task::setProperty(const std::string& name, const Json::Value& value) {
   if (single) {
     beginUpdate();
   }
+  noteStep("setProperty(" + name + ")");
   private_->pending[name] = value;
   return !single || endUpdate();
 }
 
 bool Task::endUpdate() {
+  noteStep("endUpdate");
   const std::string text = QELO::JsonHelper::toString(private_->pending);
   note("endUpdate(" + text + ")");
   private_->updating = false;

@@ -16,6 +16,9 @@ struct FakeTask {
 
   /// Calls of this process: "Operation(argument, ...)" in order. A child's are its own.
   std::vector<std::string> calls;
+  /// The steps of updates of this process: "beginUpdate", "setProperty(name)" and "endUpdate" in
+  /// order; a property that is set outside of an update has one of its own.
+  std::vector<std::string> updateSteps;
 
   std::string nextId = "id1";       ///< what getUniqueID appends to the prefix
   bool endUpdate = true;            ///< false: nothing is stored

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <string>
+#include <vector>
 
 #include "tests/support/FakeTask.h"
 #include "tests/unit/model/RequestFixture.h"
@@ -39,6 +40,16 @@ TEST_F(ResponseTask, HasEachResultAtOnceThroughOneHandle) {
   response_.SetError(105);
   EXPECT_EQ(property("1", "body"), json(R"({"error":{"code":105},"success":false})"));
   EXPECT_EQ(handles(), 1);
+}
+
+TEST_F(ResponseTask, HasBodyAndMarkOfEachResultFromOneUpdate) {
+  const std::vector<std::string> update{"beginUpdate", "setProperty(body)", "setProperty(task_run)",
+                                        "endUpdate"};
+  response_.SetSuccess("data");
+  EXPECT_EQ(FakeTask::Get().updateSteps, update);
+  FakeTask::Get().updateSteps.clear();
+  response_.SetError(105);
+  EXPECT_EQ(FakeTask::Get().updateSteps, update);
 }
 
 TEST_F(ResponseTask, IsUntouchedByARequestThatIsNone) {
