@@ -19,6 +19,13 @@ class RequestCheck : public RunnerTest {
                                        "2": "no list", "3": [7, null, "later"]})");
     WriteDescription(description);
   }
+  /// Describes these versions; "run" is listed for 1 to 3 whatever they are.
+  static void WriteVersions(int lowest, int highest) {
+    Json::Value description = Description("state");
+    description["minVersion"] = lowest;
+    description["maxVersion"] = highest;
+    WriteDescription(description);
+  }
   int Check(const std::string& api, int version, const std::string& method) {
     MakeRequest(api, version, method);
     const bool passed = TestRunner().CheckRequestParam(request.get(), response.get());
@@ -43,6 +50,19 @@ TEST_F(RequestCheck, VersionBoundsAreInclusive) {
   EXPECT_EQ(Check("QELO.Test.Call", 1, "plain"), 0);
   EXPECT_EQ(Check("QELO.Test.Call", 3, "later"), 0);
   EXPECT_EQ(Check("QELO.Test.Call", 4, "plain"), 104);
+}
+
+TEST_F(RequestCheck, VersionBelowTheLowestIs104ThoughItsMethodsAreListed) {
+  WriteVersions(3, 5);
+  EXPECT_EQ(Check("QELO.Test.Call", 2, "run"), 104);
+  EXPECT_EQ(Check("QELO.Test.Call", 3, "run"), 0);
+}
+
+TEST_F(RequestCheck, NoVersionPassesWhenTheLowestIsAboveTheHighest) {
+  WriteVersions(3, 1);
+  for (const int version : {1, 2, 3}) {
+    EXPECT_EQ(Check("QELO.Test.Call", version, "run"), 104) << version;
+  }
 }
 
 TEST_F(RequestCheck, MethodNotListedForTheVersionIs103) {
@@ -219,6 +239,21 @@ TEST_F(Dispatch, EntryWithoutCompoundIs110AndOtherMethodsSetNothing) {
   EXPECT_FALSE(tested.ProcessEntry(request.get(), response.get()));
   EXPECT_EQ(response->GetError(), 0);
   EXPECT_EQ(response->GetBody(), Json::Value(Json::objectValue));
+}
+
+TEST_F(Dispatch, CompoundApiHasNoOtherMethodThoughItsDescriptionListsOne) {
+  WriteDescription(Description("state"));
+  WriteDescription(Parse(R"({"lib": "", "minVersion": 1, "maxVersion": 1,
+                             "methods": {"1": ["request", "list"]}})"),
+                   "QELO.Entry.Request");
+  MakeRequest("QELO.Entry.Request", 1, "list", Parse(R"({"compound": [
+      {"api": "QELO.Test.Call", "version": 1, "method": "run"}]})"));
+  TestRunner tested;
+  ASSERT_TRUE(tested.CheckRequestParam(request.get(), response.get()));
+  EXPECT_FALSE(tested.Process(request.get(), response.get()));
+  EXPECT_EQ(response->GetError(), 0);
+  EXPECT_EQ(response->GetBody(), Json::Value(Json::objectValue));
+  EXPECT_EQ(tested.asked, "");
 }
 
 /// Writes one byte for each call into the descriptor that the argument points to.
