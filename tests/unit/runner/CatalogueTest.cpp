@@ -139,6 +139,25 @@ TEST_F(Catalogue, NameOfManyDotsIsSoughtByItsFirstFiveComponents) {
   EXPECT_EQ(LibOf(catalogue, "Q.A.B.C.D.E"), "five");
 }
 
+TEST_F(Catalogue, NameOfManyDotsIsSoughtByItsFirstTwoToFiveComponents) {
+  for (const std::string file : {"Q.A", "Q.A.B", "Q.A.B.C", "Q.A.B.C.D"}) {
+    WriteNamed(file + ".lib", "Q.A.B.C.D.E", file);
+    Json::Value alone(Json::objectValue);
+    EXPECT_TRUE(TestRunner().InitLibDesc(alone, "Q.A.B.C.D.E")) << file;
+    EXPECT_EQ(LibOf(alone, "Q.A.B.C.D.E"), file);
+    std::filesystem::remove(file + ".lib");
+  }
+}
+
+TEST_F(Catalogue, LongestOfTheFilesOfANameOfManyDotsWins) {
+  for (const std::string file : {"Q.A", "Q.A.B", "Q.A.B.C", "Q.A.B.C.D"}) {
+    WriteNamed(file + ".lib", "Q.A.B.C.D.E", file);  // besides the shorter ones
+    Json::Value longest(Json::objectValue);
+    EXPECT_TRUE(TestRunner().InitLibDesc(longest, "Q.A.B.C.D.E")) << file;
+    EXPECT_EQ(LibOf(longest, "Q.A.B.C.D.E"), file);
+  }
+}
+
 TEST_F(Catalogue, OneFileDescribesSeveralApis) {
   Json::Value file;
   file["QELO.A.B"] = Valid();
@@ -157,6 +176,31 @@ TEST_F(Catalogue, ApiAbsentFromItsFileLoadsButIsNotAdded) {
   MakeRequest("QELO.A.B", 1, "get");
   EXPECT_TRUE(tested.InitLibDesc(catalogue, "QELO.A.B"));
   EXPECT_FALSE(tested.AddAPIInfo(request.get()));
+}
+
+TEST_F(Catalogue, ApiAbsentFromTheFileThatItsRunnerLoadedIsNotAdded) {
+  WriteNamed("QELO.A.lib", "QELO.A.Other", "x");
+  TestRunner tested;
+  MakeRequest("QELO.A.B", 1, "get");
+  EXPECT_FALSE(tested.CheckRequestParam(request.get(), response.get()));
+  EXPECT_TRUE(SyslogCapture::Messages().empty());  // the load itself went well
+  EXPECT_FALSE(tested.AddAPIInfo(request.get()));
+  EXPECT_EQ(request->GetAPIInfo("lib", "none"), Json::Value("none"));
+  MakeRequest("QELO.A.Other", 1, "get");
+  EXPECT_TRUE(tested.AddAPIInfo(request.get()));
+  EXPECT_EQ(request->GetAPIInfo("lib", "none"), Json::Value("x"));
+}
+
+TEST_F(Catalogue, AddingADescriptionLoadsNoFile) {
+  WriteNamed("QELO.A.lib", "QELO.A.B", "x");
+  TestRunner tested;
+  MakeRequest("QELO.A.B", 1, "get");
+  EXPECT_FALSE(tested.AddAPIInfo(request.get()));
+  EXPECT_EQ(request->GetAPIInfo("lib", "none"), Json::Value("none"));
+  tested.GetMethod("QELO.A.B", 1, "get");  // loads it
+  std::filesystem::remove("QELO.A.lib");
+  EXPECT_TRUE(tested.AddAPIInfo(request.get()));
+  EXPECT_EQ(request->GetAPIInfo("lib", "none"), Json::Value("x"));
 }
 
 TEST_F(Catalogue, KnownApiIsNotReadAgain) {
