@@ -14,6 +14,7 @@
 namespace {
 bool failPrctl = false;
 int priorityCalls = 0;
+std::string namedThread;  ///< the name of the last PR_SET_NAME, as it was passed
 }  // namespace
 
 // These take the place of the C library's for the whole test program.
@@ -26,6 +27,9 @@ extern "C" __attribute__((visibility("default"))) int prctl(int option, ...) {
   va_start(args, option);
   const unsigned long argument = va_arg(args, unsigned long);
   va_end(args);
+  if (option == PR_SET_NAME) {
+    namedThread = reinterpret_cast<const char*>(argument);
+  }
   return static_cast<int>(syscall(SYS_prctl, option, argument, 0, 0, 0));
 }
 
@@ -64,6 +68,21 @@ TEST_F(Hardening, ProcessThatCannotBeNamedIs118) {
   EXPECT_FALSE(tested.SetProcessName(request.get(), response.get()));
   EXPECT_EQ(response->GetError(), 118);
   EXPECT_EQ(SyslogCapture::Count("Set process name fail["), 1);
+}
+
+TEST_F(Hardening, ThreadNameIsCutTo16CharactersBeforeTheSystemCutsIt) {
+  char longName[] = "a_program_of_a_long_name";
+  char* const former = program_invocation_name;
+  program_invocation_name = longName;
+  {
+    TestRunner tested;
+    program_invocation_name = former;
+    MakeRequest("QELO.Test.Call", 2, "run");
+    EXPECT_TRUE(tested.SetProcessName(request.get(), response.get()));
+    EXPECT_EQ(namedThread, "QELO.Test.Call_2");
+  }
+  EXPECT_EQ(namedThread, "a_program_of_a_l");  // given back
+  ::prctl(PR_SET_NAME, program_invocation_short_name);
 }
 
 TEST_F(Hardening, ClientsTextBeginsNoLogLineOfItsOwn) {
