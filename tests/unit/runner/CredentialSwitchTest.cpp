@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <grp.h>
 #include <sys/wait.h>
+#include <syslog.h>
 
 #include <array>
 
@@ -100,6 +101,53 @@ TEST_F(CredentialSwitch, GrantableGivesTheIdsBackAfterAMethodThatThrew) {
   InChild({0, 0, 0, 0, 0, 0}, [&] {
     return !ProcessPlugin("throwing", kGrantable) && response->GetError() == 117 &&
            CurrentIds() == Ids{0, 0, 0, 0, 0, 0};
+  });
+}
+
+/// A switch that leaves a way back to the former user id, the former group id, both or none.
+auto switchThatKeeps(bool user, bool group) {
+  return [=](const std::string&, bool) {
+    const uid_t formerUser = static_cast<uid_t>(user ? -1 : kUser);
+    const gid_t formerGroup = static_cast<gid_t>(group ? -1 : kUser);
+    return setgroups(0, nullptr) == 0 && setresgid(formerGroup, kUser, formerGroup) == 0 &&
+           setresuid(formerUser, kUser, formerUser) == 0;
+  };
+}
+
+/// How often the authorisation facility was told that this call was refused.
+int refusals(const std::string& call) {
+  int count = 0;
+  for (const SyslogCapture::Message& message : SyslogCapture::Messages()) {
+    count += message.priority == (LOG_AUTH | LOG_ERR) &&
+             message.text.starts_with("APIRunner.cpp:") &&
+             message.text.ends_with(" ERROR: " + call + " [Operation not permitted]");
+  }
+  return count;
+}
+
+TEST_F(CredentialSwitch, GroupThatCannotBeGivenBackIsLoggedAndTheResultStays) {
+  platform->resetCredentials = switchThatKeeps(true, false);
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    return ProcessPlugin("state", kGrantable) && RanAsUser() && response->GetError() == 0 &&
+           refusals("setresgid(0, 0, 0)") == 1 && SyslogCapture::Count("ERROR: ") == 1 &&
+           CurrentIds() == Ids{0, 0, 0, kUser, kUser, kUser};
+  });
+}
+
+TEST_F(CredentialSwitch, UserThatCannotBeGivenBackIsLoggedAndTheResultStays) {
+  platform->resetCredentials = switchThatKeeps(false, true);
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    return ProcessPlugin("state", kGrantable) && RanAsUser() && response->GetError() == 0 &&
+           refusals("setresuid(0, 0, 0)") == 1 && SyslogCapture::Count("ERROR: ") == 1 &&
+           CurrentIds() == Ids{kUser, kUser, kUser, 0, 0, 0};
+  });
+}
+
+TEST_F(CredentialSwitch, IdsThatCannotBeGivenBackLeaveAThrowingMethodsResult) {
+  platform->resetCredentials = switchThatKeeps(false, false);
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    return !ProcessPlugin("throwing", kGrantable) && response->GetError() == 117 &&
+           refusals("setresgid(0, 0, 0)") == 1 && refusals("setresuid(0, 0, 0)") == 1;
   });
 }
 
