@@ -11,8 +11,8 @@ namespace QELO {
 /// handed to another process as text.
 ///
 /// A section is made by InitField() or a derived constructor, never by setting a key. Nothing
-/// here throws, whatever a deserialized store holds: a section that is no object has no keys and
-/// refuses to be given one.
+/// here throws, whatever a deserialized store holds: a section that is no object has no keys and,
+/// unless it is null, refuses to be given one.
 class APIBase {
  public:
   APIBase();
