@@ -123,6 +123,7 @@ TEST_F(PollingPipes, WithANameAndFilesStayOpen) {
   JoinChild();
   EXPECT_EQ(Property("alice", "id2", "body")["data"], true);
   close(writer);
+  unlink(fifo.c_str());
 }
 
 }  // namespace
