@@ -22,6 +22,8 @@
 
 namespace {
 
+constexpr int kNoSessionId = -2;  ///< QeloCgiIsAuthorizedEx: the context has none
+
 FakePlatform& fake() {
   return FakePlatform::Get();
 }
@@ -60,6 +62,18 @@ int preferenceDir(char* path, int size) {
   return fake().preferenceResult;
 }
 
+/// Marks a context that was started and has taken no cookies since. The mark is the context's own,
+/// behind the word that is not the CGI library's.
+void empty(QeloCgiContext* context, bool isEmpty) {
+  if (context != nullptr) {
+    context->block[sizeof(void*)] = isEmpty ? 1 : 0;
+  }
+}
+
+bool isEmpty(const QeloCgiContext* context) {
+  return context != nullptr && context->block[sizeof(void*)] != 0;
+}
+
 }  // namespace
 
 FakePlatform& FakePlatform::Get() {
@@ -74,6 +88,7 @@ FakePlatform& FakePlatform::Reset() {
 extern "C" {
 
 int QLIBCFileExist(const char* path) {
+  note("QLIBCFileExist", path);
   return access(path, F_OK) == 0 ? 1 : 0;
 }
 
@@ -162,25 +177,30 @@ int QLIBCConfGetARDOTimeout(void) {
   return fake().timeoutSetting;
 }
 
-int QeloCgiInit(const char* program, QeloCgiContext*) {
+int QeloCgiInit(const char* program, QeloCgiContext* context) {
   note("QeloCgiInit", program);
+  empty(context, true);
   return 1;
 }
 
-int QeloCgiInitEx(const char* userStore, QeloCgiContext*) {
+int QeloCgiInitEx(const char* userStore, QeloCgiContext* context) {
   note("QeloCgiInitEx", userStore);
+  if (fake().cgiInitEx == 1) {
+    empty(context, false);
+  }
   return fake().cgiInitEx;
 }
 
-int QeloCgiLoadInCookies(QeloCgiContext*) {
+int QeloCgiLoadInCookies(QeloCgiContext* context) {
   const char* cookies = getenv("HTTP_COOKIE");
   fake().loadedCookies = cookies != nullptr ? cookies : "";
   note("QeloCgiLoadInCookies");
+  empty(context, false);
   return 1;
 }
 
-const char* QeloCgiGetLang(QeloCgiContext*) {
-  return fake().language.c_str();
+const char* QeloCgiGetLang(QeloCgiContext* context) {
+  return isEmpty(context) ? "enu" : fake().language.c_str();
 }
 
 int QeloCgiIsTokenEnable(QeloCgiContext*) {
@@ -195,19 +215,20 @@ int QeloCgiGetRemoteIP(char* address, int size) {
   return 0;
 }
 
-int QeloCgiIsAuthorizedEx(QeloCgiContext*, const QeloCgiAuthFlags* flags, char* user, int size,
-                          int allowTimeout, int checkAddress) {
+int QeloCgiIsAuthorizedEx(QeloCgiContext* context, const QeloCgiAuthFlags* flags, char* user,
+                          int size, int allowTimeout, int checkAddress) {
   note("QeloCgiIsAuthorizedEx", std::to_string(flags->sessionFromParameter),
        std::to_string(allowTimeout),
        std::to_string(checkAddress) + (flags->keepIdle != 0 ? ", idle" : ""));
-  fill(fake().authorizedUser, user, size);
-  return fake().authorized;
+  fill(isEmpty(context) ? "" : fake().authorizedUser, user, size);
+  return isEmpty(context) ? kNoSessionId : fake().authorized;
 }
 
-int QeloCgiGetOption(QeloCgiContext*, const char* name, char* value, int size) {
+int QeloCgiGetOption(QeloCgiContext* context, const char* name, char* value, int size) {
   const auto found = fake().options.find(name);
-  fill(found != fake().options.end() ? found->second : "", value, size);
-  return found != fake().options.end() ? 1 : 0;
+  const bool isFound = !isEmpty(context) && found != fake().options.end();
+  fill(isFound ? found->second : "", value, size);
+  return isFound ? 1 : 0;
 }
 
 unsigned int QeloCgiUIDGet(const char* sessionId, const char* user) {

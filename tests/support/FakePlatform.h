@@ -30,7 +30,8 @@ struct FakePlatform {
   int timeoutSetting = 900;
   std::function<int(const std::string&, const std::string&)> setKeyValue;  ///< unset: 0
 
-  // CGI library
+  // CGI library. A context that QeloCgiInit started has the language "enu", no session and no
+  // options until it takes the cookies; any other has what stands here.
   std::string language = "enu";
   int cgiInitEx = 1;
   int tokenEnable = 0;

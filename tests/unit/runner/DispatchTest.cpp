@@ -194,7 +194,10 @@ TEST_F(Dispatch, RequestThatADaemonServesIsNotRunInProcess) {
   EXPECT_FALSE(tested.Process(request.get(), response.get()));
   EXPECT_EQ(response->GetError(), 117);
   EXPECT_EQ(tested.asked.rfind("socket run ", 0), 0u) << tested.asked;
-  EXPECT_TRUE(platform->calls.empty());             // nobody's credentials were taken
+  // Nobody's credentials were taken.
+  const std::vector<std::string> expected{"QLIBCFileExist(QELO.Test.lib)",
+                                          "QLIBCFileExist(QELO.Test.Call.lib)"};
+  EXPECT_EQ(platform->calls, expected);
   EXPECT_EQ(SyslogCapture::Openings().size(), 2u);  // named before and after
   MakeRequest("QELO.Test.Call", 9, "run");
   tested.asked.clear();
