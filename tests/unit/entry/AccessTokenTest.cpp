@@ -31,17 +31,40 @@ TEST_F(Permission, AccessTokenServesWhenTheSessionIsRefused) {
   EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
 }
 
-TEST_F(Permission, AccessTokenLeavesNothingOfTheRefusedSession) {
+TEST_F(Permission, AccessTokenLeavesNothingOfTheRefusedSessionButTheLanguage) {
   token = "T";
   platform->authorized = -7;
   platform->authorizedUser = "victim";
+  platform->language = "ger";
+  platform->options = {{"sessfile", "/sessions/S"}, {"istimeout", "1"}, {"timeout", "900"},
+                       {"skipcheckip", "1"},        {"app", "Desk"},    {"webapi", "all"}};
   platform->tokenGrant = 0;
   platform->tokenUser = "bob";
   EXPECT_TRUE(Check(kOpenToAll));
   EXPECT_EQ(entry_->Request()->GetSessionID(), "");
-  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
-  // The context that names the refused session is emptied before its options are read.
-  EXPECT_EQ(std::count(platform->calls.begin(), platform->calls.end(), "QeloCgiInit()"), 1);
+  EXPECT_EQ(entry_->Request()->GetUILanguage(), "ger");
+  EXPECT_EQ(entry_->Request()->Serialize()["session"],
+            Parse(R"({"username": "bob", "isAdmin": false, "sessFile": "", "isTimeout": false,
+                      "timeout": 0, "isSkipCheckIP": false, "uiLang": "ger", "app": "",
+                      "webapi": "", "isAuthorized": true, "tokenEnable": false, "appPriv": "",
+                      "authResult": 1})"));
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "bob");
+}
+
+TEST_F(Permission, AccessTokenWithoutASessionLeavesLanguageAndCookiesAsTheyCame) {
+  platform->language = "ger";
+  platform->tokenGrant = 0;
+  platform->tokenUser = "bob";
+  Describe(kOpenToAll);
+  Get("api=QELO.Test.Good&version=1&method=echo&tid=T");
+  Set("HTTP_COOKIE", "lang=ger");
+  TestEntry entry;
+  Printed([&entry] { entry.Run(Json::Value()); });
+  const APIRequest& request = *entry.Request();
+  EXPECT_EQ(request.GetLoginUserName(), "bob");
+  EXPECT_EQ(request.GetUILanguage(), "ger");
+  EXPECT_EQ(request.GetCookie("lang"), "ger");
+  EXPECT_FALSE(request.HasCookie("id"));
 }
 
 TEST_F(Permission, AccessTokenIsAskedForEachCallWithinTheRequest) {
