@@ -172,10 +172,11 @@ class CgiTest : public testing::Test {
     return value;
   }
 
-  /// Describes QELO.Test.Good: its API-level keys, and the attributes of every method.
-  static void Describe(const std::string& keys, const std::string& attributes = "{}") {
+  /// Describes QELO.Test.Good: its API-level keys, the attributes of every method, its library.
+  static void Describe(const std::string& keys, const std::string& attributes = "{}",
+                       const std::string& library = TEST_PLUGIN_DIR "/good.so") {
     Json::Value description = Parse(keys);
-    description["lib"] = std::string(TEST_PLUGIN_DIR) + "/good.so";
+    description["lib"] = library;
     description["minVersion"] = 1;
     description["maxVersion"] = 1;
     Json::Value& methods = description["methods"]["1"];

@@ -1,7 +1,13 @@
 // One entry's life: from the CGI environment to the printed answer and the work after it.
 
+#include <dlfcn.h>
+#include <sys/prctl.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
+
+#include <filesystem>
+#include <regex>
+#include <stdexcept>
 
 #include "tests/support/CgiFixture.h"
 
@@ -12,6 +18,42 @@ class EntryLifecycle : public CgiTest {
  protected:
   /// A description that anybody may call.
   static void DescribeOpen() { Describe(R"({"authLevel": 0})", R"({"grantByDefault": true})"); }
+
+  /// As DescribeOpen(), by a library that no other test has loaded. @return its path
+  std::string DescribeOpenByOwnLibrary() {
+    const std::string library = directory / "own.so";
+    std::filesystem::copy_file(TEST_PLUGIN_DIR "/good.so", library);
+    Describe(R"({"authLevel": 0})", R"({"grantByDefault": true})", library);
+    return library;
+  }
+
+  static bool IsLoaded(const std::string& library) {
+    void* handle = dlopen(library.c_str(), RTLD_LAZY | RTLD_NOLOAD);
+    if (handle != nullptr) {
+      dlclose(handle);
+    }
+    return handle != nullptr;
+  }
+
+  static std::string ThreadName() {
+    char name[17] = {};
+    prctl(PR_GET_NAME, name);
+    return name;
+  }
+};
+
+/// An entry that has read its whole request when its initialization fails, or does not.
+class InitializedEntry : public TestEntry {
+ public:
+  explicit InitializedEntry(bool goesOn) : goesOn_(goesOn) {}
+  bool Initialize(const Json::Value& param) override {
+    EXPECT_TRUE(TestEntry::Initialize(param));
+    Response()->SetError(goesOn_ ? 0 : 101);
+    return goesOn_;
+  }
+
+ private:
+  const bool goesOn_;
 };
 
 constexpr char kEcho[] = "api=QELO.Test.Good&version=1&method=echo";
@@ -116,15 +158,50 @@ TEST_F(EntryLifecycle, RunWithAnUnknownApiAnswers102) {
 }
 
 TEST_F(EntryLifecycle, FailedInitializationStillPrintsAndCallsNothing) {
-  DescribeOpen();
+  const std::string library = DescribeOpenByOwnLibrary();
   Get(kEcho);
+  for (const bool goesOn : {false, true}) {
+    char argument[32] = "program";
+    char* arguments[] = {argument, nullptr};
+    InitializedEntry entry(goesOn);
+    entry.SetArgs(1, arguments);
+    prctl(PR_SET_NAME, "program");
+    SyslogCapture::Clear();
+    const CgiAnswer answer = Printed([&entry] { entry.Run(Json::Value()); });
+    EXPECT_EQ(answer.Code(), goesOn ? 0 : 101);
+    EXPECT_TRUE(answer.HasLine("Pragma: no-cache"));
+    EXPECT_EQ(Calls("QLIBCFileExist") > 0, goesOn);
+    EXPECT_EQ(IsLoaded(library), goesOn);
+    EXPECT_EQ(SyslogCapture::Openings().empty(), !goesOn);
+    EXPECT_EQ(ThreadName(), goesOn ? "QELO.Test.Good_" : "program");
+    EXPECT_EQ(std::string(argument) == "program", !goesOn);
+  }
+}
+
+TEST_F(EntryLifecycle, BodyThatCannotBeReadStopsBeforeCredentialsAndTheCall) {
+  DescribeOpen();
+  Get(std::string(kEcho) + "&_sid=X");
   Set("REQUEST_METHOD", "POST");
   Set("CONTENT_LENGTH", "0");
   const CgiAnswer answer = Serve();
   EXPECT_EQ(answer.Code(), 101);
-  EXPECT_TRUE(answer.HasLine("Pragma: no-cache"));
-  EXPECT_EQ(Calls("QeloCgiLoadInCookies"), 1);  // it stopped before credentials
+  EXPECT_EQ(Calls("QeloCgiLoadInCookies"), 1);
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "(unset)");
   EXPECT_EQ(Calls("QLIBCFileExist"), 0);
+}
+
+TEST_F(EntryLifecycle, ExceptionIsLoggedAndAnswered117) {
+  struct Throwing : TestEntry {
+    bool Initialize(const Json::Value&) override { throw std::runtime_error("no memory"); }
+  } entry;
+  const CgiAnswer answer = Printed([&entry] { entry.Run(Json::Value()); });
+  EXPECT_EQ(answer.Code(), 117);
+  EXPECT_TRUE(answer.HasLine("Content-type: application/json; charset=\"UTF-8\""));
+  ASSERT_EQ(SyslogCapture::Messages().size(), 1U);
+  EXPECT_EQ(SyslogCapture::Messages()[0].priority, 3);
+  EXPECT_TRUE(std::regex_match(SyslogCapture::Messages()[0].text,
+                               std::regex(R"(WebEntry\.cpp:\d+ no memory)")))
+      << SyslogCapture::Messages()[0].text;
 }
 
 TEST_F(EntryLifecycle, RunDoesNotConsultItsArgument) {
