@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/resource.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <string>
@@ -116,6 +117,26 @@ TEST_F(RequestBodyTest, StandardInputThatWasClosedBecomesTheNullDevice) {
   EXPECT_EQ(fcntl(STDIN_FILENO, F_GETFD), 0);
   dup2(input, STDIN_FILENO);
   close(input);
+}
+
+TEST_F(RequestBodyTest, StandardInputStaysWhenTheNullDeviceCannotBeOpened) {
+  Send("rest");
+  const pid_t child = fork();
+  if (child == 0) {
+    dup2(pipe_[0], STDIN_FILENO);
+    const int lowest = dup(STDIN_FILENO);
+    close(lowest);
+    const rlimit full{static_cast<rlim_t>(lowest), static_cast<rlim_t>(lowest)};
+    const bool isFull =
+        setrlimit(RLIMIT_NOFILE, &full) == 0 && open("/dev/null", O_RDONLY | O_CLOEXEC) < 0;
+    CloseStandardInput();
+    char text[5] = {};
+    const bool isThere = read(STDIN_FILENO, text, 4) == 4 && std::string(text) == "rest";
+    _exit((isFull ? 0 : 1) | (isThere ? 0 : 2));
+  }
+  int status = -1;
+  waitpid(child, &status, 0);
+  EXPECT_EQ(status, 0);
 }
 
 }  // namespace
