@@ -1,11 +1,12 @@
 """QELO.Access.Session: logging in and out, and who the caller is."""
 
 import itertools
+import subprocess
 
 import pytest
 
 from client import Client
-from conftest import PASSWORDS, needs_root, run_entry
+from conftest import BUILD, PASSWORDS, needs_root, run_entry
 
 API = "QELO.Access.Session"
 fresh_addresses = (f"127.0.1.{last}" for last in itertools.count(1))
@@ -15,6 +16,14 @@ fresh_addresses = (f"127.0.1.{last}" for last in itertools.count(1))
 def stranger(server):
     """A client at an address that has not failed to log in before."""
     return Client(server.port, next(fresh_addresses))
+
+
+@pytest.fixture
+def token(root):
+    """An access token that stands for bob in all calls."""
+    program = BUILD / "programs" / "webapi-token"
+    made = subprocess.run([program, "create", "--user", "bob"], capture_output=True, check=True)
+    return made.stdout.decode().strip()
 
 
 def cookie_of(answer):
@@ -105,6 +114,22 @@ def test_Current_OfAnAdministrator_SaysSo(client, admin):
     data = client.call(API, "current", _sid=admin["sid"]).data
     assert data["isAdmin"]
     assert data["class"] == "admin.local"
+
+
+def test_Current_ByAccessToken_SpeaksTheCookiesLanguage(client, token):
+    data = client.call(API, "current", tid=token, headers={"Cookie": "lang=ger"}).data
+    assert data["user"] == "bob"
+    assert data["language"] == "ger"
+
+
+def test_Current_ByAccessToken_BesideARefusedSession_KeepsNothingOfItButTheLanguage(
+    client, alice, token
+):
+    for cookies in (f"lang=ger; id={alice['sid']}", f"id={'A' * 43}; lang=ger", "id=x; lang=ger"):
+        data = client.call(API, "current", tid=token, headers={"Cookie": cookies}).data
+        assert data["user"] == "bob", cookies
+        assert data["language"] == "ger", cookies
+        assert data["secondsLeft"] == -1, cookies
 
 
 @pytest.mark.parametrize("method", ["current", "logout"])
