@@ -6,7 +6,7 @@ import time
 import pytest
 
 from client import PATH
-from conftest import DESCRIPTIONS, answer_of, run_entry
+from conftest import DESCRIPTIONS, PLUGINS, answer_of, run_entry
 
 OPEN = "api=QELO.Test.Open&version=1&method=plain"
 FORM = "Content-Type: application/x-www-form-urlencoded\r\n"
@@ -96,6 +96,56 @@ def test_DescriptionOutsideTheDirectory_IsNotRead(client, root, describe):
         assert client.get(f"api={api}&version=1&method=run").code == 102, api
     for folder in (root, DESCRIPTIONS.parent):
         (folder / "secret.lib").unlink()
+
+
+def entries_below(*directories):
+    """All that stands there with its size and time, but for logs."""
+    paths = [path for top in directories for path in (top, *top.rglob("*")) if path.suffix != ".log"]
+    states = {path: path.lstat() for path in paths}
+    return {path: (state.st_size, state.st_mtime_ns) for path, state in states.items()}
+
+
+@pytest.fixture(scope="module")
+def descriptions_out_of_reach(root):
+    """Of APIs that are named as paths, where the names would lead."""
+    description = {"lib": str(PLUGINS / "identity.so"), "minVersion": 1, "maxVersion": 1,
+                   "authLevel": 0, "methods": {"1": ["plain"]}}
+    above, below = DESCRIPTIONS.parent / "x.lib", DESCRIPTIONS / "a" / "b.lib"
+    below.parent.mkdir()
+    above.write_text(json.dumps({"../x": description}))
+    below.write_text(json.dumps({"a/b": description}))
+    yield
+    above.unlink()
+    below.unlink()
+    below.parent.rmdir()
+
+
+@pytest.mark.parametrize("verb", ["GET", "POST"])
+@pytest.mark.parametrize(
+    "api, code",
+    [
+        ("", 101),
+        ("a%20b", 102),
+        ("%20", 102),
+        ("+", 102),
+        ("%C3%84", 102),
+        ("..", 102),
+        ("../x", 102),
+        ("a%2Fb", 102),
+        ("%00", 102),
+        pytest.param("A" * 5000, 102, id="long"),
+    ],
+)
+def test_ApiNameOfStrangeLetters_GetsItsCodeAndWritesNothing(
+    server, client, root, descriptions_out_of_reach, verb, api, code
+):
+    before = entries_below(root, server.directory)
+    line = f"api={api}&version=1&method=plain"
+    answer = client.get(line) if verb == "GET" else client.post(line)
+    assert answer.status == 200
+    assert answer.headers.get_all("Content-Type") == ['application/json; charset="UTF-8"']
+    assert answer.json == {"success": False, "error": {"code": code}}
+    assert entries_below(root, server.directory) == before
 
 
 def test_QueryOfTenMebibytes_IsRefusedByTheServer(client):
