@@ -144,9 +144,13 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
     response->SetError(WEBAPI_ERR_NO_APP_PRIVILEGE);
     return false;
   }
-  // The caller's own request holds already what the check found.
-  Json::Value session =
-      request == caller ? JsonHelper::member(request->Serialize(), "session") : sessionOf(*caller);
+  Json::Value session;
+  Json::Value& record = request->Serialize();
+  if (request == caller && JsonHelper::member(record, "session").isObject()) {
+    session.swap(record["session"]);  // holds already what the check found
+  } else {
+    session = sessionOf(*caller);
+  }
   session["appPriv"] = JsonHelper::asString(appPriv);
   request->InitSession(std::move(session));
   request->SetAuthResult(static_cast<_tag_authorized_result_>(result));

@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cstring>
 #include <utility>
 
 #include "webapi/APIRequest.h"
@@ -94,10 +95,9 @@ bool APIRunner::InitEnv(Json::Value& env) {
     return false;
   }
   for (char** entry = environ; entry != nullptr && *entry != nullptr; ++entry) {
-    const std::string text = *entry;
-    const size_t equals = text.find('=');
-    if (equals != std::string::npos) {
-      env[text.substr(0, equals)] = text.substr(equals + 1);
+    const char* equals = strchr(*entry, '=');
+    if (equals != nullptr) {
+      env[std::string(static_cast<const char*>(*entry), equals)] = equals + 1;
     }
   }
   return true;

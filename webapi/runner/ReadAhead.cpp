@@ -13,7 +13,8 @@ void ReadAhead::Hide() {
     text_.resize(fread(text_.data(), 1, text_.size(), stdin));
   }
   if (std::cin.rdbuf() != nullptr && std::cin.rdbuf()->in_avail() > 0) {
-    std::cin.rdbuf(&nothing_);
+    nothing_ = std::make_unique<std::filebuf>();
+    std::cin.rdbuf(nothing_.get());
   }
 }
 

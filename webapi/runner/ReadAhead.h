@@ -1,6 +1,7 @@
 #pragma once
 
-#include <streambuf>
+#include <fstream>
+#include <memory>
 #include <string>
 
 namespace QELO {
@@ -22,10 +23,8 @@ class ReadAhead {
   void GiveBack();
 
  private:
-  class Nothing : public std::streambuf {};
-
   std::string text_;
-  Nothing nothing_;
+  std::unique_ptr<std::filebuf> nothing_;  ///< of no file
 };
 
 }  // namespace QELO
