@@ -19,11 +19,6 @@
 #include "webapi/runner/APIRunnerPrivate.h"
 
 namespace QELO {
-namespace {
-
-constexpr size_t kLongestName = 1023;  ///< bytes
-
-}  // namespace
 
 APIRunner::APIRunner()
     : libDef(Json::objectValue),
@@ -130,7 +125,7 @@ bool APIRunner::SetProcessName(APIRequest* request, APIResponse* response) {
                            std::to_string(request->GetAPIVersion()) + "_" +
                            request->GetAPIMethod().c_str();
   std::string full = private_->GetProcName() + "_" + call;
-  full.resize(std::min(full.size(), kLongestName));
+  full.resize(std::min(full.size(), APIRunnerPrivate::kLongestName));
   APIRunnerPrivate::SetLogIdentity(full);
   private_->SetArgv0(full);
   if (prctl(PR_SET_NAME, call.substr(0, 16).c_str()) != 0) {

@@ -73,7 +73,7 @@ void APIRunnerPrivate::SetArgv0(const std::string& name) {
 }
 
 void APIRunnerPrivate::SetLogIdentity(const std::string& text) {
-  static char identity[1024];  // syslog keeps the pointer
+  static char identity[kLongestName + 1];  // syslog keeps the pointer
   closelog();
   strncpy(identity, LogText(text).c_str(), sizeof identity - 1);
   openlog(identity, LOG_PID | LOG_CONS, 0);

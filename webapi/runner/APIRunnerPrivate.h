@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 
@@ -10,6 +11,8 @@ class APIRunner;
 /// What the process is called, and its name while it serves a call.
 class APIRunnerPrivate {
  public:
+  static constexpr size_t kLongestName = 1023;  ///< bytes of what a process is called for a call
+
   explicit APIRunnerPrivate(APIRunner* owner);
 
   /// Remembers where the process's arguments stand; nothing when `argc` is below 1.
@@ -21,7 +24,7 @@ class APIRunnerPrivate {
   const std::string& GetProcName() const { return procName; }
   const std::string& GetOrigProcName() const { return origProcName; }
 
-  /// Makes `text` the syslog identity, cut to 1023 bytes.
+  /// Makes `text` the syslog identity, cut to kLongestName.
   static void SetLogIdentity(const std::string& text);
 
  private:

@@ -25,6 +25,11 @@ bool isFileName(const std::string& api) {
   return api.find_first_of(std::string_view("/\0", 2)) == std::string::npos;
 }
 
+/// Whether members can be put into a value; the JSON library throws where they cannot.
+bool takesMembers(const Json::Value& value) {
+  return value.isObject() || value.isNull();
+}
+
 /// The description file of an API: of QELO.A.lib, QELO.A.B.lib, ... the longest that exists.
 std::string descriptionFile(const std::string& api) {
   std::string found;
@@ -62,7 +67,7 @@ bool APIRunner::CheckLibDescription(const Json::Value& description) const {
 }
 
 Json::Value& APIRunner::ApplyLibDef(Json::Value& description) const {
-  if (!description.isObject() && !description.isNull()) {
+  if (!takesMembers(description)) {
     return description;
   }
   for (const char* key : {"authLevel", "allowUser", "requestFormat", "priority"}) {
@@ -75,7 +80,7 @@ Json::Value& APIRunner::ApplyLibDef(Json::Value& description) const {
 }
 
 void APIRunner::AddDescriptions(Json::Value& target, Json::Value& file) const {
-  if (!file.isObject() || !(target.isObject() || target.isNull())) {
+  if (!file.isObject() || !takesMembers(target)) {
     return;
   }
   for (auto it = file.begin(); it != file.end(); ++it) {
