@@ -64,10 +64,10 @@ function(webapi_shared_library target)
   endif()
 endfunction()
 
-# webapi_folder(NAME FOLDER): the folder's sources as one OBJECT library, from which both the
+# webapi_folder(NAME FOLDER): the folder's sources, those below it too, as one OBJECT library, from which both the
 # shared library and the unit tests are linked.
 function(webapi_folder name folder)
-  file(GLOB sources CONFIGURE_DEPENDS ${folder}/*.cpp)
+  file(GLOB_RECURSE sources CONFIGURE_DEPENDS ${folder}/*.cpp)
   if(NOT sources)
     file(WRITE ${CMAKE_BINARY_DIR}/empty.cpp "")
     set(sources ${CMAKE_BINARY_DIR}/empty.cpp)

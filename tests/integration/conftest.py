@@ -4,9 +4,12 @@ import json
 import os
 import shutil
 import subprocess
+import sys
 from pathlib import Path
 
 import pytest
+
+sys.path.insert(0, str(Path(__file__).with_name("support")))
 
 from client import Client
 from webserver import SOURCE, WebServer

@@ -8,8 +8,8 @@
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/WebAPIError.h"
-#include "webapi/entry/BrokenPipe.h"
-#include "webapi/model/Log.h"
+#include "webapi/base/Log.h"
+#include "webapi/entry/output/BrokenPipe.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"
 

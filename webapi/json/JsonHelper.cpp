@@ -11,8 +11,8 @@
 #include <limits>
 #include <utility>
 
-#include "webapi/json/FileText.h"
-#include "webapi/json/JsonReader.h"
+#include "webapi/base/ReplaceFile.h"
+#include "webapi/json/Reader.h"
 
 namespace QELO::JsonHelper {
 namespace {

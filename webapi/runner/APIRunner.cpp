@@ -13,7 +13,7 @@
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
-#include "webapi/model/Log.h"
+#include "webapi/base/Log.h"
 #include "webapi/platform/Paths.h"
 #include "webapi/platform/WebAPIUtil.h"
 #include "webapi/runner/APIRunnerPrivate.h"

@@ -8,7 +8,7 @@
 
 #include <cstring>
 
-#include "webapi/model/Log.h"
+#include "webapi/base/Log.h"
 
 namespace QELO {
 namespace {

@@ -14,7 +14,7 @@
 #include "webapi/WebAPIError.h"
 #include "webapi/platform/Core.h"
 #include "webapi/runner/CompoundCall.h"
-#include "webapi/runner/Fence.h"
+#include "webapi/runner/execution/Fence.h"
 
 namespace QELO {
 namespace {

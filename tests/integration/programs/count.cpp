@@ -3,7 +3,7 @@
 #include <cstdio>
 #include <cstdlib>
 
-#include "webapi/runner/UsageCounter.h"
+#include "webapi/runner/counter/UsageCounter.h"
 
 int main(int argc, char** argv) {
   if (argc != 3) {

@@ -4,7 +4,7 @@
 #include <vector>
 
 #include "tests/support/FakePlatform.h"
-#include "tests/unit/model/RequestFixture.h"
+#include "tests/unit/model/request/Fixture.h"
 #include "webapi/APIResponse.h"
 
 using namespace QELO;

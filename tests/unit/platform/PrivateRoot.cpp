@@ -10,7 +10,7 @@
 #include <fstream>
 #include <sstream>
 
-#include "platform/PlatformPaths.h"
+#include "platform/base/Paths.h"
 #include "tests/support/SyslogCapture.h"
 
 namespace fs = std::filesystem;

@@ -5,7 +5,7 @@
 
 #include <algorithm>
 
-#include "platform/Accounts.h"
+#include "platform/accounts/Accounts.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {

@@ -8,8 +8,8 @@
 #include <filesystem>
 #include <fstream>
 
-#include "platform/Passwords.h"
-#include "platform/modules/password_pam/PasswordPam.h"
+#include "platform/login/Passwords.h"
+#include "platform/login/module/PasswordPam.h"
 #include "tests/support/SyslogCapture.h"
 
 namespace {

@@ -3,7 +3,7 @@
 
 #include <cstdlib>
 
-#include "platform/TextBuffer.h"
+#include "platform/base/TextBuffer.h"
 #include "webapi/Export.h"
 
 extern "C" WEBAPI_API int webapiPamCheck(const char* configuration, const char*, const char*,

@@ -1,0 +1,15 @@
+#pragma once
+
+#include "platform/accounts/AccountDatabase.h"
+#include "platform/settings/Settings.h"
+
+namespace QELO::Platform {
+
+/// Whether the account is of the group that the setting "admin_group" names.
+/// @return 1 or 0, -1 when that cannot be told
+int isAdministrator(const Settings& settings, const Account& account);
+
+/// Accounts that nobody logs in to, whatever the password: "system", and those without a shell.
+bool isBarredFromLogin(const Account& account);
+
+}  // namespace QELO::Platform

@@ -1,0 +1,77 @@
+#include <grp.h>
+#include <pwd.h>
+
+#include <algorithm>
+#include <cerrno>
+
+#include "platform/accounts/AccountDatabase.h"
+
+namespace QELO::Platform {
+namespace {
+
+constexpr size_t kFirstSize = 1024;
+constexpr size_t kLargestEntry = 1 << 20;  // bytes
+constexpr int kMostGroups = 65536;         // the kernel's own limit
+
+/// Asks the name service for an entry by name.
+/// @param ask  getpwnam_r or getgrnam_r
+template <typename Entry, typename Visit>
+Lookup askByName(const std::string& name, int (*ask)(const char*, Entry*, char*, size_t, Entry**),
+                 Visit visit) {
+  std::vector<char> buffer(kFirstSize);
+  Entry entry;
+  Entry* found = nullptr;
+  int error = ask(name.c_str(), &entry, buffer.data(), buffer.size(), &found);
+  while (error == ERANGE && buffer.size() < kLargestEntry) {
+    buffer.resize(buffer.size() * 2);
+    error = ask(name.c_str(), &entry, buffer.data(), buffer.size(), &found);
+  }
+  if (found != nullptr) {
+    visit(*found);
+    return Lookup::kFound;
+  }
+  return error == 0 || error == ENOENT || error == ESRCH ? Lookup::kAbsent : Lookup::kFailed;
+}
+
+}  // namespace
+
+Lookup findAccount(const std::string& name, Account& account) {
+  return askByName<passwd>(name, getpwnam_r, [&](const passwd& entry) {
+    account = {entry.pw_name, entry.pw_uid, entry.pw_gid, entry.pw_dir, entry.pw_shell};
+  });
+}
+
+Lookup findGroup(const std::string& name, gid_t& gid) {
+  return askByName<group>(name, getgrnam_r, [&](const group& entry) { gid = entry.gr_gid; });
+}
+
+Lookup findMembership(const Account& account, const std::string& groupName) {
+  gid_t gid = 0;
+  const Lookup lookup = findGroup(groupName, gid);
+  if (lookup != Lookup::kFound) {
+    return lookup;
+  }
+  std::vector<gid_t> groups;
+  if (findGroupsOf(account, groups) != Lookup::kFound) {
+    return Lookup::kFailed;
+  }
+  return std::find(groups.begin(), groups.end(), gid) != groups.end() ? Lookup::kFound
+                                                                      : Lookup::kAbsent;
+}
+
+Lookup findGroupsOf(const Account& account, std::vector<gid_t>& groups) {
+  std::vector<gid_t> found(32);
+  int count = static_cast<int>(found.size());
+  while (getgrouplist(account.name.c_str(), account.gid, found.data(), &count) < 0) {
+    if (found.size() >= kMostGroups) {
+      return Lookup::kFailed;
+    }
+    found.resize(found.size() * 2);
+    count = static_cast<int>(found.size());
+  }
+  found.resize(static_cast<size_t>(count));
+  groups.swap(found);
+  return Lookup::kFound;
+}
+
+}  // namespace QELO::Platform

@@ -1,0 +1,109 @@
+#include "platform/cgi/Context.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <string>
+#include <string_view>
+
+#include "platform/settings/Settings.h"
+
+namespace QELO::Platform {
+namespace {
+
+constexpr char kLanguages[][4] = {"enu", "cht", "chs", "krn", "ger", "fre", "ita",
+                                  "spn", "jpn", "dan", "nor", "sve", "nld", "rus",
+                                  "plk", "ptb", "ptg", "hun", "trk", "csy", "tha"};
+/// The user store that login sessions belong to, and the default.
+constexpr char kSessionStoreName[] = "current.users";
+
+/// @return the number in the table, counted from 1, or 0
+unsigned char languageNumber(std::string_view code) {
+  const auto* found = std::find(std::begin(kLanguages), std::end(kLanguages), code);
+  return found == std::end(kLanguages)
+             ? 0
+             : static_cast<unsigned char>(found - std::begin(kLanguages) + 1);
+}
+
+std::string_view trimmed(std::string_view text) {
+  const size_t first = text.find_first_not_of(" \t");
+  return first == std::string_view::npos
+             ? std::string_view()
+             : text.substr(first, text.find_last_not_of(" \t") - first + 1);
+}
+
+void takeId(std::string_view id, ContextArea& area) {
+  memset(area.id, 0, sizeof area.id);
+  area.state = ContextArea::kNoId;
+  if (isSecretText(id)) {
+    id.copy(area.id, id.size());
+    area.state = ContextArea::kHasId;
+  } else if (!id.empty()) {
+    area.state = ContextArea::kMalformedId;
+  }
+}
+
+ContextArea readCookies(std::string_view line) {
+  ContextArea area{};
+  while (!line.empty()) {
+    const size_t end = line.find(';');
+    const std::string_view cookie = trimmed(line.substr(0, end));
+    line.remove_prefix(end == std::string_view::npos ? line.size() : end + 1);
+    const size_t equals = cookie.find('=');
+    if (equals == std::string_view::npos) {
+      continue;
+    }
+    const std::string_view name = cookie.substr(0, equals);
+    const std::string_view value = cookie.substr(equals + 1);
+    if (name == "id") {
+      takeId(value, area);
+    } else if (name == "lang") {
+      area.language = languageNumber(value);
+    }
+  }
+  return area;
+}
+
+}  // namespace
+}  // namespace QELO::Platform
+
+using namespace QELO::Platform;
+
+extern "C" {
+
+int QeloCgiInit(const char*, QeloCgiContext* context) {
+  if (context == nullptr) {
+    return 0;
+  }
+  storeArea(ContextArea{}, *context);
+  return 1;
+}
+
+int QeloCgiInitEx(const char* userStore, QeloCgiContext* context) {
+  if (userStore == nullptr || (*userStore != '\0' && strcmp(userStore, kSessionStoreName) != 0)) {
+    return 0;
+  }
+  return QeloCgiLoadInCookies(context);
+}
+
+int QeloCgiLoadInCookies(QeloCgiContext* context) {
+  if (context == nullptr) {
+    return 0;
+  }
+  const char* cookies = getenv("HTTP_COOKIE");
+  storeArea(readCookies(cookies != nullptr ? cookies : ""), *context);
+  return 1;
+}
+
+const char* QeloCgiGetLang(QeloCgiContext* context) {
+  unsigned char number = context != nullptr ? loadArea(*context).language : 0;
+  if (number == 0 || number > std::size(kLanguages)) {
+    number = languageNumber(Settings().Get("language", ""));
+  }
+  return kLanguages[number == 0 ? 0 : number - 1];
+}
+
+int QeloCgiIsTokenEnable(QeloCgiContext*) {
+  return Settings().TokenEnabled() ? 1 : 0;
+}
+
+}  // extern "C"

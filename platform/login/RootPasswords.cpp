@@ -1,0 +1,83 @@
+#include <shadow.h>
+#include <time.h>
+
+#include <cstring>
+
+#include "platform/accounts/Accounts.h"
+#include "platform/accounts/DatabaseFile.h"
+#include "platform/base/Log.h"
+#include "platform/base/ModuleLoader.h"
+#include "platform/base/Paths.h"
+#include "platform/login/Passwords.h"
+#include "platform/login/module/PasswordCrypt.h"
+
+namespace QELO::Platform {
+namespace {
+
+constexpr char kSource[] = "RootPasswords.cpp";
+constexpr long kDaySeconds = 86400;
+/// Of no password; in use when the shadow file has no hash at all to take for a sample.
+constexpr char kSampleHash[] =
+    "$6$eNq0Zk3vT1pYwXcB$gXkeTHPxOKcPPSuPUxxhHMFHtDoeSEiKzUIZWcAMhzoi2ObWGNCzHvHFwpmUjqIa.s4vQR6z"
+    "gmiuYYmsIymyV1";
+
+struct ShadowPassword {
+  std::string hash;     ///< "" when there is none to check against
+  bool expired = true;  ///< the account, or a password that must be changed first
+  std::string sample;   ///< some account's hash
+};
+
+bool isHash(const char* text) {
+  return text != nullptr && *text != '\0' && *text != '!' && *text != '*';
+}
+
+bool isExpired(const spwd& entry) {
+  const long today = time(nullptr) / kDaySeconds;
+  const bool mustChange = entry.sp_lstchg == 0 || (entry.sp_lstchg > 0 && entry.sp_max >= 0 &&
+                                                   today > entry.sp_lstchg + entry.sp_max);
+  return mustChange || (entry.sp_expire >= 0 && today >= entry.sp_expire);
+}
+
+/// Reads the file to its end also when the account is found, which takes as long for every account.
+bool readShadow(const std::string& account, ShadowPassword& password) {
+  bool found = false;
+  return readDatabaseFile<spwd>(Paths::kShadow, fgetspent_r, [&](const spwd& entry) {
+    if (isHash(entry.sp_pwdp)) {
+      password.sample = entry.sp_pwdp;
+    }
+    if (!found && account == entry.sp_namp) {
+      found = true;
+      password.hash = isHash(entry.sp_pwdp) ? entry.sp_pwdp : "";
+      password.expired = isExpired(entry);
+    }
+    return false;
+  });
+}
+
+}  // namespace
+
+int checkPassword(const std::string& account, const std::string& password, std::string& name) {
+  const auto verify = reinterpret_cast<PasswordCryptVerify>(
+      findInModule(kPasswordCryptModule, kPasswordCryptVerify));
+  ShadowPassword shadow;
+  Account found;
+  const Lookup lookup = findAccount(account, found);
+  if (verify == nullptr) {
+    return -1;
+  }
+  if (lookup == Lookup::kFailed || !readShadow(account, shadow)) {
+    PLATFORM_LOG(kSource, "cannot read the accounts [%s]", strerror(errno));
+    return -1;
+  }
+  // Every answer costs one hash, so that its time does not tell which accounts there are.
+  const std::string sample = shadow.sample.empty() ? kSampleHash : shadow.sample;
+  const bool exists = lookup == Lookup::kFound && !shadow.hash.empty();
+  const bool matches = verify((exists ? shadow.hash : sample).c_str(), password.c_str()) == 1;
+  if (!exists || !matches || shadow.expired || isBarredFromLogin(found)) {
+    return 0;
+  }
+  name = found.name;
+  return 1;
+}
+
+}  // namespace QELO::Platform

@@ -1,0 +1,18 @@
+#include "platform/login/module/PasswordCrypt.h"
+
+#include <crypt.h>
+
+#include <cstring>
+#include <memory>
+
+#include "platform/base/Secrets.h"
+#include "webapi/Export.h"
+
+extern "C" WEBAPI_API int webapiPasswordVerify(const char* hash, const char* password) {
+  const auto work = std::make_unique<crypt_data>();  // 32 KiB, zeroed
+  const char* result = crypt_rn(password, hash, work.get(), sizeof *work);
+  const bool known = result != nullptr;
+  const bool matches = known && QELO::Platform::equalSecrets(result, hash);
+  explicit_bzero(work.get(), sizeof *work);
+  return known ? static_cast<int>(matches) : -1;
+}

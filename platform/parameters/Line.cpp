@@ -1,0 +1,54 @@
+#include <string_view>
+#include <utility>
+
+#include "platform/parameters/JsonText.h"
+#include "platform/parameters/PercentCode.h"
+#include "webapi/platform/WebAPIUtil.h"
+
+namespace {
+
+bool take(std::string_view text, bool decode, std::string& plain) {
+  if (decode) {
+    return QELO::Platform::decodePercent(text, true, plain);
+  }
+  plain = text;
+  return true;
+}
+
+}  // namespace
+
+bool QELO::WebAPIUtil::strPairToJsonObj(const std::string& line, Json::Value& object, bool decode,
+                                        bool parseJson) {
+  if (!object.isObject() && !object.isNull()) {
+    return false;
+  }
+  Json::Value pairs(Json::objectValue);
+  std::string_view rest = line;
+  while (!rest.empty()) {
+    const size_t end = rest.find('&');
+    const std::string_view pair = rest.substr(0, end);
+    rest.remove_prefix(end == std::string_view::npos ? rest.size() : end + 1);
+    if (pair.empty()) {
+      continue;
+    }
+    const size_t equals = std::min(pair.find('='), pair.size());
+    std::string name;
+    std::string text;
+    if (!take(pair.substr(0, equals), decode, name) ||
+        !take(pair.substr(std::min(equals + 1, pair.size())), decode, text)) {
+      return false;
+    }
+    Json::Value value;
+    if (!parseJson || !Platform::parseJsonText(text, value)) {
+      value = text;
+    }
+    pairs[name] = std::move(value);
+  }
+  if (object.isNull()) {
+    object = Json::Value(Json::objectValue);
+  }
+  for (const std::string& name : pairs.getMemberNames()) {
+    object[name].swap(pairs[name]);
+  }
+  return true;
+}

@@ -1,0 +1,94 @@
+#include <grp.h>
+#include <sys/types.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <vector>
+
+#include "platform/accounts/AccountDatabase.h"
+#include "platform/base/Log.h"
+#include "webapi/platform/Credential.h"
+
+namespace QELO::Platform {
+namespace {
+
+constexpr char kSource[] = "Credentials.cpp";
+constexpr uid_t kSameUid = static_cast<uid_t>(-1);
+constexpr gid_t kSameGid = static_cast<gid_t>(-1);
+
+struct GroupIds {
+  gid_t real, effective, saved;
+  std::vector<gid_t> supplementary;
+};
+
+bool readGroupIds(GroupIds& ids) {
+  const int count = getgroups(0, nullptr);
+  if (count < 0 || getresgid(&ids.real, &ids.effective, &ids.saved) != 0) {
+    return false;
+  }
+  ids.supplementary.resize(static_cast<size_t>(count));
+  return getgroups(count, ids.supplementary.data()) == count;
+}
+
+void restoreGroupIds(const GroupIds& ids) {
+  if (setresgid(ids.real, ids.effective, ids.saved) != 0 ||
+      setgroups(ids.supplementary.size(), ids.supplementary.data()) != 0) {
+    PLATFORM_LOG(kSource, "cannot restore the group ids [%s]", strerror(errno));
+  }
+}
+
+bool setIds(const Account& account, bool keepPrivilege) {
+  const gid_t otherGid = keepPrivilege ? kSameGid : account.gid;
+  const uid_t otherUid = keepPrivilege ? kSameUid : account.uid;
+  return setresgid(otherGid, account.gid, otherGid) == 0 &&
+         setresuid(otherUid, account.uid, otherUid) == 0;
+}
+
+bool switchAsRoot(const Account& account, bool keepPrivilege) {
+  std::vector<gid_t> groups;
+  GroupIds before;
+  if (findGroupsOf(account, groups) != Lookup::kFound || !readGroupIds(before)) {
+    return false;
+  }
+  if (setgroups(groups.size(), groups.data()) == 0 && setIds(account, keepPrivilege)) {
+    return true;
+  }
+  PLATFORM_LOG(kSource, "cannot become %s [%s]", account.name.c_str(), strerror(errno));
+  restoreGroupIds(before);
+  return false;
+}
+
+}  // namespace
+}  // namespace QELO::Platform
+
+bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
+  using namespace QELO::Platform;
+  Account account;
+  switch (findAccount(name, account)) {
+    case Lookup::kFound:
+      break;
+    case Lookup::kAbsent:
+      PLATFORM_LOG(kSource, "there is no account %s", name);
+      errno = ENOENT;
+      return false;
+    default:
+      PLATFORM_LOG(kSource, "cannot look up the account %s", name);
+      errno = EIO;
+      return false;
+  }
+  // To the kernel -1 means "leave as it is", so such an account would keep root's rights.
+  if (account.uid == kSameUid || account.gid == kSameGid) {
+    errno = EINVAL;
+    return false;
+  }
+  if (geteuid() == 0) {
+    return switchAsRoot(account, keepPrivilege);
+  }
+  if (account.uid != geteuid() || account.gid != getegid()) {
+    PLATFORM_LOG(kSource, "cannot become %s without root's rights", name);
+    errno = EPERM;
+    return false;
+  }
+  return keepPrivilege || setIds(account, false);
+}

@@ -1,0 +1,59 @@
+#include "platform/settings/Settings.h"
+
+#include <strings.h>
+
+#include <charconv>
+#include <cstring>
+
+#include "platform/base/KnownFile.h"
+#include "platform/base/Paths.h"
+#include "webapi/platform/Core.h"
+
+namespace QELO::Platform {
+namespace {
+
+std::shared_ptr<const KeyValueFile> defaults() {
+  static KnownFile<KeyValueFile> file(Paths::kSystemInfoDefaults);
+  return file.Get();
+}
+
+std::shared_ptr<const KeyValueFile> own() {
+  static KnownFile<KeyValueFile> file(Paths::kSystemInfo);
+  return file.Get();
+}
+
+}  // namespace
+
+Settings::Settings() : own_(own()) {}
+
+std::shared_ptr<const KeyValueFile> readKeyValueFile(const char* path) {
+  return strcmp(path, Paths::kSystemInfo) == 0 ? own() : std::make_shared<const KeyValueFile>(path);
+}
+
+std::string Settings::Get(std::string_view key, const char* fallback) const {
+  std::string value;
+  return own_->Get(key, value) || defaults()->Get(key, value) ? value : fallback;
+}
+
+int Settings::GetNumber(std::string_view key, int fallback, int lowest, int highest) const {
+  const std::string text = Get(key, "");
+  int number = 0;
+  const char* end = text.data() + text.size();
+  const auto result = std::from_chars(text.data(), end, number);
+  const bool good = result.ec == std::errc() && result.ptr == end;
+  return good && number >= lowest && number <= highest ? number : fallback;
+}
+
+bool Settings::GetSwitch(std::string_view key, bool fallback) const {
+  const std::string text = Get(key, "");
+  if (strcasecmp(text.c_str(), "yes") == 0) {
+    return true;
+  }
+  return strcasecmp(text.c_str(), "no") == 0 ? false : fallback;
+}
+
+}  // namespace QELO::Platform
+
+extern "C" int QLIBCConfGetARDOTimeout(void) {
+  return QELO::Platform::Settings().SessionTimeout();
+}

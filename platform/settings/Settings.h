@@ -1,0 +1,37 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "platform/settings/KeyValueFile.h"
+
+namespace QELO::Platform {
+
+/// The platform's settings: /etc/qeloinfo.conf, and for a key that is not there
+/// /etc.defaults/qeloinfo.conf.
+///
+/// A process keeps what it read of a file until the file changes: one request asks for settings a
+/// dozen times. Each object sees one state of the first file.
+class Settings {
+ public:
+  Settings();
+
+  std::string Get(std::string_view key, const char* fallback) const;
+  /// The fallback also when the value is no whole decimal number or out of range.
+  int GetNumber(std::string_view key, int fallback, int lowest, int highest) const;
+  /// "yes" and "no" in any case; the fallback for all else.
+  bool GetSwitch(std::string_view key, bool fallback) const;
+
+  /// Idle time-out of login sessions in seconds.
+  int SessionTimeout() const { return GetNumber("session_timeout", 900, 1, 366 * 86400); }
+  bool TokenEnabled() const { return GetSwitch("enable_token", true); }
+
+ private:
+  std::shared_ptr<const KeyValueFile> own_;
+};
+
+/// What a file of keys and values holds: of the settings' own file, what the process knows of it.
+std::shared_ptr<const KeyValueFile> readKeyValueFile(const char* path);
+
+}  // namespace QELO::Platform

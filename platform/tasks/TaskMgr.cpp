@@ -1,0 +1,67 @@
+#include <unistd.h>
+
+#include <algorithm>
+#include <vector>
+
+#include "platform/base/Log.h"
+#include "platform/tasks/Access.h"
+#include "platform/tasks/Id.h"
+#include "webapi/platform/Task.h"
+
+using namespace QELO::Platform;
+
+namespace ARDO {
+
+namespace {
+
+Json::Value listTasks(const std::string& owner, const char* prefix, bool unended) {
+  Json::Value ids(Json::arrayValue);
+  std::vector<ListedTask> tasks;
+  TaskStores* stores = openTaskStores();
+  if (stores == nullptr) {
+    return ids;
+  }
+  for (const uid_t store : stores->Stores()) {
+    if (mayHoldTasksOf(store, owner)) {
+      stores->List({store, owner, prefix != nullptr ? prefix : "", unended}, tasks);
+    }
+  }
+  const auto isOlder = [](const ListedTask& left, const ListedTask& right) {
+    return left.created < right.created;
+  };
+  if (!std::is_sorted(tasks.begin(), tasks.end(), isOlder)) {  // one store's are
+    std::stable_sort(tasks.begin(), tasks.end(), isOlder);
+  }
+  for (const ListedTask& task : tasks) {
+    ids.append(task.id);
+  }
+  return ids;
+}
+
+}  // namespace
+
+TaskMgr::TaskMgr(const std::string& owner) : owner_(owner) {}
+
+Json::Value TaskMgr::getAllTaskId(const char* prefix) {
+  return listTasks(owner_, prefix, false);
+}
+
+Json::Value TaskMgr::getUnendedTaskId(const char* prefix) {
+  return listTasks(owner_, prefix, true);
+}
+
+std::string TaskUtil::getUniqueID(const std::string&, const std::string& prefix) {
+  if (!isTaskPrefix(prefix)) {
+    PLATFORM_LOG("TaskMgr.cpp",
+                 "a task id's prefix holds up to %zu letters, digits, '.', '_' and '-'",
+                 kTaskPrefixLength);
+    return "";
+  }
+  return makeTaskId(prefix, geteuid());
+}
+
+bool TaskUtil::checkTaskExists(const std::string& owner, const std::string& taskId) {
+  return Task(owner, taskId).reload();
+}
+
+}  // namespace ARDO

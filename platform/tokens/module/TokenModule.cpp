@@ -1,0 +1,36 @@
+#include "platform/tokens/module/TokenModule.h"
+
+#include <time.h>
+
+#include "platform/base/TextBuffer.h"
+#include "platform/tokens/module/TokenStore.h"
+#include "webapi/Export.h"
+
+using QELO::Platform::fillBuffer;
+using QELO::Platform::TokenStore;
+
+extern "C" WEBAPI_API int webapiTokenGrant(const char* database, const char* token, const char* api,
+                                           const char* method, char* user, int size, char* error,
+                                           int errorSize) {
+  TokenStore store;
+  std::string name;
+  TokenStore::Grant grant = TokenStore::Grant::kFailed;
+  if (store.Open(database, false)) {
+    grant = store.Check(token, api, method, time(nullptr), name);
+  } else if (store.Missing()) {
+    grant = TokenStore::Grant::kUnknown;  // no token was ever made
+  }
+  switch (grant) {
+    case TokenStore::Grant::kGranted:
+      return fillBuffer(name, user, size) ? kTokenGranted : kTokenOtherCall;
+    case TokenStore::Grant::kUnknown:
+      return kTokenUnknown;
+    case TokenStore::Grant::kExpired:
+      return kTokenExpired;
+    case TokenStore::Grant::kOtherCall:
+      return kTokenOtherCall;
+    default:
+      fillBuffer(store.Error().substr(0, static_cast<size_t>(errorSize) - 1), error, errorSize);
+      return kTokenFailed;
+  }
+}

@@ -1,0 +1,230 @@
+#include "programs/webapi-token/Commands.h"
+
+#include <fcntl.h>
+#include <json/json.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <charconv>
+#include <map>
+
+#include "platform/base/Paths.h"
+#include "platform/tokens/module/TokenStore.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/platform/Core.h"
+#include "webapi/platform/WebAPIUtil.h"
+
+namespace QELO::TokenProgram {
+namespace {
+
+using Platform::TokenStore;
+
+constexpr int kDefaultDays = 90;
+constexpr int kMostDays = 36500;
+constexpr int64_t kDaySeconds = 86400;
+constexpr mode_t kStateDirMode = 0711;  // the groups' directories stand there too
+
+constexpr char kHelp[] =
+    "Access tokens stand for a user in API calls. A call sends its token as the parameter "
+    "tid=TOKEN,\n"
+    "instead of a login. The commands need root's rights.\n"
+    "\n"
+    "webapi-token create --user USER [--api API] [--method METHOD] [--days N]\n"
+    "    Makes a token and prints it, this once: only a hash of it is kept.\n"
+    "    --api, --method  the one API or method that it is for; \"*\", the default: all\n"
+    "    --days           how long it is good, 90 when not given; 0: for ever\n"
+    "webapi-token list\n"
+    "    Lists the tokens, below a line of headings; columns end with a tab.\n"
+    "webapi-token revoke ID\n"
+    "    Removes the token with this number.\n"
+    "webapi-token --help, -h\n";
+
+struct Streams {
+  FILE* output;
+  FILE* messages;
+};
+
+ExitCode wrongUse(const Streams& streams, const std::string& reason) {
+  fprintf(streams.messages, "webapi-token: %s; see webapi-token --help\n", reason.c_str());
+  return kWrongUse;
+}
+
+ExitCode failed(const Streams& streams, const std::string& reason) {
+  fprintf(streams.messages, "webapi-token: %s\n", reason.c_str());
+  return kFailed;
+}
+
+template <typename T>
+bool parse(const std::string& text, T lowest, T highest, T& number) {
+  const char* end = text.data() + text.size();
+  const auto result = std::from_chars(text.data(), end, number);
+  return result.ec == std::errc() && result.ptr == end && number >= lowest && number <= highest;
+}
+
+/// Whether the database, or the directory that is to have it, is another account's.
+bool lacksRights(const TokenStore& store) {
+  const char* path = store.Missing() ? Paths::kStateDir : Paths::kTokenDatabase;
+  return faccessat(AT_FDCWD, path, R_OK | W_OK, AT_EACCESS) != 0 && errno == EACCES;
+}
+
+std::string databaseError(const TokenStore& store) {
+  return std::string(Paths::kTokenDatabase) + ": " + store.Error() +
+         (lacksRights(store) ? "; root's rights are needed" : "");
+}
+
+/// Whether calls find a description of this API: in the file that is named after it, else after
+/// what stands before its last dots.
+bool isDescribed(const std::string& api) {
+  if (api.find('/') != std::string::npos) {
+    return false;
+  }
+  for (size_t end = api.size(); end != std::string::npos && end > 0;
+       end = api.find_last_of('.', end - 1)) {
+    const std::string file = Paths::kDescriptionDir + api.substr(0, end) + ".lib";
+    if (QLIBCFileExist(file.c_str()) == 1) {
+      Json::Value descriptions;
+      return WebAPIUtil::ReadJsonFile(file, descriptions) &&
+             JsonHelper::hasMember(descriptions, api);
+    }
+  }
+  return false;
+}
+
+std::string timeText(int64_t seconds) {
+  const time_t when = seconds;
+  tm parts{};
+  char text[32] = "";
+  gmtime_r(&when, &parts);
+  strftime(text, sizeof text, "%Y-%m-%d %H:%M", &parts);
+  return seconds == 0 ? "never" : text;
+}
+
+bool isPattern(const std::string& text) {
+  return text == "*" || (!text.empty() && text.find_first_of("* \t\r\n") == std::string::npos);
+}
+
+/// Reads "--name value" pairs. @return what is wrong, or ""
+std::string readOptions(const std::vector<std::string>& arguments,
+                        std::map<std::string, std::string>& options) {
+  for (size_t i = 1; i < arguments.size(); i += 2) {
+    const auto option = options.find(arguments[i]);
+    if (option == options.end()) {
+      return arguments[i] + " is no option of create";
+    }
+    if (i + 1 == arguments.size()) {
+      return arguments[i] + " needs a value";
+    }
+    option->second = arguments[i + 1];
+  }
+  return "";
+}
+
+/// Reads what the new token is to be. @return what is wrong with the call, or ""
+std::string readEntry(const std::vector<std::string>& arguments, TokenStore::Entry& entry) {
+  std::map<std::string, std::string> options = {
+      {"--user", ""}, {"--api", "*"}, {"--method", "*"}, {"--days", std::to_string(kDefaultDays)}};
+  const std::string wrong = readOptions(arguments, options);
+  int days = 0;
+  if (!wrong.empty()) {
+    return wrong;
+  }
+  if (options["--user"].empty()) {
+    return "--user is missing";
+  }
+  if (!isPattern(options["--api"]) || !isPattern(options["--method"])) {
+    return "--api and --method take a whole name, or \"*\" for all";
+  }
+  if (!parse(options["--days"], 0, kMostDays, days)) {
+    return "--days takes a number from 0 to " + std::to_string(kMostDays);
+  }
+  entry.user = options["--user"];
+  entry.api = options["--api"];
+  entry.method = options["--method"];
+  entry.expires = days == 0 ? 0 : time(nullptr) + days * kDaySeconds;
+  return "";
+}
+
+ExitCode create(const std::vector<std::string>& arguments, const Streams& streams) {
+  TokenStore::Entry entry;
+  const std::string wrong = readEntry(arguments, entry);
+  if (!wrong.empty()) {
+    return wrongUse(streams, wrong);
+  }
+  uid_t uid = 0;
+  gid_t gid = 0;
+  if (QELOUserGetUGID(entry.user.c_str(), &uid, &gid) != 0) {
+    return failed(streams, "there is no user " + entry.user);
+  }
+  if (entry.api != "*" && !isDescribed(entry.api)) {
+    fprintf(streams.messages, "webapi-token: there is no API %s; the token is made all the same\n",
+            entry.api.c_str());
+  }
+  QELOFSMkdirP(Paths::kStateDir, 1, 0, static_cast<uid_t>(-1), static_cast<gid_t>(-1),
+               kStateDirMode);
+  TokenStore store;
+  std::string token;
+  if (!store.Open(Paths::kTokenDatabase, true) || !store.Create(entry, token)) {
+    return failed(streams, databaseError(store));
+  }
+  fprintf(streams.output, "%s\n", token.c_str());
+  fprintf(streams.messages, "Token %lld of %s, good until: %s. It is not shown again.\n",
+          static_cast<long long>(entry.id), entry.user.c_str(), timeText(entry.expires).c_str());
+  return kDone;
+}
+
+ExitCode list(const Streams& streams) {
+  TokenStore store;
+  std::vector<TokenStore::Entry> entries;
+  const bool opened = store.Open(Paths::kTokenDatabase, false);
+  if ((!opened && !store.Missing()) || (opened && !store.List(entries))) {
+    return failed(streams, databaseError(store));
+  }
+  fprintf(streams.output, "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\n");
+  for (const TokenStore::Entry& entry : entries) {
+    fprintf(streams.output, "%lld\t%s\t%s\t%s\t%s\t%s\n", static_cast<long long>(entry.id),
+            entry.user.c_str(), entry.api.c_str(), entry.method.c_str(),
+            timeText(entry.created).c_str(), timeText(entry.expires).c_str());
+  }
+  return kDone;
+}
+
+ExitCode revoke(const std::string& number, const Streams& streams) {
+  int64_t id = 0;
+  if (!parse<int64_t>(number, 1, INT64_MAX, id)) {
+    return wrongUse(streams, "revoke takes the number of a token");
+  }
+  TokenStore store;
+  bool found = false;
+  const bool opened = store.Open(Paths::kTokenDatabase, false);
+  if ((!opened && !store.Missing()) || (opened && !store.Revoke(id, found))) {
+    return failed(streams, databaseError(store));
+  }
+  return found ? kDone : failed(streams, "there is no token " + number);
+}
+
+}  // namespace
+
+ExitCode run(const std::vector<std::string>& arguments, FILE* output, FILE* messages) {
+  const Streams streams{output, messages};
+  const std::string command = arguments.empty() ? "" : arguments[0];
+  if (std::any_of(arguments.begin(), arguments.end(), [](const std::string& argument) {
+        return argument == "--help" || argument == "-h";
+      })) {
+    fputs(kHelp, output);
+    return kDone;
+  }
+  if (command == "create") {
+    return create(arguments, streams);
+  }
+  if (command == "list" && arguments.size() == 1) {
+    return list(streams);
+  }
+  if (command == "revoke" && arguments.size() == 2) {
+    return revoke(arguments[1], streams);
+  }
+  return wrongUse(streams, command.empty() ? "a command is missing" : "wrong command");
+}
+
+}  // namespace QELO::TokenProgram

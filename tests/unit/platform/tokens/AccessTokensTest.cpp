@@ -1,0 +1,177 @@
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <filesystem>
+
+#include "platform/tokens/module/TokenStore.h"
+#include "tests/support/SyslogCapture.h"
+#include "tests/unit/platform/PrivateRoot.h"
+#include "webapi/platform/Token.h"
+
+namespace {
+
+using QELO::Platform::TokenStore;
+
+class AccessTokens : public PrivateRoot {
+ protected:
+  static std::string Database() { return Path("var/lib/webapi/tokens.db"); }
+
+  static std::string Create(const std::string& user = "alice", const std::string& api = "*",
+                            const std::string& method = "*", int64_t expires = 0,
+                            int64_t* id = nullptr) {
+    TokenStore store;
+    TokenStore::Entry entry;
+    entry.user = user;
+    entry.api = api;
+    entry.method = method;
+    entry.expires = expires;
+    std::string token;
+    EXPECT_TRUE(store.Open(Database().c_str(), true)) << store.Error();
+    EXPECT_TRUE(store.Create(entry, token)) << store.Error();
+    if (id != nullptr) {
+      *id = entry.id;
+    }
+    return token;
+  }
+
+  int Grant(const std::string& token, const char* api = "QELO.X", const char* method = "get",
+            int size = 64) {
+    user_[0] = 'x';
+    user_[1] = '\0';
+    const int result = QeloAccessTokenGrant(token.c_str(), api, method, user_, size);
+    EXPECT_EQ(result >= 0, user_[0] != '\0') << user_;
+    return result;
+  }
+
+  char user_[64] = "";
+};
+
+TEST_F(AccessTokens, TokenStandsForItsUser) {
+  EXPECT_EQ(Grant(Create()), 1);
+  EXPECT_STREQ(user_, "alice");
+  EXPECT_EQ(Grant(Create("bob")), 1);
+  EXPECT_STREQ(user_, "bob");
+}
+
+TEST_F(AccessTokens, UnknownTokenIsRefused) {
+  EXPECT_EQ(Grant(std::string(43, 'a')), -1);
+  Create();
+  EXPECT_EQ(Grant(std::string(43, 'a')), -1);
+}
+
+TEST_F(AccessTokens, WithoutDatabaseNoneIsMade) {
+  EXPECT_EQ(Grant(std::string(43, 'a')), -1);
+  EXPECT_FALSE(std::filesystem::exists(Database()));
+  EXPECT_EQ(SyslogCapture::Count(""), 0);
+}
+
+TEST_F(AccessTokens, TextThatIsNoTokenIsRefusedWithoutLooking) {
+  ASSERT_EQ(remove(Path("modules/tokens.so").c_str()), 0);
+  for (const std::string& wrong : {std::string(), std::string("x"), std::string(44, 'a'),
+                                   std::string(42, 'a') + "'", std::string(100000, 'a')}) {
+    EXPECT_EQ(Grant(wrong), -1);
+  }
+  EXPECT_EQ(QeloAccessTokenGrant(nullptr, "a", "m", user_, sizeof user_), -1);
+  EXPECT_EQ(SyslogCapture::Count("refused to load"), 0);
+}
+
+TEST_F(AccessTokens, TokenIsForItsApiAndMethodAlone) {
+  const std::string token = Create("alice", "QELO.X", "get");
+  EXPECT_EQ(Grant(token, "QELO.X", "get"), 1);
+  EXPECT_EQ(Grant(token, "QELO.X", "set"), -3);
+  EXPECT_EQ(Grant(token, "QELO.Y", "get"), -3);
+  EXPECT_EQ(Grant(token, "QELO.x", "get"), -3);
+  EXPECT_EQ(Grant(token, "QELO.X.Y", "get"), -3);
+  EXPECT_EQ(Grant(token, "", ""), -3);
+  EXPECT_EQ(Grant(Create("alice", "QELO.X", "*"), "QELO.X", "set"), 1);
+  EXPECT_EQ(Grant(Create("alice", "*", "get"), "QELO.Y", "get"), 1);
+  EXPECT_EQ(Grant(Create("alice", "*", "get"), "QELO.Y", "set"), -3);
+}
+
+TEST_F(AccessTokens, ExpiredTokenIsRefused) {
+  EXPECT_EQ(Grant(Create("alice", "*", "*", time(nullptr) + 100)), 1);
+  EXPECT_EQ(Grant(Create("alice", "*", "*", time(nullptr))), -2);
+  EXPECT_EQ(Grant(Create("alice", "*", "*", time(nullptr) - 100)), -2);
+}
+
+TEST_F(AccessTokens, TokenOfAUserWhoIsGoneIsRefused) {
+  const std::string token = Create();
+  Write("etc/passwd", "bob:x:1003:1003::/:/bin/sh\n", 0644);
+  EXPECT_EQ(Grant(token), -1);
+}
+
+TEST_F(AccessTokens, NameThatDoesNotFitIsRefused) {
+  EXPECT_EQ(Grant(Create(), "a", "m", 5), -3);
+  EXPECT_EQ(Grant(Create(), "a", "m", 6), 1);
+}
+
+TEST_F(AccessTokens, RevokedTokenIsRefused) {
+  int64_t id = 0;
+  const std::string token = Create("alice", "*", "*", 0, &id);
+  TokenStore store;
+  ASSERT_TRUE(store.Open(Database().c_str(), false));
+  bool found = false;
+  EXPECT_TRUE(store.Revoke(id, found));
+  EXPECT_TRUE(found);
+  EXPECT_EQ(Grant(token), -1);
+  EXPECT_TRUE(store.Revoke(id, found));
+  EXPECT_FALSE(found);
+}
+
+TEST_F(AccessTokens, DatabaseKeepsNoTokenAndIsForItsOwnerAlone) {
+  const std::string token = Create();
+  Grant(token);
+  int files = 0;
+  for (const auto& entry : std::filesystem::directory_iterator(Path("var/lib/webapi"))) {
+    const std::string name = "var/lib/webapi/" + entry.path().filename().string();
+    if (!entry.path().filename().string().starts_with("tokens.db")) {
+      continue;  // another store's
+    }
+    ++files;
+    EXPECT_EQ(Read(name).find(token), std::string::npos) << name;
+    EXPECT_EQ(Status(name).st_mode, S_IFREG | 0600U) << name;
+  }
+  EXPECT_GE(files, 1);
+}
+
+TEST_F(AccessTokens, BrokenDatabaseCannotBeAsked) {
+  Write("var/lib/webapi/tokens.db", std::string(8192, 'x'));
+  EXPECT_EQ(Grant(std::string(43, 'a')), -4);
+  EXPECT_EQ(SyslogCapture::Count("cannot check an access token [file is not a database]"), 1);
+}
+
+TEST_F(AccessTokens, EmptyDatabaseCannotBeAsked) {
+  Write("var/lib/webapi/tokens.db", "");
+  EXPECT_EQ(Grant(std::string(43, 'a')), -4);
+  EXPECT_EQ(SyslogCapture::Count("no such table"), 1);
+}
+
+TEST_F(AccessTokens, MissingModuleCannotCheck) {
+  const std::string token = Create();
+  ASSERT_EQ(remove(Path("modules/tokens.so").c_str()), 0);
+  EXPECT_EQ(Grant(token), -4);
+  EXPECT_EQ(SyslogCapture::Count("refused to load " + Path("modules/tokens.so")), 1);
+}
+
+TEST_F(AccessTokens, ProcessesAskAndMakeAtTheSameTime) {
+  const std::string token = Create();
+  std::vector<pid_t> children;
+  for (int i = 0; i < 8; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      int failures = 0;
+      for (int n = 0; n < 20; ++n) {
+        failures += Grant(i % 2 == 0 ? token : Create()) == 1 ? 0 : 1;
+      }
+      _exit(failures);
+    }
+    children.push_back(child);
+  }
+  for (const pid_t child : children) {
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(status, 0);
+  }
+}
+
+}  // namespace

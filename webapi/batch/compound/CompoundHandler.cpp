@@ -1,0 +1,186 @@
+// The compound request as a whole: parameters, preparation, the walk over the entries and the
+// combined answer.
+
+#include "webapi/CompoundHandler.h"
+
+#include <new>
+
+#include "webapi/APIRequest.h"
+#include "webapi/APIResponse.h"
+#include "webapi/APIRunner.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/Pipe.h"
+#include "webapi/base/Log.h"
+#include "webapi/runner/execution/ProcessGuards.h"
+
+namespace QELO {
+namespace {
+
+constexpr char kSource[] = "CompoundHandler.cpp";
+
+Json::Value asPostParameters(const Json::Value& entry) {
+  Json::Value params;
+  params["postParam"] = entry;
+  return params;
+}
+
+}  // namespace
+
+CompoundHandler::CompoundHandler(APIRequest* request, APIResponse* response, APIRunner* runner)
+    : request_(request),
+      response_(response),
+      runner_(runner),
+      data_(Json::objectValue),
+      info_(Json::arrayValue) {
+  data_["result"] = Json::Value(Json::arrayValue);
+}
+
+CompoundHandler::~CompoundHandler() {
+  for (const Child& child : children_) {
+    delete child.first;
+  }
+}
+
+bool CompoundHandler::Process() {
+  int code = ParseParams();
+  if (code != WEBAPI_ERR_NONE) {
+    WEBAPI_LOG(kSource, "ParseParams failed");
+  } else if ((code = PrepareNewCompReqResp()) != WEBAPI_ERR_NONE) {
+    WEBAPI_LOG(kSource, "PrepareNewCompReqResp failed");
+  } else if ((code = CompoundProcess()) != WEBAPI_ERR_NONE) {
+    WEBAPI_LOG(kSource, "CompoundProcess failed");
+  }
+  Output(static_cast<_tag_WEBAPI_ERR>(code));
+  if (entryResponse_ != nullptr) {
+    response_->SetCallbackFuncs(entryResponse_->GetCallbackFuncs());
+  }
+  return code == WEBAPI_ERR_NONE;
+}
+
+int CompoundHandler::ParseParams() {
+  static const Json::Value null;
+  parallel_ = JsonHelper::asString(request_->GetParam("mode", "sequential")) == "parallel";
+  stopWhenError_ = !parallel_ && JsonHelper::asBool(request_->GetParam("stop_when_error", false));
+  entries_ = &request_->GetParamRef("compound", null);
+  return entries_->isArray() ? WEBAPI_ERR_NONE : WEBAPI_ERR_NO_COMPOUND;
+}
+
+int CompoundHandler::PrepareNewCompReqResp() {
+  entryRequest_.reset(new (std::nothrow) APIRequest(*request_));
+  if (entryRequest_ == nullptr) {
+    WEBAPI_LOG(kSource, "new APIRequest Fail");
+    return WEBAPI_ERR_NO_ANSWER;
+  }
+  PrepareEnvironment();
+  entryRequest_->InitParam(asPostParameters(Json::Value(Json::objectValue)), false);
+  entryResponse_.reset(new (std::nothrow) APIResponse(entryRequest_.get()));
+  if (entryResponse_ == nullptr) {
+    WEBAPI_LOG(kSource, "new APIResponse Fail");
+    return WEBAPI_ERR_NO_ANSWER;
+  }
+  return WEBAPI_ERR_NONE;
+}
+
+void CompoundHandler::PrepareEnvironment() {
+  Json::Value environment = request_->GetEnv("");
+  if (!environment.isObject()) {
+    environment = Json::Value(Json::objectValue);
+  }
+  environment.removeMember("QUERY_STRING");
+  environment["REQUEST_METHOD"] = "POST";
+  // The copy has the outer request's environment, into which this would only be merged.
+  entryRequest_->Serialize()["environ"] = Json::Value(Json::objectValue);
+  entryRequest_->InitEnv(environment);
+}
+
+/// A method may change the record in place, to what can take no entry.
+void CompoundHandler::RepairRequest() {
+  const Json::Value& record = entryRequest_->Serialize();
+  if (!JsonHelper::member(record, "private").isObject() ||
+      !JsonHelper::member(record, "param").isObject()) {
+    Json::Value fresh = request_->Serialize();
+    entryRequest_->Deserialize(fresh);
+    PrepareEnvironment();
+  }
+}
+
+/// What an entry does not name must not come from the one before it, which would run again.
+void CompoundHandler::TakeEntry(const Json::Value& entry) {
+  RepairRequest();
+  Json::Value& call = entryRequest_->Serialize()["private"];
+  for (const char* key : {"api", "version", "method"}) {
+    call.removeMember(key);
+  }
+  entryRequest_->InitParam(asPostParameters(entry), true);
+}
+
+void CompoundHandler::PreloadLibs() {
+  // A library's constructors are foreign code.
+  const WorkingDirectory directory;
+  const StandardStreams shut(true, true);
+  if (shut.IsShut()) {
+    PreloadLibs(*entries_, true);
+  }
+}
+
+void CompoundHandler::PreloadLibs(const Json::Value& value, bool top) {
+  const Json::Value& nested = top ? value : JsonHelper::member(value, "compound");
+  if (top || JsonHelper::hasMember(value, "compound")) {
+    if (nested.isArray() || nested.isObject()) {
+      for (const Json::Value& element : nested) {
+        PreloadLibs(element, false);
+      }
+    }
+    return;
+  }
+  TakeEntry(value);
+  runner_->GetMethod(entryRequest_->GetAPIClass(), entryRequest_->GetAPIVersion(),
+                     entryRequest_->GetAPIMethod());
+  runner_->AddAPIInfo(entryRequest_.get());
+  void* handle = nullptr;
+  runner_->CacheLib(entryRequest_.get(), &handle);
+}
+
+int CompoundHandler::CompoundProcess() {
+  data_["result"] = Json::Value(Json::arrayValue);
+  if (!parallel_) {
+    PreloadLibs();
+  }
+  for (unsigned index = 0; index < entries_->size(); ++index) {
+    if (CompoundProcessEntry((*entries_)[index], index) != WEBAPI_ERR_NONE) {
+      hasFail_ = true;
+    }
+  }
+  if (parallel_) {
+    for (Child& child : children_) {
+      PrepareCompundResponseFromChild(child);
+    }
+  }
+  HandleCompoundInfo();
+  return WEBAPI_ERR_NONE;
+}
+
+void CompoundHandler::HandleCompoundInfo() {
+  for (const Json::Value& info : info_) {
+    if (JsonHelper::asInt(JsonHelper::member(info, "error")) != 0) {
+      hasFail_ = true;
+    }
+    if (JsonHelper::hasMember(info, "x-request-error")) {
+      response_->SetServerError(JsonHelper::asString(info["x-request-error"]));
+    }
+    if (JsonHelper::asBool(JsonHelper::member(info, "restart_httpd"))) {
+      response_->SetHttpdRestart(true);
+    }
+  }
+}
+
+void CompoundHandler::Output(_tag_WEBAPI_ERR code) {
+  data_["has_fail"] = hasFail_;
+  if (code != WEBAPI_ERR_NONE) {
+    response_->SetError(code, message_);
+  } else {
+    response_->SetSuccess(data_);
+  }
+}
+
+}  // namespace QELO

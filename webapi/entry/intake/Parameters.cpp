@@ -1,0 +1,123 @@
+// The web entry's parameter intake: query string and request body become parameters, enciphered
+// envelopes undone.
+
+#include <syslog.h>
+#include <unistd.h>
+
+#include <exception>
+
+#include "webapi/APIRequest.h"
+#include "webapi/APIResponse.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/WebAPIError.h"
+#include "webapi/WebEntry.h"
+#include "webapi/entry/intake/RequestBody.h"
+#include "webapi/model/request/CipherEnvelope.h"
+#include "webapi/platform/Cgi.h"
+#include "webapi/platform/WebAPIUtil.h"
+
+namespace QELO {
+namespace {
+
+constexpr char kQueryString[] = "QUERY_STRING";
+constexpr char kUploadContentType[] = "text/plain; charset=\"UTF-8\"";
+constexpr char kEnvelope[] = "webapi";
+constexpr char kCipherToken[] = "__cIpHeRtOkEn";
+constexpr int kExceptionLine = 275;  ///< administrators' log filters know the message by this line
+
+/// The member `name` of the parameters, an object from now on.
+Json::Value& sectionOf(Json::Value& params, const char* name) {
+  if (!params.isObject()) {
+    params = Json::Value(Json::objectValue);
+  }
+  Json::Value& section = params[name];
+  if (!section.isObject()) {
+    section = Json::Value(Json::objectValue);
+  }
+  return section;
+}
+
+bool namesCall(const Json::Value& section) {
+  return JsonHelper::hasMember(section, "api") && JsonHelper::hasMember(section, "version") &&
+         JsonHelper::hasMember(section, "method");
+}
+
+}  // namespace
+
+bool WebEntry::InitParam(Json::Value& params) {
+  if (Request()->HasEnv(kQueryString) && !InitGetParam(sectionOf(params, "getParam"))) {
+    return false;
+  }
+  if (Request()->GetRequestMethod() != APIRequest::METHOD_POST) {
+    return true;
+  }
+  bool taken = false;
+  if (Request()->IsUploadRequest()) {
+    Response()->SetHeader("Content-type", kUploadContentType);
+    if (namesCall(JsonHelper::member(params, "getParam"))) {
+      return true;  // the body is the upload handler's
+    }
+    taken = LoadUploadAPIDesc(sectionOf(params, "postParam"));
+  } else {
+    taken = InitPostParam(sectionOf(params, "postParam"));
+  }
+  if (!taken) {
+    Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+  }
+  return taken;
+}
+
+bool WebEntry::InitGetParam(Json::Value& section) {
+  const Json::Value query = Request()->GetEnv(kQueryString, Json::Value());
+  if (!query.isString()) {
+    Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
+  return DetectAndDecryptParamLine(query.asString(), section);
+}
+
+bool WebEntry::InitPostParam(Json::Value& section) {
+  try {
+    const int64_t length = JsonHelper::asInt64(Request()->GetEnv("CONTENT_LENGTH", 0), 0);
+    if (!section.isObject() || Request()->IsUploadRequest() || length <= 0 ||
+        length > RequestBody::kMaxLength) {
+      return false;
+    }
+    std::string body;
+    const bool received = RequestBody::Read(STDIN_FILENO, length, RequestBody::kIdleLimit, body);
+    RequestBody::CloseStandardInput();
+    return received && !body.empty() && DetectAndDecryptParamLine(body, section);
+  } catch (const std::exception& error) {
+    syslog(LOG_ERR, "%s:%d %s", "WebEntry", kExceptionLine, error.what());
+    return false;
+  }
+}
+
+bool WebEntry::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {
+  std::string copy = line;
+  // Deciphered in place: the text ends at its first NUL, before and after.
+  if (QeloCgiDetectAndDecryptParamLine(copy.data()) == 0 ||
+      !CipherEnvelope::addLine(copy.c_str(), section)) {
+    return false;
+  }
+  if (!section.empty() && !DecryptAESParam(section)) {
+    return false;
+  }
+  if (!JsonHelper::hasMember(JsonHelper::member(section, kEnvelope), CipherEnvelope::kCipherText)) {
+    return true;
+  }
+  const std::string cipher = CipherEnvelope::take(section[kEnvelope], CipherEnvelope::kCipherText);
+  DecryptParam(cipher, section[kEnvelope]);  // one that cannot be deciphered is left out
+  section[kEnvelope].removeMember(kCipherToken);
+  return true;
+}
+
+bool WebEntry::DecryptParam(const std::string& text, Json::Value& section) {
+  return CipherEnvelope::openText(text, section) && (section.empty() || DecryptAESParam(section));
+}
+
+bool WebEntry::DecryptAESParam(Json::Value& section) {
+  return CipherEnvelope::openAes(section);
+}
+
+}  // namespace QELO

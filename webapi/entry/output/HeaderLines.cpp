@@ -1,0 +1,90 @@
+#include "webapi/entry/output/HeaderLines.h"
+
+#include <json/json.h>
+#include <strings.h>
+
+#include <algorithm>
+#include <cstring>
+
+#include "webapi/APIResponse.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/base/Log.h"
+
+namespace QELO {
+namespace {
+
+constexpr char kContentType[] = "Content-type";  // as a fresh response presets it
+
+bool isToken(const std::string& name) {
+  return !name.empty() && std::all_of(name.begin(), name.end(), [](unsigned char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') ||
+           (c != '\0' && strchr("!#$%&'*+-.^_`|~", c) != nullptr);
+  });
+}
+
+bool fitsOneLine(const std::string& text) {
+  return std::none_of(text.begin(), text.end(),
+                      [](char c) { return c == '\r' || c == '\n' || c == '\0'; });
+}
+
+bool isContentType(const std::string& name) {
+  return strcasecmp(name.c_str(), kContentType) == 0;
+}
+
+/// Whether a header makes a line; one that should but cannot is logged.
+bool isSendable(const std::string& name, const Json::Value& value) {
+  if (!value.isString()) {
+    return false;
+  }
+  if (!isToken(name) || !fitsOneLine(value.asString())) {
+    WEBAPI_LOG("WebEntry.cpp", "header %s is not sent", LogText(name).c_str());
+    return false;
+  }
+  return true;
+}
+
+}  // namespace
+
+std::vector<std::string> HeaderLines(const APIResponse& response) {
+  const Json::Value headers = response.GetHeaders();
+  std::vector<std::string> lines;
+  std::string contentType;
+  size_t contentTypeLine = 0;
+  for (auto it = headers.begin(); it != headers.end(); ++it) {
+    const std::string name = it.name();
+    if (!isSendable(name, *it)) {
+      continue;
+    }
+    const std::string line = name + ": " + JsonHelper::asString(*it);
+    if (!isContentType(name)) {
+      lines.push_back(line);
+    } else if (contentType.empty()) {
+      contentType = name;
+      contentTypeLine = lines.size();
+      lines.push_back(line);
+    } else if (contentType == kContentType) {
+      contentType = name;
+      lines[contentTypeLine] = line;
+    }
+  }
+  return lines;
+}
+
+std::vector<std::string> CookieLines(const APIResponse& response) {
+  std::vector<std::string> lines;
+  for (const Json::Value& cookie : response.GetCookies()) {
+    if (!cookie.isString()) {
+      continue;
+    }
+    const std::string text = cookie.asString();
+    if (!fitsOneLine(text)) {
+      WEBAPI_LOG("WebEntry.cpp", "cookie %s is not sent",
+                 LogText(text.substr(0, text.find('='))).c_str());
+      continue;
+    }
+    lines.push_back("Set-Cookie: " + text);
+  }
+  return lines;
+}
+
+}  // namespace QELO

@@ -1,0 +1,263 @@
+// The web entry's permission check: who calls, and whether that user may run the method.
+
+#include <syslog.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <cstring>
+#include <utility>
+
+#include "webapi/APIAuth.h"
+#include "webapi/APIRequest.h"
+#include "webapi/APIResponse.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/WebAPIError.h"
+#include "webapi/WebEntry.h"
+#include "webapi/entry/permission/SessionOrigin.h"
+#include "webapi/entry/permission/UserClass.h"
+#include "webapi/platform/Cgi.h"
+#include "webapi/platform/Core.h"
+#include "webapi/platform/Token.h"
+#include "webapi/runner/CompoundCall.h"
+
+namespace QELO {
+namespace {
+
+constexpr int kOptionSize = 1024;    ///< bytes of a session's option with its NUL
+constexpr int kTokenFailLine = 577;  ///< administrators' log filters know the message by this line
+
+int errorOf(int result) {
+  switch (result) {
+    case AUTHORIZED_YES:
+    case AUTHORIZED_YES_TIMED_OUT:
+      return WEBAPI_ERR_NONE;
+    case AUTHORIZED_TIMED_OUT:
+      return WEBAPI_ERR_SESSION_TIMEOUT;
+    case AUTHORIZED_UNAUTHENTICATED:
+      return WEBAPI_ERR_NOT_AUTHENTICATED;
+    case AUTHORIZED_ADDRESS_MISMATCH:
+      return WEBAPI_ERR_ADDRESS_MISMATCH;
+    default:
+      return WEBAPI_ERR_NO_PERMISSION;
+  }
+}
+
+/// The word for web server and clients that goes with an error, or null.
+const char* serverErrorOf(int code) {
+  switch (code) {
+    case WEBAPI_ERR_NO_PERMISSION:
+      return "noprivilege";
+    case WEBAPI_ERR_SESSION_TIMEOUT:
+      return "timeout";
+    case WEBAPI_ERR_NOT_AUTHENTICATED:
+      return "unauth";
+    case WEBAPI_ERR_ADDRESS_MISMATCH:
+      return "errorip";
+    default:
+      return nullptr;
+  }
+}
+
+bool IsTokenGranted(const APIRequest& request, char* user, int size) {
+  const char* token = request.GetQeloAccessTokenID();
+  return token != nullptr && QeloAccessTokenGrant(token, request.GetAPIClass().c_str(),
+                                                  request.GetAPIMethod().c_str(), user, size) >= 0;
+}
+
+std::string optionOf(QeloCgiContext* context, const char* name, const char* def = "") {
+  char value[kOptionSize] = {};
+  return QeloCgiGetOption(context, name, value, kOptionSize) == 1 ? value : def;
+}
+
+/// What is known of a request's caller, in the form that a request takes it.
+Json::Value sessionOf(const APIRequest& caller) {
+  Json::Value session(Json::objectValue);
+  session["username"] = caller.GetLoginUserName();
+  session["isAdmin"] = caller.IsAdmin();
+  session["sessFile"] = caller.GetSessionFilePath();
+  session["isTimeout"] = caller.IsTimeout();
+  session["timeout"] = caller.GetTimeoutDuration();
+  session["isSkipCheckIP"] = caller.IsSkipCheckIP();
+  session["uiLang"] = caller.GetUILanguage();
+  session["app"] = caller.GetApplication();
+  session["webapi"] = caller.GetWebAPIPriv();
+  session["isAuthorized"] = caller.IsAuthorized();
+  session["tokenEnable"] = caller.IsTokenEnable();
+  return session;
+}
+
+/// A session with nobody in it.
+Json::Value emptySessionOf(const APIRequest& caller) {
+  Json::Value session(Json::objectValue);
+  session["uiLang"] = caller.GetUILanguage();
+  session["tokenEnable"] = caller.IsTokenEnable();
+  return session;
+}
+
+}  // namespace
+
+bool WebEntry::NeedPermission(APIRequest* request) {
+  return request == nullptr ||
+         AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) != AUTH_NONE;
+}
+
+bool WebEntry::SkipPermission(APIRequest* request) {
+  return request != nullptr &&
+         AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) == AUTH_SKIP;
+}
+
+bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
+  if (request == nullptr || response == nullptr) {
+    return false;
+  }
+  const bool allowTimeout = GetMethodAttr(request, "allowTimeout");
+  int code = CheckPermission(allowTimeout);
+  int result = JsonHelper::asInt(KnownResult(allowTimeout), AUTHORIZED_UNKNOWN);
+  if (code == WEBAPI_ERR_NONE && !CoversInnerCall(*request)) {
+    result = AUTHORIZED_UNAUTHENTICATED;
+    code = errorOf(result);
+  }
+  if (result == AUTHORIZED_TOKEN_MISMATCH &&
+      AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) == AUTH_LOGIN) {
+    syslog(LOG_ERR, "%s:%d Token Authentication Fail.", "WebEntry", kTokenFailLine);
+  }
+  APIRequest* caller = Request();
+  if (request != caller) {
+    // A request within this one, which may still hold what the check before found.
+    request->InitSession(code == WEBAPI_ERR_NONE ? sessionOf(*caller) : emptySessionOf(*caller));
+    request->SetCookie("id", caller->GetSessionID());
+  }
+  request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
+  response->SetError(code);
+  if (code != WEBAPI_ERR_NONE) {
+    if (serverErrorOf(code) != nullptr) {
+      response->SetServerError(serverErrorOf(code));
+    }
+    return false;
+  }
+  if (!IsAllowedUser(request)) {
+    response->SetError(WEBAPI_ERR_NO_PERMISSION);
+    return false;
+  }
+  const Json::Value appPriv = request->GetAPIInfo("appPriv", "");
+  if (!HoldsAppPriv(appPriv, caller->GetLoginUserName(), caller->GetRemoteIP())) {
+    response->SetError(WEBAPI_ERR_NO_APP_PRIVILEGE);
+    return false;
+  }
+  Json::Value session;
+  Json::Value& record = request->Serialize();
+  if (request == caller && JsonHelper::member(record, "session").isObject()) {
+    session.swap(record["session"]);  // holds already what the check found
+  } else {
+    session = sessionOf(*caller);
+  }
+  session["appPriv"] = JsonHelper::asString(appPriv);
+  request->InitSession(std::move(session));
+  request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
+  return true;
+}
+
+/// A token stands for the calls that it was made for, within a compound request too.
+bool WebEntry::CoversInnerCall(const APIRequest& request) {
+  if (&request == Request() || !JsonHelper::asBool(JsonHelper::member(permission_, "token"))) {
+    return true;
+  }
+  char user[kUserNameSize] = {};
+  return IsTokenGranted(request, user, kUserNameSize);
+}
+
+bool WebEntry::IsAllowedUser(APIRequest* request) {
+  const std::string user = Request()->GetLoginUserName();
+  Json::Value allowUser = request->GetAPIInfo("allowUser", Json::Value());
+  const Json::Value& method =
+      GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
+  if (JsonHelper::hasMember(method, "allowUser")) {
+    allowUser = method["allowUser"];
+  }
+  return !user.empty() &&
+         ListsUserClass(allowUser, APIAuth::GetUserClass(Request()->IsAdmin(), user));
+}
+
+const Json::Value& WebEntry::KnownResult(bool allowTimeout) const {
+  const Json::Value& results = JsonHelper::member(permission_, "permResult");
+  const Json::ArrayIndex slot = allowTimeout ? 0 : 1;
+  return results.isArray() && results.isValidIndex(slot) ? results[slot]
+                                                         : Json::Value::nullSingleton();
+}
+
+int WebEntry::CheckPermission(bool allowTimeout) {
+  const Json::Value& known = KnownResult(allowTimeout);
+  const int result = known.isInt() ? known.asInt() : Authorise(allowTimeout);
+  permission_["permResult"][allowTimeout ? 0U : 1U] = result;
+  Request()->SetAuthResult(static_cast<_tag_authorized_result_>(result));
+  return errorOf(result);
+}
+
+/// The caller's session is asked first, then the access token.
+int WebEntry::Authorise(bool allowTimeout) {
+  APIRequest* request = Request();
+  int result = AUTHORIZED_NO_SESSION;
+  char user[kUserNameSize] = {};
+  const std::string language = QeloCgiGetLang(Context());
+  if (!request->GetSessionID().empty()) {
+    const QeloCgiAuthFlags flags{IsSessionFromParameter(*request) ? 1U : 0U, KeepsIdle() ? 1U : 0U};
+    result = QeloCgiIsAuthorizedEx(Context(), &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
+                                   GetMethodAttr(request, "skipCheckIP") ? 0 : 1);
+  }
+  if (result < 0) {
+    const char* token = request->GetQeloAccessTokenID();
+    if (token == nullptr || *token == '\0') {
+      return result;
+    }
+    if (!request->GetSessionID().empty()) {
+      // Nothing of a refused session may stay: a method could act on it in the token's name.
+      memset(user, 0, sizeof user);
+      request->SetCookie("id", "");
+      QeloCgiInit("", Context());
+    }
+    const bool granted = IsTokenGranted(*request, user, kUserNameSize);
+    result = granted ? AUTHORIZED_YES : AUTHORIZED_UNAUTHENTICATED;
+    permission_["token"] = granted;
+    if (!granted) {
+      user[0] = '\0';
+    }
+  }
+  FillSession(user, language, errorOf(result) == WEBAPI_ERR_NONE);
+  return result;
+}
+
+/// Whether the request is no use of the session: its method says so, or those of all its entries
+/// do.
+bool WebEntry::KeepsIdle() {
+  constexpr char kAttribute[] = "keepIdle";
+  const Json::Value& entries = Request()->GetParamRef("compound", Json::Value::nullSingleton());
+  if (!entries.isArray() || Request()->GetAPIClass() != kCompoundAPI) {
+    return GetMethodAttr(Request(), kAttribute);
+  }
+  return std::all_of(entries.begin(), entries.end(), [&](const Json::Value& entry) {
+    return GetMethodAttr(JsonHelper::asString(JsonHelper::member(entry, "api")),
+                         JsonHelper::asInt(JsonHelper::member(entry, "version")),
+                         JsonHelper::asString(JsonHelper::member(entry, "method")), kAttribute);
+  });
+}
+
+void WebEntry::FillSession(const std::string& user, const std::string& language,
+                           bool isAuthorized) {
+  setenv("QELO_WEBAPI_USERNAME", user.c_str(), 1);
+  Json::Value session(Json::objectValue);
+  session["username"] = user;
+  session["isAdmin"] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
+  session["sessFile"] = optionOf(Context(), "sessfile");
+  session["isTimeout"] = optionOf(Context(), "istimeout") == "1";
+  session["timeout"] =
+      static_cast<Json::Int64>(strtol(optionOf(Context(), "timeout", "0").c_str(), nullptr, 10));
+  session["isSkipCheckIP"] = optionOf(Context(), "skipcheckip") == "1";
+  session["uiLang"] = language;
+  session["app"] = optionOf(Context(), "app");
+  session["webapi"] = optionOf(Context(), "webapi");
+  session["isAuthorized"] = isAuthorized;
+  session["tokenEnable"] = QeloCgiIsTokenEnable(Context()) != 0;
+  Request()->InitSession(std::move(session));
+}
+
+}  // namespace QELO

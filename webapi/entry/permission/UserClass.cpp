@@ -1,0 +1,33 @@
+#include "webapi/entry/permission/UserClass.h"
+
+#include <algorithm>
+
+#include "webapi/JsonHelper.h"
+#include "webapi/platform/Core.h"
+
+namespace QELO {
+
+bool ListsUserClass(const Json::Value& allowUser, const std::string& userClass) {
+  const Json::Value wanted(userClass);
+  return allowUser.isArray() &&
+         std::any_of(allowUser.begin(), allowUser.end(),
+                     [&wanted](const Json::Value& entry) { return entry == wanted; });
+}
+
+int AuthLevelOf(const Json::Value& level) {
+  const bool isInteger = level.type() == Json::intValue || level.type() == Json::uintValue;
+  return isInteger ? JsonHelper::asInt(level, AUTH_LOGIN) : AUTH_LOGIN;
+}
+
+bool HoldsAppPriv(const Json::Value& appPriv, const std::string& user, const std::string& address) {
+  if (appPriv.isNull()) {
+    return true;
+  }
+  if (!appPriv.isString()) {
+    return false;
+  }
+  const std::string name = appPriv.asString();
+  return name.empty() || QLIBAppPrivUserHas(user.c_str(), name.c_str(), address.c_str()) > 0;
+}
+
+}  // namespace QELO

@@ -1,0 +1,253 @@
+#include "webapi/ExecHandler.h"
+
+#include <errno.h>
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <iostream>
+#include <string>
+#include <string_view>
+
+#include "webapi/APIRequest.h"
+#include "webapi/ExecParam.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/Pipe.h"
+#include "webapi/WebAPIError.h"
+#include "webapi/base/Log.h"
+#include "webapi/platform/Core.h"
+#include "webapi/platform/Paths.h"
+#include "webapi/runner/execution/ProcessGuards.h"
+
+namespace QELO {
+namespace {
+
+constexpr char kSource[] = "ExecHandler.cpp";
+/// Leaves the child's standard descriptors as they are.
+constexpr int kForkFlags = 65;
+constexpr char kUserVariable[] = "USERNAME";
+constexpr char kRunnerVariable[] = "QELO_WEBAPI_USERNAME";
+constexpr size_t kChunkSize = 4096;
+constexpr int kReapTries = 20;
+constexpr useconds_t kReapPauseMicroseconds = 5000;
+constexpr std::string_view kHeaderEnd = "\r\n\r\n";
+
+Json::Value objectOr(const Json::Value& value) {
+  return value.isObject() ? value : Json::Value(Json::objectValue);
+}
+
+/// @return false when the rest cannot be written
+bool writeAll(int fd, std::string_view text) {
+  while (!text.empty()) {
+    const ssize_t count = TEMP_FAILURE_RETRY(write(fd, text.data(), text.size()));
+    if (count > 0) {
+      text.remove_prefix(static_cast<size_t>(count));
+    } else if (count < 0 && errno == EAGAIN) {
+      pollfd ready{fd, POLLOUT, 0};
+      poll(&ready, 1, -1);
+    } else {
+      return false;
+    }
+  }
+  return true;
+}
+
+/// Programs that call APIs may live long, so no dead child is left to them.
+/// @param isEnding  it ends at once; one that hung up may be busy for long, and is left to itself
+void reap(pid_t child, bool isEnding) {
+  if (isEnding) {
+    TEMP_FAILURE_RETRY(waitpid(child, nullptr, 0));
+    return;
+  }
+  for (int i = 0; i < kReapTries && waitpid(child, nullptr, WNOHANG) == 0; ++i) {
+    usleep(kReapPauseMicroseconds);
+  }
+}
+
+bool isSameFile(int left, int right) {
+  struct stat first {};
+  struct stat second {};
+  return fstat(left, &first) == 0 && fstat(right, &second) == 0 && first.st_dev == second.st_dev &&
+         first.st_ino == second.st_ino;
+}
+
+/// The parent takes the result when it has seen the end of the output, so who still has to write
+/// the result must not hold the output.
+void letGoOfOutput() {
+  const bool isShared = isSameFile(STDOUT_FILENO, STDERR_FILENO);
+  const int null = open("/dev/null", O_WRONLY | O_CLOEXEC);
+  for (const int descriptor : {STDOUT_FILENO, STDERR_FILENO}) {
+    if (descriptor == STDERR_FILENO && !isShared) {
+      continue;
+    }
+    if (null < 0) {
+      close(descriptor);
+    } else {
+      dup2(null, descriptor);
+    }
+  }
+}
+
+/// Copies what stands behind the header block of CGI output. The block's end must come within one
+/// read, or all is dropped.
+void copyBody(Pipe& output, int fd) {
+  char chunk[kChunkSize] = {};
+  bool inBody = false;
+  bool taken = true;
+  for (int count; (count = output.Read(chunk, kChunkSize - 1)) > 0;) {
+    std::string_view text(chunk, static_cast<size_t>(count));
+    if (!inBody) {
+      const size_t end = text.find(kHeaderEnd);
+      inBody = end != std::string_view::npos;
+      text.remove_prefix(inBody ? end + kHeaderEnd.size() : text.size());
+    }
+    if (taken && !writeAll(fd, text)) {
+      taken = false;  // the child must not wait for us, so the rest is read all the same
+      WEBAPI_LOG(kSource, "write output failed [%m]");
+    }
+  }
+}
+
+}  // namespace
+
+ExecHandler::ExecHandler(const ExecParam& param) : param_(&param) {}
+
+ExecHandler::~ExecHandler() = default;
+
+Json::Value ExecHandler::Process() {
+  const WorkingDirectory former;
+  if (chdir(Paths::kDescriptionDir) != 0) {
+    WEBAPI_LOG(kSource, "cannot enter %s [%m]", Paths::kDescriptionDir);
+  }
+  if (!CheckParams()) {
+    return result_;
+  }
+  PrepareReq();
+  if (param_->GetOutputFd() >= 0) {
+    RunForkForStdout();
+    return result_;
+  }
+  APIRequest request(request_);
+  if (runner_.GetMethodAttr(&request, "grantable") ||
+      runner_.GetMethodAttr(&request, "grantByDefault")) {
+    Run(false);
+  } else {
+    RunFork();
+  }
+  return result_;
+}
+
+bool ExecHandler::CheckParams() {
+  if (!param_->GetAPI().empty() && !param_->GetMethod().empty() && !param_->GetRunner().empty()) {
+    return true;
+  }
+  Fail(WEBAPI_ERR_BAD_REQUEST);
+  WEBAPI_LOG(kSource, "missing parameter.");
+  return false;
+}
+
+void ExecHandler::PrepareReq() {
+  Json::Value session;
+  session["username"] = param_->GetRunner();
+  session["isAdmin"] = QLIBGroupIsAdminGroupMem(param_->GetRunner().c_str(), 0) == 1;
+  session["isTimeout"] = false;
+  session["isAuthorized"] = true;
+  request_["session"] = session;
+  request_["environ"] = objectOr(param_->GetEnv());
+  request_["environ"]["REQUEST_METHOD"] = "POST";
+  request_["postParam"] = objectOr(param_->GetParams());
+  request_["postParam"]["api"] = param_->GetAPI();
+  request_["postParam"]["method"] = param_->GetMethod();
+  request_["postParam"]["version"] = param_->GetVersion();
+  request_["attr"] = objectOr(param_->GetAttr());
+}
+
+void ExecHandler::Run(bool inChild) {
+  const char* set = inChild ? nullptr : getenv(kRunnerVariable);
+  const bool restore = set != nullptr;
+  const std::string former = restore ? set : "";
+  const std::string user = param_->GetRunner();
+  setenv(kUserVariable, user.c_str(), 1);
+  setenv(kRunnerVariable, user.c_str(), 1);
+  runner_.Run(request_);
+  result_ = runner_.GetResponse();
+  if (restore) {
+    // Both from the one variable: outside of calls the two are the same user.
+    setenv(kUserVariable, former.c_str(), 1);
+    setenv(kRunnerVariable, former.c_str(), 1);
+  }
+}
+
+void ExecHandler::RunFork() {
+  Pipe result;
+  const pid_t child = result.Init() ? QLIBCProcForkEx(kForkFlags) : -1;
+  if (child < 0) {
+    Fail(WEBAPI_ERR_NO_ANSWER);
+    WEBAPI_LOG(kSource, "fork failed");
+    return;
+  }
+  if (child == 0) {
+    RunChild(result);
+  }
+  ReceiveResult(result, child);
+}
+
+void ExecHandler::RunForkForStdout() {
+  Pipe result;
+  Pipe output;
+  const pid_t child = result.Init() && output.InitStream() ? QLIBCProcForkEx(kForkFlags) : -1;
+  if (child < 0) {
+    Fail(WEBAPI_ERR_NO_ANSWER);
+    WEBAPI_LOG(kSource, "fork failed");
+    return;
+  }
+  if (child == 0) {
+    output.WriteOnly(STDOUT_FILENO);
+    output.Close();  // a background process that the method leaves must not hold it, too
+    RunChild(result);
+  }
+  output.ReadOnly(-1);
+  result.ReadOnly(-1);
+  copyBody(output, param_->GetOutputFd());
+  ReceiveResult(result, child);
+}
+
+void ExecHandler::RunChild(Pipe& result) noexcept {
+  result.WriteOnly(-1);
+  Run(true);
+  std::cout.flush();
+  fflush(stdout);
+  letGoOfOutput();
+  if (!result.WriteJson(result_)) {
+    WEBAPI_LOG(kSource, "write json failed");
+    if (!result.HasWritten()) {
+      // There was no room for it, or no reader would take it: say that much.
+      Fail(WEBAPI_ERR_NO_ANSWER);
+      result.WriteJson(result_);
+    }
+  }
+  _exit(0);
+}
+
+void ExecHandler::ReceiveResult(Pipe& result, pid_t child) {
+  result.ReadOnly(-1);
+  const bool received = result.ReadJson(result_) && result_.isObject();
+  if (!received) {
+    Fail(WEBAPI_ERR_NO_ANSWER);
+    WEBAPI_LOG(kSource, "read json failed");
+  }
+  result.Close();
+  reap(child, received);
+}
+
+void ExecHandler::Fail(int code) {
+  result_ = Json::Value(Json::objectValue);
+  result_["success"] = false;
+  result_["error"]["code"] = code;
+}
+
+}  // namespace QELO

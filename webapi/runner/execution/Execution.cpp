@@ -1,0 +1,170 @@
+// The runner's in-process execution: one checked request runs its method from the API library,
+// fenced off from the process around it.
+
+#include <cstring>
+
+#include "webapi/APIRequest.h"
+#include "webapi/APIResponse.h"
+#include "webapi/APIRunner.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/WebAPIError.h"
+#include "webapi/base/Log.h"
+#include "webapi/runner/execution/Credentials.h"
+#include "webapi/runner/execution/Fence.h"
+#include "webapi/runner/execution/ProcessGuards.h"
+
+namespace QELO {
+namespace {
+
+constexpr char kDefaultRunAs[] = "system";
+
+bool isSet(const Json::Value& attributes, const char* name) {
+  return JsonHelper::asBool(JsonHelper::member(attributes, name));
+}
+
+/// The first entry for the request's call, or the terminating one.
+template <typename Entry>
+const Entry& findEntry(const Entry* table, const APIRequest& request) {
+  const std::string api = request.GetAPIClass();
+  const int version = request.GetAPIVersion();
+  const std::string method = request.GetAPIMethod();
+  while (table->api != nullptr && (table->version != version || api != table->api ||
+                                   table->method == nullptr || method != table->method)) {
+    ++table;
+  }
+  return *table;
+}
+
+/// Asks the library's check function, where there is one for the call.
+bool passesCheck(const _tag_API_CHECK_TABLE* table, APIRequest* request, APIResponse* response) {
+  if (table == nullptr) {
+    return true;
+  }
+  const _tag_API_CHECK_TABLE& entry = findEntry(table, *request);
+  if (entry.check == nullptr) {
+    return true;
+  }
+  bool passed = false;
+  if (!Fence("check function", [&] { passed = entry.check(request, response) != 0; })) {
+    response->SetError(WEBAPI_ERR_NO_ANSWER);
+  }
+  return passed;
+}
+
+/// Takes the credentials that the description asks for.
+/// @param giveBack  receives whether they are given back after the call
+bool takeCredentials(const APIRequest& request, const Json::Value& attributes, bool* giveBack) {
+  const bool keepPrivilege = isSet(attributes, "grantable");
+  *giveBack = keepPrivilege;
+  if (isSet(attributes, "grantByDefault")) {
+    *giveBack = true;
+    if (!Credentials::BecomeRoot()) {
+      WEBAPI_LOG("APIRunner.cpp", "grantByDefault failed. [%m]");
+      return false;
+    }
+    return true;
+  }
+  if (isSet(attributes, "grantByUser")) {
+    const std::string user = request.GetLoginUserName();
+    if (user.empty()) {
+      WEBAPI_LOG("APIRunner.cpp", "grantByUser: failed to get login username.");
+      return false;
+    }
+    if (!Credentials::BecomeUser(user, keepPrivilege)) {
+      WEBAPI_LOG("APIRunner.cpp", "grantByUser failed. [%m]");
+      return false;
+    }
+    return true;
+  }
+  const std::string runAs = JsonHelper::asString(JsonHelper::hasMember(attributes, "runAs")
+                                                     ? attributes["runAs"]
+                                                     : request.GetAPIInfo("runAs", kDefaultRunAs));
+  if (!Credentials::BecomeUser(runAs, keepPrivilege)) {
+    WEBAPI_LOG("APIRunner.cpp", "grantable failed. [%m]");
+    return false;
+  }
+  return true;
+}
+
+/// Calls the method with the credentials that its description asks for.
+bool callMethod(const _tag_API_TABLE& entry, const Json::Value& attributes, APIRequest* request,
+                APIResponse* response) {
+  response->SetError(WEBAPI_ERR_NO_ANSWER);
+  Credentials saved;
+  bool giveBack = false;
+  if (!saved.Save()) {
+    return false;
+  }
+  if (!takeCredentials(*request, attributes, &giveBack)) {
+    if (saved.HaveChanged()) {  // root was regained on the way
+      saved.GiveBack();
+    }
+    return false;
+  }
+  const bool returned = Fence("method", [&] { entry.function(request, response); });
+  if (!returned) {
+    response->SetError(WEBAPI_ERR_NO_ANSWER);
+  }
+  if (giveBack) {
+    saved.GiveBack();
+  }
+  return returned;
+}
+
+}  // namespace
+
+bool APIRunner::IsPermitted(APIRequest* request, APIResponse* response) {
+  bool permitted = true;
+  if (request->IsSharing()) {
+    permitted = CheckSharingPermission(request, response);
+  } else if (NeedPermission(request)) {
+    permitted = CheckPermission(request, response);
+  }
+  return permitted || SkipPermission(request);
+}
+
+bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
+  if (!IsPermitted(request, response)) {
+    return false;
+  }
+  const Json::Value attributes =
+      GetAttributes(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
+  const bool allowUpload = isSet(attributes, "allowUpload");
+  if (JsonHelper::asBool(Request()->GetAttr("_collector_count_webapi")) &&
+      !isSet(attributes, "allowTimeout") &&
+      JsonHelper::asBool(request->GetAPIInfo("count", true))) {
+    IncreaseCounter(request);
+  }
+  if (request->IsUploadRequest() && !(allowUpload && HandleUpload(request, response))) {
+    return false;
+  }
+
+  // Loading is within the guards: a library's constructors are foreign code too. They end in
+  // reverse order, streams before priority before directory.
+  const WorkingDirectory directory;
+  Priority priority;
+  const StandardStreams streams(!allowUpload, !isSet(attributes, "allowDownload"));
+  if (!streams.IsShut()) {
+    WEBAPI_LOG("APIRunner.cpp", "cannot shut the standard streams. [%m]");
+    response->SetError(WEBAPI_ERR_NO_ANSWER);
+    return false;
+  }
+  _tag_API_TABLE* table = nullptr;
+  _tag_API_CHECK_TABLE* checkTable = nullptr;
+  if (!OpenLib(request, &table, &checkTable) || table == nullptr) {
+    response->SetError(WEBAPI_ERR_NO_LIBRARY);
+    return false;
+  }
+  priority.Set(JsonHelper::asInt(request->GetAPIInfo("priority", 0)));
+  if (!passesCheck(checkTable, request, response)) {
+    return false;
+  }
+  const _tag_API_TABLE& entry = findEntry(table, *request);
+  if (entry.api == nullptr || entry.function == nullptr) {
+    response->SetError(WEBAPI_ERR_METHOD_MISSING);
+    return false;
+  }
+  return callMethod(entry, attributes, request, response);
+}
+
+}  // namespace QELO

@@ -1,0 +1,129 @@
+// The runner's API libraries: each is opened once and asked for its tables.
+
+#include <dlfcn.h>
+
+#include "webapi/APIRequest.h"
+#include "webapi/APIRunner.h"
+#include "webapi/JsonHelper.h"
+#include "webapi/base/Log.h"
+#include "webapi/runner/execution/Fence.h"
+
+namespace QELO {
+namespace {
+
+constexpr char kTableFunction[] = "GetAPITable";
+constexpr char kCheckTableFunction[] = "GetAPICheckTable";
+
+/// Nothing of the loader can be unwound: an exception of a library's constructor ends the process
+/// here. It would not everywhere if dlopen() were called by its name, since that is declared not to
+/// throw and what then happens is up to the optimiser.
+void* load(const std::string& path) noexcept {
+  void* (*volatile open)(const char*, int) = dlopen;
+  return open(path.c_str(), RTLD_LAZY);
+}
+
+}  // namespace
+
+bool APIRunner::OpenLib(APIRequest* request, _tag_API_TABLE** table,
+                        _tag_API_CHECK_TABLE** checkTable) {
+  if (request == nullptr || table == nullptr) {
+    WEBAPI_LOG("APIRunner.cpp", "Bad parameters");
+    return false;
+  }
+  void* handle = nullptr;
+  if (!CacheLib(request, &handle)) {
+    return false;
+  }
+  if (checkTable != nullptr) {
+    GetCheckTableFunc(handle, checkTable);  // a library without checks is normal
+  }
+  if (!GetTableFunc(handle, table)) {
+    WEBAPI_LOG("APIRunner.cpp", "Get API Table Fail");
+    return false;
+  }
+  return true;
+}
+
+bool APIRunner::CacheLib(APIRequest* request, void** handle) {
+  const std::string path = JsonHelper::asString(request->GetAPIInfo("lib", ""));
+  if (path.empty()) {
+    WEBAPI_LOG("APIRunner.cpp", "library path empty");
+    return false;
+  }
+  const auto cached = libraries_.find(path);
+  if (cached != libraries_.end()) {
+    *handle = cached->second;
+    return true;
+  }
+  void* opened = load(path);
+  if (opened == nullptr) {
+    WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", path.c_str(), dlerror());
+    return false;
+  }
+  libraries_[path] = opened;
+  // Now, and not in each child that is forked from here on.
+  FindFunction(opened, kTableFunction);
+  FindFunction(opened, kCheckTableFunction);
+  *handle = opened;
+  return true;
+}
+
+/// Kept, since looking for what is not there walks all that the library depends on.
+void* APIRunner::FindFunction(void* handle, const char* name) {
+  const auto [entry, isNew] = functions_.try_emplace({handle, name}, nullptr);
+  if (isNew) {
+    entry->second = dlsym(handle, name);
+    dlerror();  // its text is made when it is asked for, or at the next failure
+  }
+  return entry->second;
+}
+
+bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {
+  if (handle == nullptr || table == nullptr) {
+    return false;
+  }
+  void* symbol = FindFunction(handle, kTableFunction);
+  const char* error =
+      symbol == nullptr && dlsym(handle, kTableFunction) == nullptr ? dlerror() : nullptr;
+  if (error != nullptr) {
+    syslog(LOG_DEBUG, "%s:%d cannot load table: %s", "APIRunner.cpp", __LINE__, error);
+    return false;
+  }
+  *table = nullptr;
+  if (symbol != nullptr) {
+    Fence("GetAPITable", [&] { *table = reinterpret_cast<_tag_API_TABLE* (*)()>(symbol)(); });
+  }
+  if (*table == nullptr) {
+    WEBAPI_LOG("APIRunner.cpp", "cannot get api table");
+    return false;
+  }
+  return true;
+}
+
+bool APIRunner::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkTable) {
+  if (handle == nullptr || checkTable == nullptr) {
+    return false;
+  }
+  void* symbol = FindFunction(handle, kCheckTableFunction);
+  if (symbol == nullptr) {
+    return true;
+  }
+  *checkTable = nullptr;
+  Fence("GetAPICheckTable",
+        [&] { *checkTable = reinterpret_cast<_tag_API_CHECK_TABLE* (*)()>(symbol)(); });
+  if (*checkTable == nullptr) {
+    WEBAPI_LOG("APIRunner.cpp", "cannot get api check table");
+    return false;
+  }
+  return true;
+}
+
+void APIRunner::CloseLib() {
+  for (const auto& [path, handle] : libraries_) {
+    dlclose(handle);
+  }
+  libraries_.clear();
+  functions_.clear();
+}
+
+}  // namespace QELO
