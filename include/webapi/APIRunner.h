@@ -5,7 +5,6 @@
 #include <map>
 #include <memory>
 #include <string>
-#include <utility>
 
 #include "webapi/APITable.h"
 #include "webapi/Export.h"
@@ -127,11 +126,7 @@ class WEBAPI_API APIRunner {
   void CloseLib();
 
  private:
-  /// GetMethod(), or the defaults where a description gives the method no object.
-  const Json::Value& GetAttributes(const std::string& api, int version, const std::string& method);
-  void* FindFunction(void* handle, const char* name);
-  /// @param file  is taken apart
-  void AddDescriptions(Json::Value& catalogue, Json::Value& file) const;
+  struct Rooms;
 
   Json::Value libDef;
   Json::Value catalogue;
@@ -140,7 +135,7 @@ class WEBAPI_API APIRunner {
   std::map<std::string, void*> libraries_;
   int compoundDepth_ = 0;
   std::unique_ptr<APIRunnerPrivate> private_;
-  std::map<std::pair<void*, std::string>, void*> functions_;
+  std::unique_ptr<Rooms> rooms_;  ///< what works on the members above
 };
 
 }  // namespace QELO

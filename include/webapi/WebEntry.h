@@ -66,14 +66,8 @@ class WEBAPI_API WebEntry : public APIRunner {
   bool GatherEnvironment();
   void Serve();
   bool RewriteCredentials();
-  const Json::Value& KnownResult(bool allowTimeout) const;
-  int Authorise(bool allowTimeout);
-  void FillSession(const std::string& user, const std::string& language, bool isAuthorized);
-  bool CoversInnerCall(const APIRequest& request);
-  bool KeepsIdle();
-  bool IsAllowedUser(APIRequest* request);
 
-  Json::Value temporaryFiles_;
+  Json::Value spare_;                            ///< an array; not used
   alignas(void*) unsigned char cgiContext_[60];  ///< the CGI library's, see Context()
   Json::Value permission_;  ///< "permResult": authorisation results, by CheckPermission(bool)
 };

@@ -41,8 +41,8 @@ IMPLEMENTED_IN = {
 EXCEPTIONS = {
     ("programs/webapi-token/Commands.cpp", "platform"):
         "the administrators' program for the token database, which is the embedded platform's own",
-    ("webapi/runner/Dispatch.cpp", "webapi/batch"):
-        "a compound request is one of the dispatcher's three roads, and its entries are dispatched "
+    ("webapi/runner/APIRunner.cpp", "webapi/batch"):
+        "a compound request is one of a call's three roads, and its entries are dispatched "
         "again: the circle is the call's own",
     ("webapi/runner/exec/ExecHandler.cpp", "webapi/batch"):
         "a call from code gets its answer from a child by the same pipe as an entry does",

@@ -9,7 +9,9 @@
 #include "webapi/APIResponse.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
+#include "webapi/entry/intake/Intake.h"
 #include "webapi/entry/output/BrokenPipe.h"
+#include "webapi/entry/permission/PermissionCheck.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"
 
@@ -63,8 +65,7 @@ void replaceSession(std::string& cookies, bool hadCookies, const std::string& se
 
 }  // namespace
 
-WebEntry::WebEntry()
-    : temporaryFiles_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
+WebEntry::WebEntry() : spare_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
   static_assert(sizeof cgiContext_ == sizeof(QeloCgiContext));
   permission_["permResult"] = Json::Value(Json::arrayValue);
 }
@@ -181,6 +182,51 @@ bool WebEntry::RewriteCredentials() {
   environment[SZ_X_SHARING_HEADER] = sharingHeader;
   Request()->InitEnv(std::move(environment));
   return true;
+}
+
+bool WebEntry::NeedPermission(APIRequest* request) {
+  return PermissionCheck::NeedPermission(request);
+}
+
+bool WebEntry::SkipPermission(APIRequest* request) {
+  return PermissionCheck::SkipPermission(request);
+}
+
+bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
+  return PermissionCheck(*this, *Request(), Context(), permission_)
+      .CheckPermission(request, response);
+}
+
+int WebEntry::CheckPermission(bool allowTimeout) {
+  return PermissionCheck(*this, *Request(), Context(), permission_).CheckPermission(allowTimeout);
+}
+
+bool WebEntry::InitParam(Json::Value& params) {
+  return Intake(*Request(), *Response()).InitParam(params);
+}
+
+bool WebEntry::InitGetParam(Json::Value& section) {
+  return Intake(*Request(), *Response()).InitGetParam(section);
+}
+
+bool WebEntry::InitPostParam(Json::Value& section) {
+  return Intake(*Request(), *Response()).InitPostParam(section);
+}
+
+bool WebEntry::LoadUploadAPIDesc(Json::Value& section) {
+  return Intake(*Request(), *Response()).LoadUploadAPIDesc(section);
+}
+
+bool WebEntry::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {
+  return Intake::DetectAndDecryptParamLine(line, section);
+}
+
+bool WebEntry::DecryptParam(const std::string& text, Json::Value& section) {
+  return Intake::DecryptParam(text, section);
+}
+
+bool WebEntry::DecryptAESParam(Json::Value& section) {
+  return Intake::DecryptAESParam(section);
 }
 
 }  // namespace QELO

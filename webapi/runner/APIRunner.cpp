@@ -1,31 +1,45 @@
-// The runner's life: construction, one run of a request, destruction.
+// The runner's face: its life, the road of a request, and what its rooms do under its name.
 
 #include "webapi/APIRunner.h"
 
 #include <sys/prctl.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cstring>
 #include <utility>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
+#include "webapi/CompoundHandler.h"
+#include "webapi/ExecHandler.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
 #include "webapi/platform/Paths.h"
 #include "webapi/platform/WebAPIUtil.h"
 #include "webapi/runner/APIRunnerPrivate.h"
+#include "webapi/runner/Callbacks.h"
+#include "webapi/runner/CompoundCall.h"
+#include "webapi/runner/catalogue/Catalogue.h"
+#include "webapi/runner/counter/UsageCounter.h"
+#include "webapi/runner/exec/ExecCall.h"
+#include "webapi/runner/execution/Execution.h"
+#include "webapi/runner/library/LibraryCache.h"
 
 namespace QELO {
+
+struct APIRunner::Rooms {
+  Catalogue catalogue;
+  LibraryCache libraries;
+};
 
 APIRunner::APIRunner()
     : libDef(Json::objectValue),
       catalogue(Json::objectValue),
       request_(std::make_unique<APIRequest>(Json::Value())),
       response_(std::make_unique<APIResponse>(request_.get())),
-      private_(std::make_unique<APIRunnerPrivate>(this)) {
+      private_(std::make_unique<APIRunnerPrivate>(this)),
+      rooms_(new Rooms{Catalogue(libDef, catalogue), LibraryCache(libraries_)}) {
   setsid();
   Json::Value defaults;
   if (WebAPIUtil::ReadJsonFile(Paths::kLibDef, defaults) && defaults.isObject()) {
@@ -120,20 +134,89 @@ bool APIRunner::SetProcessName(APIRequest* request, APIResponse* response) {
     response->SetError(WEBAPI_ERR_BAD_REQUEST);
     return false;
   }
-  // Names are C text to the system: each part ends at its NUL, and none is endless.
-  const std::string call = std::string(api.c_str()) + "_" +
-                           std::to_string(request->GetAPIVersion()) + "_" +
-                           request->GetAPIMethod().c_str();
-  std::string full = private_->GetProcName() + "_" + call;
-  full.resize(std::min(full.size(), APIRunnerPrivate::kLongestName));
-  APIRunnerPrivate::SetLogIdentity(full);
-  private_->SetArgv0(full);
-  if (prctl(PR_SET_NAME, call.substr(0, 16).c_str()) != 0) {
+  if (!private_->SetCallName(api, request->GetAPIVersion(), request->GetAPIMethod())) {
     WEBAPI_LOG("APIRunner.cpp", "Set process name fail[%m]");
     response->SetError(WEBAPI_ERR_PROCESS_NAME);
     return false;
   }
   return true;
+}
+
+bool APIRunner::Process(APIRequest* request, APIResponse* response) {
+  if (!SetProcessName(request, response) || !CheckRequestParam(request, response) ||
+      !AddAPIInfo(request)) {
+    return false;
+  }
+  if (request->HasParam("relay_zt")) {
+    response->SetError(WEBAPI_ERR_RELAY_FAILED);
+    return false;
+  }
+  bool result = false;
+  if (request->GetAPIClass() == kCompoundAPI) {
+    result = ProcessEntry(request, response);
+  } else if (CanProcessSocket(request)) {
+    result = ProcessSocket(request, response);
+  } else {
+    result = ProcessLib(request, response);
+  }
+  SetProcessName(request, response);
+  return result;
+}
+
+bool APIRunner::ProcessEntry(APIRequest* request, APIResponse* response) {
+  if (request->GetAPIMethod() != kCompoundMethod) {
+    return false;
+  }
+  if (!request->HasParam("compound")) {
+    response->SetError(WEBAPI_ERR_NO_COMPOUND);
+    return false;
+  }
+  ++compoundDepth_;
+  const bool result = HandleCompound(request, response);
+  --compoundDepth_;
+  return result;
+}
+
+bool APIRunner::HandleCompound(APIRequest* request, APIResponse* response) {
+  return CompoundHandler(request, response, this).Process();
+}
+
+bool APIRunner::CanProcessSocket(APIRequest*) {
+  return false;  // no daemon is served yet
+}
+
+bool APIRunner::ProcessSocket(APIRequest*, APIResponse* response) {
+  response->SetError(WEBAPI_ERR_NO_ANSWER);
+  return false;
+}
+
+bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
+  if (!IsPermitted(request, response)) {
+    return false;
+  }
+  const Json::Value attributes = rooms_->catalogue.GetAttributes(
+      request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
+  const auto isSet = [&attributes](const char* name) {
+    return JsonHelper::asBool(JsonHelper::member(attributes, name));
+  };
+  if (JsonHelper::asBool(request_->GetAttr("_collector_count_webapi")) && !isSet("allowTimeout") &&
+      JsonHelper::asBool(request->GetAPIInfo("count", true))) {
+    IncreaseCounter(request);
+  }
+  if (request->IsUploadRequest() && !(isSet("allowUpload") && HandleUpload(request, response))) {
+    return false;
+  }
+  return Execution(*this, request, response).Run(attributes);
+}
+
+bool APIRunner::IsPermitted(APIRequest* request, APIResponse* response) {
+  bool permitted = true;
+  if (request->IsSharing()) {
+    permitted = CheckSharingPermission(request, response);
+  } else if (NeedPermission(request)) {
+    permitted = CheckPermission(request, response);
+  }
+  return permitted || SkipPermission(request);
 }
 
 bool APIRunner::CheckSharingPermission(APIRequest*, APIResponse*) {
@@ -154,6 +237,105 @@ bool APIRunner::HandleUpload(APIRequest*, APIResponse*) {
 
 bool APIRunner::SkipPermission(APIRequest*) {
   return true;
+}
+
+void APIRunner::IncreaseCounter(APIRequest* request) {
+  UsageCounter::Count(*request);
+}
+
+bool APIRunner::HandleCallback(APIResponse* response) {
+  return response != nullptr && RunCallbacks(*response);
+}
+
+bool APIRunner::CheckLibDescription(const Json::Value& description) const {
+  return Catalogue::CheckLibDescription(description);
+}
+
+Json::Value& APIRunner::ApplyLibDef(Json::Value& description) const {
+  return rooms_->catalogue.ApplyLibDef(description);
+}
+
+bool APIRunner::InitLibDesc(Json::Value& target) {
+  return rooms_->catalogue.InitLibDesc(target);
+}
+
+bool APIRunner::InitLibDesc(Json::Value& target, const std::string& api) {
+  return rooms_->catalogue.InitLibDesc(target, api);
+}
+
+bool APIRunner::InitLibDesc(Json::Value& target, APIRequest* request) {
+  return request != nullptr && InitLibDesc(target, request->GetAPIClass());
+}
+
+bool APIRunner::AddAPIInfo(APIRequest* request) {
+  return rooms_->catalogue.AddAPIInfo(request);
+}
+
+const Json::Value& APIRunner::GetMethod(const std::string& api, int version,
+                                        const std::string& method) {
+  return rooms_->catalogue.GetMethod(api, version, method);
+}
+
+bool APIRunner::GetMethodAttr(const std::string& api, int version, const std::string& method,
+                              const std::string& attribute) {
+  return rooms_->catalogue.GetMethodAttr(api, version, method, attribute);
+}
+
+bool APIRunner::GetMethodAttr(APIRequest* request, const std::string& attribute) {
+  if (request == nullptr || attribute.empty()) {
+    return false;
+  }
+  return GetMethodAttr(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod(),
+                       attribute);
+}
+
+bool APIRunner::CheckRequestParam(APIRequest* request, APIResponse* response) {
+  const int code = rooms_->catalogue.CheckRequestParam(*request);
+  if (code != WEBAPI_ERR_NONE) {
+    response->SetError(code);
+  }
+  return code == WEBAPI_ERR_NONE;
+}
+
+bool APIRunner::OpenLib(APIRequest* request, _tag_API_TABLE** table,
+                        _tag_API_CHECK_TABLE** checkTable) {
+  return rooms_->libraries.OpenLib(request, table, checkTable);
+}
+
+bool APIRunner::CacheLib(APIRequest* request, void** handle) {
+  return rooms_->libraries.CacheLib(request, handle);
+}
+
+bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {
+  return rooms_->libraries.GetTableFunc(handle, table);
+}
+
+bool APIRunner::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkTable) {
+  return rooms_->libraries.GetCheckTableFunc(handle, checkTable);
+}
+
+void APIRunner::CloseLib() {
+  rooms_->libraries.CloseLib();
+}
+
+Json::Value APIRunner::Exec(const ExecParam& param) {
+  return ExecHandler(param).Process();
+}
+
+void APIRunner::Exec(Json::Value& result, int outputFd, const char* api, int version,
+                     const char* method, const Json::Value& params, const Json::Value& attributes,
+                     const char* runner) {
+  result = Exec(ExecCall(outputFd, api, version, method, params, attributes, runner));
+}
+
+void APIRunner::Exec(Json::Value& result, const char* api, int version, const char* method,
+                     const Json::Value& params, const Json::Value& attributes, const char* runner) {
+  Exec(result, -1, api, version, method, params, attributes, runner);
+}
+
+void APIRunner::Exec(Json::Value& result, const char* api, int version, const char* method,
+                     const Json::Value& params, const char* runner) {
+  Exec(result, api, version, method, params, Json::Value(), runner);
 }
 
 }  // namespace QELO

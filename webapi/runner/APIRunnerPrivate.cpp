@@ -3,9 +3,11 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <libgen.h>
+#include <sys/prctl.h>
 #include <syslog.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstring>
 
 #include "webapi/base/Log.h"
@@ -70,6 +72,17 @@ void APIRunnerPrivate::SetArgv0(const std::string& name) {
   if (argv0Length_ > 0) {
     strncpy(argv0_, name.c_str(), argv0Length_ - 1);
   }
+}
+
+bool APIRunnerPrivate::SetCallName(const std::string& api, int version, const std::string& method) {
+  // Names are C text to the system: each part ends at its NUL, and none is endless.
+  const std::string call =
+      std::string(api.c_str()) + "_" + std::to_string(version) + "_" + method.c_str();
+  std::string full = procName + "_" + call;
+  full.resize(std::min(full.size(), kLongestName));
+  SetLogIdentity(full);
+  SetArgv0(full);
+  return prctl(PR_SET_NAME, call.substr(0, 16).c_str()) == 0;
 }
 
 void APIRunnerPrivate::SetLogIdentity(const std::string& text) {

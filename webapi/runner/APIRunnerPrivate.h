@@ -24,6 +24,9 @@ class APIRunnerPrivate {
   const std::string& GetProcName() const { return procName; }
   const std::string& GetOrigProcName() const { return origProcName; }
 
+  /// Names process, thread and syslog identity after a call.
+  /// @return false, with errno, when the thread cannot be named
+  bool SetCallName(const std::string& api, int version, const std::string& method);
   /// Makes `text` the syslog identity, cut to kLongestName.
   static void SetLogIdentity(const std::string& text);
 

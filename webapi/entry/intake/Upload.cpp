@@ -1,4 +1,4 @@
-// The web entry's intake of uploads, which are not served yet: none is read here. A method that
+// The web entry's hook for uploads, which are not served yet: none is read here. A method that
 // reads its upload itself is called.
 
 #include "webapi/APIRequest.h"
@@ -12,10 +12,6 @@ namespace {
 constexpr int kUploadUnavailable = -9;  ///< "upload_err": the upload could not be converted
 
 }  // namespace
-
-bool WebEntry::LoadUploadAPIDesc(Json::Value&) {
-  return false;
-}
 
 bool WebEntry::HandleUpload(APIRequest* request, APIResponse* response) {
   if (request == nullptr || response == nullptr) {

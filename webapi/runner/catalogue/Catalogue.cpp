@@ -1,14 +1,14 @@
-// The runner's catalogue: description files are found, checked, given their defaults and asked
-// for methods and attributes.
+#include "webapi/runner/catalogue/Catalogue.h"
 
 #include <errno.h>
 #include <glob.h>
 
+#include <algorithm>
 #include <string_view>
 
 #include "webapi/APIRequest.h"
-#include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -47,9 +47,17 @@ std::string descriptionFile(const std::string& api) {
   return found;
 }
 
+/// Whether a version's entries list the method, as a plain string or as a member of an object.
+bool isListed(const Json::Value& entries, const std::string& method) {
+  return entries.isArray() &&
+         std::any_of(entries.begin(), entries.end(), [&](const Json::Value& entry) {
+           return entry == Json::Value(method) || JsonHelper::hasMember(entry, method);
+         });
+}
+
 }  // namespace
 
-bool APIRunner::CheckLibDescription(const Json::Value& description) const {
+bool Catalogue::CheckLibDescription(const Json::Value& description) {
   if (!description.isObject()) {
     return false;
   }
@@ -66,20 +74,20 @@ bool APIRunner::CheckLibDescription(const Json::Value& description) const {
   return priority.isInt() && priority.asInt() <= kMaxPriority && priority.asInt() >= -kMaxPriority;
 }
 
-Json::Value& APIRunner::ApplyLibDef(Json::Value& description) const {
+Json::Value& Catalogue::ApplyLibDef(Json::Value& description) const {
   if (!takesMembers(description)) {
     return description;
   }
   for (const char* key : {"authLevel", "allowUser", "requestFormat", "priority"}) {
     if (!JsonHelper::hasMember(description, key)) {
       description[key] = key == std::string("requestFormat") ? Json::Value("JSON")
-                                                             : JsonHelper::member(libDef, key);
+                                                             : JsonHelper::member(libDef_, key);
     }
   }
   return description;
 }
 
-void APIRunner::AddDescriptions(Json::Value& target, Json::Value& file) const {
+void Catalogue::AddDescriptions(Json::Value& target, Json::Value& file) const {
   if (!file.isObject() || !takesMembers(target)) {
     return;
   }
@@ -93,7 +101,7 @@ void APIRunner::AddDescriptions(Json::Value& target, Json::Value& file) const {
   }
 }
 
-bool APIRunner::InitLibDesc(Json::Value& target) {
+bool Catalogue::InitLibDesc(Json::Value& target) const {
   glob_t files{};
   if (glob("*.lib", 0, nullptr, &files) != 0) {
     globfree(&files);
@@ -109,7 +117,7 @@ bool APIRunner::InitLibDesc(Json::Value& target) {
   return true;
 }
 
-bool APIRunner::InitLibDesc(Json::Value& target, const std::string& api) {
+bool Catalogue::InitLibDesc(Json::Value& target, const std::string& api) const {
   if (api.empty()) {
     return false;
   }
@@ -131,25 +139,21 @@ bool APIRunner::InitLibDesc(Json::Value& target, const std::string& api) {
   return true;
 }
 
-bool APIRunner::InitLibDesc(Json::Value& target, APIRequest* request) {
-  return request != nullptr && InitLibDesc(target, request->GetAPIClass());
-}
-
-bool APIRunner::AddAPIInfo(APIRequest* request) {
-  if (request == nullptr || !JsonHelper::hasMember(catalogue, request->GetAPIClass())) {
+bool Catalogue::AddAPIInfo(APIRequest* request) const {
+  if (request == nullptr || !JsonHelper::hasMember(known_, request->GetAPIClass())) {
     return false;
   }
-  request->InitAPIInfo(catalogue[request->GetAPIClass()]);
+  request->InitAPIInfo(known_[request->GetAPIClass()]);
   return true;
 }
 
-const Json::Value& APIRunner::GetMethod(const std::string& api, int version,
+const Json::Value& Catalogue::GetMethod(const std::string& api, int version,
                                         const std::string& method) {
-  const Json::Value& defaults = JsonHelper::member(libDef, "methods");
-  if (!InitLibDesc(catalogue, api)) {
+  const Json::Value& defaults = JsonHelper::member(libDef_, "methods");
+  if (!InitLibDesc(known_, api)) {
     return defaults;
   }
-  const Json::Value& versions = JsonHelper::member(JsonHelper::member(catalogue, api), "methods");
+  const Json::Value& versions = JsonHelper::member(JsonHelper::member(known_, api), "methods");
   const Json::Value& entries = JsonHelper::member(versions, std::to_string(version));
   if (!entries.isArray()) {
     return defaults;
@@ -162,23 +166,42 @@ const Json::Value& APIRunner::GetMethod(const std::string& api, int version,
   return defaults;
 }
 
-const Json::Value& APIRunner::GetAttributes(const std::string& api, int version,
+const Json::Value& Catalogue::GetAttributes(const std::string& api, int version,
                                             const std::string& method) {
   const Json::Value& attributes = GetMethod(api, version, method);
-  return attributes.isObject() ? attributes : JsonHelper::member(libDef, "methods");
+  return attributes.isObject() ? attributes : JsonHelper::member(libDef_, "methods");
 }
 
-bool APIRunner::GetMethodAttr(const std::string& api, int version, const std::string& method,
+bool Catalogue::GetMethodAttr(const std::string& api, int version, const std::string& method,
                               const std::string& attribute) {
   return JsonHelper::asBool(JsonHelper::member(GetAttributes(api, version, method), attribute));
 }
 
-bool APIRunner::GetMethodAttr(APIRequest* request, const std::string& attribute) {
-  if (request == nullptr || attribute.empty()) {
-    return false;
+int Catalogue::CheckRequestParam(APIRequest& request) {
+  const std::string api = request.GetAPIClass();
+  const int version = request.GetAPIVersion();
+  const std::string method = request.GetAPIMethod();
+  if (api.empty() || version < 1 || method.empty()) {
+    return WEBAPI_ERR_BAD_REQUEST;
   }
-  return GetMethodAttr(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod(),
-                       attribute);
+  if (!InitLibDesc(known_, api) || !JsonHelper::hasMember(known_, api)) {
+    return WEBAPI_ERR_NO_SUCH_API;
+  }
+  const Json::Value& description = known_[api];
+  if (version < JsonHelper::asInt(description["minVersion"]) ||
+      version > JsonHelper::asInt(description["maxVersion"])) {
+    return WEBAPI_ERR_NO_SUCH_VERSION;
+  }
+  if (!isListed(JsonHelper::member(description["methods"], std::to_string(version)), method)) {
+    return WEBAPI_ERR_NO_SUCH_METHOD;
+  }
+  if (!GetMethodAttr(api, version, method, "allowUpload") && request.IsUploadRequest()) {
+    return WEBAPI_ERR_UPLOAD_REFUSED;
+  }
+  if (!GetMethodAttr(api, version, method, "allowDemo") && request.IsDemoMode()) {
+    return WEBAPI_ERR_DEMO_REFUSED;
+  }
+  return WEBAPI_ERR_NONE;
 }
 
 }  // namespace QELO

@@ -3,7 +3,6 @@
 #include <ctime>
 
 #include "webapi/APIRequest.h"
-#include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/ReplaceFile.h"
 #include "webapi/platform/Core.h"
@@ -70,13 +69,13 @@ bool UsageCounter::Increase(const std::string& api, const std::string& method, i
   return written;
 }
 
-void APIRunner::IncreaseCounter(APIRequest* request) {
+void UsageCounter::Count(const APIRequest& request) {
   // Both last as long as the process: the switch is read once, the directory made once.
   static const bool enabled =
       QLIBCFileCheckKeyValue(Paths::kSystemInfo, "enable_data_collect", "yes", 0) != 0;
   static UsageCounter counter(Paths::kCounterDir);
   if (enabled) {
-    counter.Increase(request->GetAPIClass(), request->GetAPIMethod(), request->GetAPIVersion());
+    counter.Increase(request.GetAPIClass(), request.GetAPIMethod(), request.GetAPIVersion());
   }
 }
 

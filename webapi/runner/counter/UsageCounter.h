@@ -1,8 +1,11 @@
 #pragma once
 
 #include <string>
+#include <utility>
 
 namespace QELO {
+
+class APIRequest;
 
 /// Counts calls per API, version and method in JSON files that another program of the system
 /// collects: one file per family of APIs, {"<api>_<version>_<method>": {"count", "ctime"}}.
@@ -15,6 +18,9 @@ class UsageCounter {
   /// Adds one. Failures lose this one count silently: counting never fails a request.
   /// @return whether the file was written
   bool Increase(const std::string& api, const std::string& method, int version);
+
+  /// Counts the request's call, if the system collects such data.
+  static void Count(const APIRequest& request);
 
  private:
   bool PrepareDirectory();

@@ -1,7 +1,4 @@
-// The runner's in-process execution: one checked request runs its method from the API library,
-// fenced off from the process around it.
-
-#include <cstring>
+#include "webapi/runner/execution/Execution.h"
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
@@ -113,58 +110,34 @@ bool callMethod(const _tag_API_TABLE& entry, const Json::Value& attributes, APIR
 
 }  // namespace
 
-bool APIRunner::IsPermitted(APIRequest* request, APIResponse* response) {
-  bool permitted = true;
-  if (request->IsSharing()) {
-    permitted = CheckSharingPermission(request, response);
-  } else if (NeedPermission(request)) {
-    permitted = CheckPermission(request, response);
-  }
-  return permitted || SkipPermission(request);
-}
-
-bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
-  if (!IsPermitted(request, response)) {
-    return false;
-  }
-  const Json::Value attributes =
-      GetAttributes(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
-  const bool allowUpload = isSet(attributes, "allowUpload");
-  if (JsonHelper::asBool(Request()->GetAttr("_collector_count_webapi")) &&
-      !isSet(attributes, "allowTimeout") &&
-      JsonHelper::asBool(request->GetAPIInfo("count", true))) {
-    IncreaseCounter(request);
-  }
-  if (request->IsUploadRequest() && !(allowUpload && HandleUpload(request, response))) {
-    return false;
-  }
-
+bool Execution::Run(const Json::Value& attributes) {
   // Loading is within the guards: a library's constructors are foreign code too. They end in
   // reverse order, streams before priority before directory.
   const WorkingDirectory directory;
   Priority priority;
-  const StandardStreams streams(!allowUpload, !isSet(attributes, "allowDownload"));
+  const StandardStreams streams(!isSet(attributes, "allowUpload"),
+                                !isSet(attributes, "allowDownload"));
   if (!streams.IsShut()) {
     WEBAPI_LOG("APIRunner.cpp", "cannot shut the standard streams. [%m]");
-    response->SetError(WEBAPI_ERR_NO_ANSWER);
+    response_->SetError(WEBAPI_ERR_NO_ANSWER);
     return false;
   }
   _tag_API_TABLE* table = nullptr;
   _tag_API_CHECK_TABLE* checkTable = nullptr;
-  if (!OpenLib(request, &table, &checkTable) || table == nullptr) {
-    response->SetError(WEBAPI_ERR_NO_LIBRARY);
+  if (!runner_.OpenLib(request_, &table, &checkTable) || table == nullptr) {
+    response_->SetError(WEBAPI_ERR_NO_LIBRARY);
     return false;
   }
-  priority.Set(JsonHelper::asInt(request->GetAPIInfo("priority", 0)));
-  if (!passesCheck(checkTable, request, response)) {
+  priority.Set(JsonHelper::asInt(request_->GetAPIInfo("priority", 0)));
+  if (!passesCheck(checkTable, request_, response_)) {
     return false;
   }
-  const _tag_API_TABLE& entry = findEntry(table, *request);
+  const _tag_API_TABLE& entry = findEntry(table, *request_);
   if (entry.api == nullptr || entry.function == nullptr) {
-    response->SetError(WEBAPI_ERR_METHOD_MISSING);
+    response_->SetError(WEBAPI_ERR_METHOD_MISSING);
     return false;
   }
-  return callMethod(entry, attributes, request, response);
+  return callMethod(entry, attributes, request_, response_);
 }
 
 }  // namespace QELO

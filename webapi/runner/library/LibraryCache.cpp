@@ -1,9 +1,8 @@
-// The runner's API libraries: each is opened once and asked for its tables.
+#include "webapi/runner/library/LibraryCache.h"
 
 #include <dlfcn.h>
 
 #include "webapi/APIRequest.h"
-#include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
 #include "webapi/runner/execution/Fence.h"
@@ -24,8 +23,8 @@ void* load(const std::string& path) noexcept {
 
 }  // namespace
 
-bool APIRunner::OpenLib(APIRequest* request, _tag_API_TABLE** table,
-                        _tag_API_CHECK_TABLE** checkTable) {
+bool LibraryCache::OpenLib(APIRequest* request, _tag_API_TABLE** table,
+                           _tag_API_CHECK_TABLE** checkTable) {
   if (request == nullptr || table == nullptr) {
     WEBAPI_LOG("APIRunner.cpp", "Bad parameters");
     return false;
@@ -44,7 +43,7 @@ bool APIRunner::OpenLib(APIRequest* request, _tag_API_TABLE** table,
   return true;
 }
 
-bool APIRunner::CacheLib(APIRequest* request, void** handle) {
+bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
   const std::string path = JsonHelper::asString(request->GetAPIInfo("lib", ""));
   if (path.empty()) {
     WEBAPI_LOG("APIRunner.cpp", "library path empty");
@@ -69,7 +68,7 @@ bool APIRunner::CacheLib(APIRequest* request, void** handle) {
 }
 
 /// Kept, since looking for what is not there walks all that the library depends on.
-void* APIRunner::FindFunction(void* handle, const char* name) {
+void* LibraryCache::FindFunction(void* handle, const char* name) {
   const auto [entry, isNew] = functions_.try_emplace({handle, name}, nullptr);
   if (isNew) {
     entry->second = dlsym(handle, name);
@@ -78,7 +77,7 @@ void* APIRunner::FindFunction(void* handle, const char* name) {
   return entry->second;
 }
 
-bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {
+bool LibraryCache::GetTableFunc(void* handle, _tag_API_TABLE** table) {
   if (handle == nullptr || table == nullptr) {
     return false;
   }
@@ -100,7 +99,7 @@ bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {
   return true;
 }
 
-bool APIRunner::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkTable) {
+bool LibraryCache::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkTable) {
   if (handle == nullptr || checkTable == nullptr) {
     return false;
   }
@@ -118,7 +117,7 @@ bool APIRunner::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkTabl
   return true;
 }
 
-void APIRunner::CloseLib() {
+void LibraryCache::CloseLib() {
   for (const auto& [path, handle] : libraries_) {
     dlclose(handle);
   }

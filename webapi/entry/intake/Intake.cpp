@@ -1,5 +1,4 @@
-// The web entry's parameter intake: query string and request body become parameters, enciphered
-// envelopes undone.
+#include "webapi/entry/intake/Intake.h"
 
 #include <syslog.h>
 #include <unistd.h>
@@ -10,7 +9,6 @@
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
-#include "webapi/WebEntry.h"
 #include "webapi/entry/intake/RequestBody.h"
 #include "webapi/model/request/CipherEnvelope.h"
 #include "webapi/platform/Cgi.h"
@@ -44,16 +42,16 @@ bool namesCall(const Json::Value& section) {
 
 }  // namespace
 
-bool WebEntry::InitParam(Json::Value& params) {
-  if (Request()->HasEnv(kQueryString) && !InitGetParam(sectionOf(params, "getParam"))) {
+bool Intake::InitParam(Json::Value& params) {
+  if (request_.HasEnv(kQueryString) && !InitGetParam(sectionOf(params, "getParam"))) {
     return false;
   }
-  if (Request()->GetRequestMethod() != APIRequest::METHOD_POST) {
+  if (request_.GetRequestMethod() != APIRequest::METHOD_POST) {
     return true;
   }
   bool taken = false;
-  if (Request()->IsUploadRequest()) {
-    Response()->SetHeader("Content-type", kUploadContentType);
+  if (request_.IsUploadRequest()) {
+    response_.SetHeader("Content-type", kUploadContentType);
     if (namesCall(JsonHelper::member(params, "getParam"))) {
       return true;  // the body is the upload handler's
     }
@@ -62,24 +60,24 @@ bool WebEntry::InitParam(Json::Value& params) {
     taken = InitPostParam(sectionOf(params, "postParam"));
   }
   if (!taken) {
-    Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+    response_.SetError(WEBAPI_ERR_BAD_REQUEST);
   }
   return taken;
 }
 
-bool WebEntry::InitGetParam(Json::Value& section) {
-  const Json::Value query = Request()->GetEnv(kQueryString, Json::Value());
+bool Intake::InitGetParam(Json::Value& section) {
+  const Json::Value query = request_.GetEnv(kQueryString, Json::Value());
   if (!query.isString()) {
-    Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+    response_.SetError(WEBAPI_ERR_BAD_REQUEST);
     return false;
   }
   return DetectAndDecryptParamLine(query.asString(), section);
 }
 
-bool WebEntry::InitPostParam(Json::Value& section) {
+bool Intake::InitPostParam(Json::Value& section) {
   try {
-    const int64_t length = JsonHelper::asInt64(Request()->GetEnv("CONTENT_LENGTH", 0), 0);
-    if (!section.isObject() || Request()->IsUploadRequest() || length <= 0 ||
+    const int64_t length = JsonHelper::asInt64(request_.GetEnv("CONTENT_LENGTH", 0), 0);
+    if (!section.isObject() || request_.IsUploadRequest() || length <= 0 ||
         length > RequestBody::kMaxLength) {
       return false;
     }
@@ -93,7 +91,12 @@ bool WebEntry::InitPostParam(Json::Value& section) {
   }
 }
 
-bool WebEntry::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {
+/// None is read: uploads are not served yet.
+bool Intake::LoadUploadAPIDesc(Json::Value&) {
+  return false;
+}
+
+bool Intake::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {
   std::string copy = line;
   // Deciphered in place: the text ends at its first NUL, before and after.
   if (QeloCgiDetectAndDecryptParamLine(copy.data()) == 0 ||
@@ -112,11 +115,11 @@ bool WebEntry::DetectAndDecryptParamLine(const std::string& line, Json::Value& s
   return true;
 }
 
-bool WebEntry::DecryptParam(const std::string& text, Json::Value& section) {
+bool Intake::DecryptParam(const std::string& text, Json::Value& section) {
   return CipherEnvelope::openText(text, section) && (section.empty() || DecryptAESParam(section));
 }
 
-bool WebEntry::DecryptAESParam(Json::Value& section) {
+bool Intake::DecryptAESParam(Json::Value& section) {
   return CipherEnvelope::openAes(section);
 }
 

@@ -1,4 +1,4 @@
-// The web entry's permission check: who calls, and whether that user may run the method.
+#include "webapi/entry/permission/PermissionCheck.h"
 
 #include <syslog.h>
 
@@ -10,9 +10,9 @@
 #include "webapi/APIAuth.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
+#include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
-#include "webapi/WebEntry.h"
 #include "webapi/entry/permission/SessionOrigin.h"
 #include "webapi/entry/permission/UserClass.h"
 #include "webapi/platform/Cgi.h"
@@ -96,21 +96,21 @@ Json::Value emptySessionOf(const APIRequest& caller) {
 
 }  // namespace
 
-bool WebEntry::NeedPermission(APIRequest* request) {
+bool PermissionCheck::NeedPermission(const APIRequest* request) {
   return request == nullptr ||
          AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) != AUTH_NONE;
 }
 
-bool WebEntry::SkipPermission(APIRequest* request) {
+bool PermissionCheck::SkipPermission(const APIRequest* request) {
   return request != nullptr &&
          AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) == AUTH_SKIP;
 }
 
-bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
+bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response) {
   if (request == nullptr || response == nullptr) {
     return false;
   }
-  const bool allowTimeout = GetMethodAttr(request, "allowTimeout");
+  const bool allowTimeout = runner_.GetMethodAttr(request, "allowTimeout");
   int code = CheckPermission(allowTimeout);
   int result = JsonHelper::asInt(KnownResult(allowTimeout), AUTHORIZED_UNKNOWN);
   if (code == WEBAPI_ERR_NONE && !CoversInnerCall(*request)) {
@@ -121,11 +121,10 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
       AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) == AUTH_LOGIN) {
     syslog(LOG_ERR, "%s:%d Token Authentication Fail.", "WebEntry", kTokenFailLine);
   }
-  APIRequest* caller = Request();
-  if (request != caller) {
+  if (request != &caller_) {
     // A request within this one, which may still hold what the check before found.
-    request->InitSession(code == WEBAPI_ERR_NONE ? sessionOf(*caller) : emptySessionOf(*caller));
-    request->SetCookie("id", caller->GetSessionID());
+    request->InitSession(code == WEBAPI_ERR_NONE ? sessionOf(caller_) : emptySessionOf(caller_));
+    request->SetCookie("id", caller_.GetSessionID());
   }
   request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
   response->SetError(code);
@@ -140,16 +139,16 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
     return false;
   }
   const Json::Value appPriv = request->GetAPIInfo("appPriv", "");
-  if (!HoldsAppPriv(appPriv, caller->GetLoginUserName(), caller->GetRemoteIP())) {
+  if (!HoldsAppPriv(appPriv, caller_.GetLoginUserName(), caller_.GetRemoteIP())) {
     response->SetError(WEBAPI_ERR_NO_APP_PRIVILEGE);
     return false;
   }
   Json::Value session;
   Json::Value& record = request->Serialize();
-  if (request == caller && JsonHelper::member(record, "session").isObject()) {
+  if (request == &caller_ && JsonHelper::member(record, "session").isObject()) {
     session.swap(record["session"]);  // holds already what the check found
   } else {
-    session = sessionOf(*caller);
+    session = sessionOf(caller_);
   }
   session["appPriv"] = JsonHelper::asString(appPriv);
   request->InitSession(std::move(session));
@@ -158,64 +157,62 @@ bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
 }
 
 /// A token stands for the calls that it was made for, within a compound request too.
-bool WebEntry::CoversInnerCall(const APIRequest& request) {
-  if (&request == Request() || !JsonHelper::asBool(JsonHelper::member(permission_, "token"))) {
+bool PermissionCheck::CoversInnerCall(const APIRequest& request) {
+  if (&request == &caller_ || !JsonHelper::asBool(JsonHelper::member(permission_, "token"))) {
     return true;
   }
   char user[kUserNameSize] = {};
   return IsTokenGranted(request, user, kUserNameSize);
 }
 
-bool WebEntry::IsAllowedUser(APIRequest* request) {
-  const std::string user = Request()->GetLoginUserName();
+bool PermissionCheck::IsAllowedUser(APIRequest* request) {
+  const std::string user = caller_.GetLoginUserName();
   Json::Value allowUser = request->GetAPIInfo("allowUser", Json::Value());
   const Json::Value& method =
-      GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
+      runner_.GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
   if (JsonHelper::hasMember(method, "allowUser")) {
     allowUser = method["allowUser"];
   }
-  return !user.empty() &&
-         ListsUserClass(allowUser, APIAuth::GetUserClass(Request()->IsAdmin(), user));
+  return !user.empty() && ListsUserClass(allowUser, APIAuth::GetUserClass(caller_.IsAdmin(), user));
 }
 
-const Json::Value& WebEntry::KnownResult(bool allowTimeout) const {
+const Json::Value& PermissionCheck::KnownResult(bool allowTimeout) const {
   const Json::Value& results = JsonHelper::member(permission_, "permResult");
   const Json::ArrayIndex slot = allowTimeout ? 0 : 1;
   return results.isArray() && results.isValidIndex(slot) ? results[slot]
                                                          : Json::Value::nullSingleton();
 }
 
-int WebEntry::CheckPermission(bool allowTimeout) {
+int PermissionCheck::CheckPermission(bool allowTimeout) {
   const Json::Value& known = KnownResult(allowTimeout);
   const int result = known.isInt() ? known.asInt() : Authorise(allowTimeout);
   permission_["permResult"][allowTimeout ? 0U : 1U] = result;
-  Request()->SetAuthResult(static_cast<_tag_authorized_result_>(result));
+  caller_.SetAuthResult(static_cast<_tag_authorized_result_>(result));
   return errorOf(result);
 }
 
 /// The caller's session is asked first, then the access token.
-int WebEntry::Authorise(bool allowTimeout) {
-  APIRequest* request = Request();
+int PermissionCheck::Authorise(bool allowTimeout) {
   int result = AUTHORIZED_NO_SESSION;
   char user[kUserNameSize] = {};
-  const std::string language = QeloCgiGetLang(Context());
-  if (!request->GetSessionID().empty()) {
-    const QeloCgiAuthFlags flags{IsSessionFromParameter(*request) ? 1U : 0U, KeepsIdle() ? 1U : 0U};
-    result = QeloCgiIsAuthorizedEx(Context(), &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
-                                   GetMethodAttr(request, "skipCheckIP") ? 0 : 1);
+  const std::string language = QeloCgiGetLang(context_);
+  if (!caller_.GetSessionID().empty()) {
+    const QeloCgiAuthFlags flags{IsSessionFromParameter(caller_) ? 1U : 0U, KeepsIdle() ? 1U : 0U};
+    result = QeloCgiIsAuthorizedEx(context_, &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
+                                   runner_.GetMethodAttr(&caller_, "skipCheckIP") ? 0 : 1);
   }
   if (result < 0) {
-    const char* token = request->GetQeloAccessTokenID();
+    const char* token = caller_.GetQeloAccessTokenID();
     if (token == nullptr || *token == '\0') {
       return result;
     }
-    if (!request->GetSessionID().empty()) {
+    if (!caller_.GetSessionID().empty()) {
       // Nothing of a refused session may stay: a method could act on it in the token's name.
       memset(user, 0, sizeof user);
-      request->SetCookie("id", "");
-      QeloCgiInit("", Context());
+      caller_.SetCookie("id", "");
+      QeloCgiInit("", context_);
     }
-    const bool granted = IsTokenGranted(*request, user, kUserNameSize);
+    const bool granted = IsTokenGranted(caller_, user, kUserNameSize);
     result = granted ? AUTHORIZED_YES : AUTHORIZED_UNAUTHENTICATED;
     permission_["token"] = granted;
     if (!granted) {
@@ -228,36 +225,37 @@ int WebEntry::Authorise(bool allowTimeout) {
 
 /// Whether the request is no use of the session: its method says so, or those of all its entries
 /// do.
-bool WebEntry::KeepsIdle() {
+bool PermissionCheck::KeepsIdle() {
   constexpr char kAttribute[] = "keepIdle";
-  const Json::Value& entries = Request()->GetParamRef("compound", Json::Value::nullSingleton());
-  if (!entries.isArray() || Request()->GetAPIClass() != kCompoundAPI) {
-    return GetMethodAttr(Request(), kAttribute);
+  const Json::Value& entries = caller_.GetParamRef("compound", Json::Value::nullSingleton());
+  if (!entries.isArray() || caller_.GetAPIClass() != kCompoundAPI) {
+    return runner_.GetMethodAttr(&caller_, kAttribute);
   }
   return std::all_of(entries.begin(), entries.end(), [&](const Json::Value& entry) {
-    return GetMethodAttr(JsonHelper::asString(JsonHelper::member(entry, "api")),
-                         JsonHelper::asInt(JsonHelper::member(entry, "version")),
-                         JsonHelper::asString(JsonHelper::member(entry, "method")), kAttribute);
+    return runner_.GetMethodAttr(JsonHelper::asString(JsonHelper::member(entry, "api")),
+                                 JsonHelper::asInt(JsonHelper::member(entry, "version")),
+                                 JsonHelper::asString(JsonHelper::member(entry, "method")),
+                                 kAttribute);
   });
 }
 
-void WebEntry::FillSession(const std::string& user, const std::string& language,
-                           bool isAuthorized) {
+void PermissionCheck::FillSession(const std::string& user, const std::string& language,
+                                  bool isAuthorized) {
   setenv("QELO_WEBAPI_USERNAME", user.c_str(), 1);
   Json::Value session(Json::objectValue);
   session["username"] = user;
   session["isAdmin"] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
-  session["sessFile"] = optionOf(Context(), "sessfile");
-  session["isTimeout"] = optionOf(Context(), "istimeout") == "1";
+  session["sessFile"] = optionOf(context_, "sessfile");
+  session["isTimeout"] = optionOf(context_, "istimeout") == "1";
   session["timeout"] =
-      static_cast<Json::Int64>(strtol(optionOf(Context(), "timeout", "0").c_str(), nullptr, 10));
-  session["isSkipCheckIP"] = optionOf(Context(), "skipcheckip") == "1";
+      static_cast<Json::Int64>(strtol(optionOf(context_, "timeout", "0").c_str(), nullptr, 10));
+  session["isSkipCheckIP"] = optionOf(context_, "skipcheckip") == "1";
   session["uiLang"] = language;
-  session["app"] = optionOf(Context(), "app");
-  session["webapi"] = optionOf(Context(), "webapi");
+  session["app"] = optionOf(context_, "app");
+  session["webapi"] = optionOf(context_, "webapi");
   session["isAuthorized"] = isAuthorized;
-  session["tokenEnable"] = QeloCgiIsTokenEnable(Context()) != 0;
-  Request()->InitSession(std::move(session));
+  session["tokenEnable"] = QeloCgiIsTokenEnable(context_) != 0;
+  caller_.InitSession(std::move(session));
 }
 
 }  // namespace QELO

@@ -1,0 +1,34 @@
+#pragma once
+
+#include <json/json.h>
+
+#include <string>
+
+namespace QELO {
+
+class APIRequest;
+class APIResponse;
+
+/// Query string and request body become parameters, enciphered envelopes undone. The operations are
+/// WebEntry's of the same name.
+class Intake {
+ public:
+  /// @param request   has its environment
+  /// @param response  receives error 101, and the content type of an upload's answer
+  Intake(APIRequest& request, APIResponse& response) : request_(request), response_(response) {}
+
+  bool InitParam(Json::Value& params);
+  bool InitGetParam(Json::Value& section);
+  bool InitPostParam(Json::Value& section);
+  bool LoadUploadAPIDesc(Json::Value& section);
+
+  static bool DetectAndDecryptParamLine(const std::string& line, Json::Value& section);
+  static bool DecryptParam(const std::string& text, Json::Value& section);
+  static bool DecryptAESParam(Json::Value& section);
+
+ private:
+  APIRequest& request_;
+  APIResponse& response_;
+};
+
+}  // namespace QELO
