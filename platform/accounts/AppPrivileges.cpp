@@ -8,9 +8,9 @@
 
 #include "platform/accounts/Accounts.h"
 #include "platform/base/IpAddress.h"
-#include "platform/base/Log.h"
 #include "platform/base/Paths.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Log.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
@@ -117,8 +117,8 @@ bool readRules(const std::string& application, Json::Value& rules) {
     rules = JsonHelper::member(file, application);
   }
   if (!readable || !areRules(rules)) {
-    PLATFORM_LOG(kSource, "%s: no rules can be read for %s", Paths::kAppPrivileges,
-                 application.c_str());
+    WEBAPI_LOG(kSource, "%s: no rules can be read for %s", Paths::kAppPrivileges,
+               application.c_str());
     return false;
   }
   return true;

@@ -2,8 +2,11 @@
 
 #include <arpa/inet.h>
 
-#include <charconv>
 #include <cstring>
+#include <string_view>
+
+#include "webapi/base/Hex.h"
+#include "webapi/base/Number.h"
 
 namespace QELO::Platform {
 namespace {
@@ -55,15 +58,8 @@ std::string IpAddress::Text() const {
 }
 
 std::string IpAddress::NetworkHex() const {
-  constexpr char kDigits[] = "0123456789abcdef";
-  const int first = IsV4() ? kV4Offset : 0;
-  const int last = IsV4() ? kV4Offset + 4 : 8;
-  std::string text;
-  for (int i = first; i < last; ++i) {
-    text += kDigits[bytes_.s6_addr[i] >> 4U];
-    text += kDigits[bytes_.s6_addr[i] & 15U];
-  }
-  return text;
+  const auto* bytes = reinterpret_cast<const char*>(bytes_.s6_addr);
+  return HexText(IsV4() ? std::string_view(bytes + kV4Offset, 4) : std::string_view(bytes, 8));
 }
 
 bool IpAddress::IsIn(const std::string& network, bool& valid) const {
@@ -76,9 +72,8 @@ bool IpAddress::IsIn(const std::string& network, bool& valid) const {
   const int most = base.IsV4() ? kV4Bits : kV6Bits;
   int bits = most;
   if (slash != std::string::npos) {
-    const char* end = network.data() + network.size();
-    const auto result = std::from_chars(network.data() + slash + 1, end, bits);
-    valid = result.ec == std::errc() && result.ptr == end && bits >= 0 && bits <= most;
+    valid =
+        ParseNumber(std::string_view(network).substr(slash + 1), bits) && bits >= 0 && bits <= most;
   }
   const int ignored = most - bits;
   return valid && IsV4() == base.IsV4() && sameBits(bytes_, base.bytes_, kV6Bits - ignored);

@@ -6,7 +6,7 @@
 
 #include <string>
 
-#include "platform/base/Log.h"
+#include "webapi/base/Log.h"
 
 namespace QELO::Platform {
 namespace {
@@ -26,15 +26,14 @@ bool isSafe(const std::string& path, mode_t type) {
 void* findInModule(const char* module, const char* function) {
   const std::string path = std::string(kModuleDir) + "/" + module;
   if (!isSafe(kModuleDir, S_IFDIR) || !isSafe(path, S_IFREG)) {
-    PLATFORM_LOG(kSource, "refused to load %s: it is missing, or others may write it",
-                 path.c_str());
+    WEBAPI_LOG(kSource, "refused to load %s: it is missing, or others may write it", path.c_str());
     return nullptr;
   }
   void* handle = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
   void* found = handle != nullptr ? dlsym(handle, function) : nullptr;
   if (found == nullptr) {
     const char* error = dlerror();
-    PLATFORM_LOG(kSource, "cannot load %s [%s]", path.c_str(), error != nullptr ? error : "");
+    WEBAPI_LOG(kSource, "cannot load %s [%s]", path.c_str(), error != nullptr ? error : "");
   }
   return found;
 }

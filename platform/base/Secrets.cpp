@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "webapi/base/Text.h"
+
 namespace QELO::Platform {
 namespace {
 
@@ -45,8 +47,7 @@ std::string makeSecret() {
 
 bool isSecretText(std::string_view text) {
   return text.size() == kSecretLength && std::all_of(text.begin(), text.end(), [](char c) {
-           return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') ||
-                  c == '-' || c == '_';
+           return IsAlphanumeric(c) || c == '-' || c == '_';
          });
 }
 

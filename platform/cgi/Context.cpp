@@ -6,6 +6,7 @@
 #include <string_view>
 
 #include "platform/settings/Settings.h"
+#include "webapi/base/Text.h"
 
 namespace QELO::Platform {
 namespace {
@@ -24,13 +25,6 @@ unsigned char languageNumber(std::string_view code) {
              : static_cast<unsigned char>(found - std::begin(kLanguages) + 1);
 }
 
-std::string_view trimmed(std::string_view text) {
-  const size_t first = text.find_first_not_of(" \t");
-  return first == std::string_view::npos
-             ? std::string_view()
-             : text.substr(first, text.find_last_not_of(" \t") - first + 1);
-}
-
 void takeId(std::string_view id, ContextArea& area) {
   memset(area.id, 0, sizeof area.id);
   area.state = ContextArea::kNoId;
@@ -45,9 +39,7 @@ void takeId(std::string_view id, ContextArea& area) {
 ContextArea readCookies(std::string_view line) {
   ContextArea area{};
   while (!line.empty()) {
-    const size_t end = line.find(';');
-    const std::string_view cookie = trimmed(line.substr(0, end));
-    line.remove_prefix(end == std::string_view::npos ? line.size() : end + 1);
+    const std::string_view cookie = Trim(TakePiece(line, ";"));
     const size_t equals = cookie.find('=');
     if (equals == std::string_view::npos) {
       continue;

@@ -64,7 +64,7 @@ int QLIBCFileTouch(const char* path) {
   if (errno != ENOENT) {
     return -1;
   }
-  const QELO::Platform::UniqueFd file(
+  const QELO::UniqueFd file(
       open(path, O_WRONLY | O_CREAT | O_CLOEXEC | O_NONBLOCK | O_NOCTTY, 0600));
   return file ? 0 : -1;
 }

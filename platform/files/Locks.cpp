@@ -14,8 +14,7 @@ int QLIBCFileLockTimeByFile(const char* path, int type, int seconds, int* fd) {
   if (type != kExclusive) {
     return -1;
   }
-  QELO::Platform::UniqueFd file(
-      open(path, O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NOCTTY, 0600));
+  QELO::UniqueFd file(open(path, O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NOCTTY, 0600));
   if (!file || !QELO::Platform::lockFile(file.Get(), seconds)) {
     return -1;
   }

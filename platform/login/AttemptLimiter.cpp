@@ -10,9 +10,10 @@
 
 #include "platform/base/FileLock.h"
 #include "platform/base/IpAddress.h"
-#include "platform/base/Log.h"
 #include "platform/base/Paths.h"
 #include "platform/base/PrivateDir.h"
+#include "webapi/base/Hex.h"
+#include "webapi/base/Log.h"
 #include "webapi/platform/Session.h"
 
 namespace QELO::Platform {
@@ -23,16 +24,6 @@ constexpr char kLockName[] = ".lock";
 constexpr long kPurgePause = 60;  // seconds
 constexpr int kMost = 1'000'000;  // attempts, and seconds of a window
 
-std::string hexOf(const std::string& bytes) {
-  constexpr char kDigits[] = "0123456789abcdef";
-  std::string text;
-  for (const char byte : bytes) {
-    const auto value = static_cast<unsigned char>(byte);
-    text += {kDigits[value >> 4U], kDigits[value & 15U]};
-  }
-  return text;
-}
-
 std::string addressFile(const std::string& address) {
   IpAddress parsed;
   return IpAddress::Parse(address, parsed) ? parsed.NetworkHex() : "none";
@@ -42,7 +33,7 @@ std::string addressFile(const std::string& address) {
 std::string accountFile(const std::string& address, const std::string& account) {
   return account.empty() || account.size() > LoginLimiter::kLongestAccount
              ? std::string()
-             : addressFile(address) + "-" + hexOf(account);
+             : addressFile(address) + "-" + HexText(account);
 }
 
 }  // namespace
@@ -98,8 +89,8 @@ int LoginLimiter::Attempt(const std::string& address, const std::string& account
   Count accountCount;
   if (!lock || !Read(ofAddress, addressCount) ||
       (!ofAccount.empty() && !Read(ofAccount, accountCount))) {
-    PLATFORM_LOG(kSource, "cannot count a login attempt in %s [%s]", Paths::kLoginDir,
-                 strerror(errno));
+    WEBAPI_LOG(kSource, "cannot count a login attempt in %s [%s]", Paths::kLoginDir,
+               strerror(errno));
     return -1;
   }
   purgeFiles(dir_.Get(), window_, kPurgePause);
@@ -110,8 +101,8 @@ int LoginLimiter::Attempt(const std::string& address, const std::string& account
   ++addressCount.attempts;
   ++accountCount.attempts;
   if (!Write(ofAddress, addressCount) || (!ofAccount.empty() && !Write(ofAccount, accountCount))) {
-    PLATFORM_LOG(kSource, "cannot keep the count of login attempts in %s [%s]", Paths::kLoginDir,
-                 strerror(errno));
+    WEBAPI_LOG(kSource, "cannot keep the count of login attempts in %s [%s]", Paths::kLoginDir,
+               strerror(errno));
     return -1;
   }
   return 0;

@@ -1,8 +1,8 @@
 #include "platform/accounts/Accounts.h"
-#include "platform/base/Log.h"
 #include "platform/base/ModuleLoader.h"
 #include "platform/login/Passwords.h"
 #include "platform/login/module/PasswordPam.h"
+#include "webapi/base/Log.h"
 
 namespace QELO::Platform {
 namespace {
@@ -22,7 +22,7 @@ int checkPassword(const std::string& account, const std::string& password, std::
   const int result =
       check(nullptr, account.c_str(), password.c_str(), spelled, static_cast<int>(sizeof spelled));
   if (result < 0) {
-    PLATFORM_LOG(kSource, "PAM cannot check a password [%d]", result);
+    WEBAPI_LOG(kSource, "PAM cannot check a password [%d]", result);
     return -1;
   }
   Account found;

@@ -5,11 +5,11 @@
 
 #include "platform/accounts/Accounts.h"
 #include "platform/accounts/DatabaseFile.h"
-#include "platform/base/Log.h"
 #include "platform/base/ModuleLoader.h"
 #include "platform/base/Paths.h"
 #include "platform/login/Passwords.h"
 #include "platform/login/module/PasswordCrypt.h"
+#include "webapi/base/Log.h"
 
 namespace QELO::Platform {
 namespace {
@@ -66,7 +66,7 @@ int checkPassword(const std::string& account, const std::string& password, std::
     return -1;
   }
   if (lookup == Lookup::kFailed || !readShadow(account, shadow)) {
-    PLATFORM_LOG(kSource, "cannot read the accounts [%s]", strerror(errno));
+    WEBAPI_LOG(kSource, "cannot read the accounts [%s]", strerror(errno));
     return -1;
   }
   // Every answer costs one hash, so that its time does not tell which accounts there are.

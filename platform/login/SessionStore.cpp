@@ -8,11 +8,12 @@
 #include <cerrno>
 #include <cstring>
 
-#include "platform/base/Log.h"
 #include "platform/base/Paths.h"
 #include "platform/base/PrivateDir.h"
 #include "platform/base/Secrets.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Log.h"
+#include "webapi/base/ReplaceFile.h"
 #include "webapi/base/TextFile.h"
 
 namespace QELO::Platform {
@@ -53,24 +54,6 @@ std::string recordText(const Session& session, const std::string& token) {
   return JsonHelper::toString(record);
 }
 
-/// Readers see the whole record or none.
-bool writeRecord(int dir, const std::string& id, const std::string& text) {
-  const std::string temporary = "new-" + id;
-  const UniqueFd file(openat(dir, temporary.c_str(),
-                             O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW,
-                             S_IRUSR | S_IWUSR));
-  if (!file) {
-    return false;
-  }
-  if (!writeText(file.Get(), text) || renameat(dir, temporary.c_str(), dir, id.c_str()) != 0) {
-    const int error = errno;
-    unlinkat(dir, temporary.c_str(), 0);
-    errno = error;
-    return false;
-  }
-  return true;
-}
-
 }  // namespace
 
 long secondsLeft(const timespec& lastUse, int timeout) {
@@ -99,13 +82,13 @@ SessionStore::Result SessionStore::Read(const std::string& id, Session& session)
   }
   UniqueFd file;
   struct stat info {};
-  const int error = openRegularFile(dir_.Get(), id.c_str(), file, info);
+  const int error = OpenRegularFile(dir_.Get(), id.c_str(), file, info);
   if (error != 0) {
     return error == ENOENT ? Result::kAbsent : Result::kBroken;
   }
   std::string text;
   Session found;
-  if (!readText(file.Get(), kLargestRecord, text) || !parseRecord(text, found)) {
+  if (!ReadText(file.Get(), kLargestRecord, text) || !parseRecord(text, found)) {
     return Result::kBroken;
   }
   found.file = std::move(file);
@@ -129,17 +112,17 @@ SessionStore::Result SessionStore::ReadLastUse(const std::string& id, timespec& 
 
 bool SessionStore::Create(const Session& session, std::string& id, std::string& token) const {
   if (!dir_) {
-    PLATFORM_LOG(kSource, "cannot use %s [%s]", Paths::kSessionDir, strerror(dirError_));
+    WEBAPI_LOG(kSource, "cannot use %s [%s]", Paths::kSessionDir, strerror(dirError_));
     return false;
   }
   id = makeSecret();
   token = makeSecret();
   if (id.empty() || token.empty()) {
-    PLATFORM_LOG(kSource, "no random bytes [%s]", strerror(errno));
+    WEBAPI_LOG(kSource, "no random bytes [%s]", strerror(errno));
     return false;
   }
-  if (!writeRecord(dir_.Get(), id, recordText(session, token))) {
-    PLATFORM_LOG(kSource, "cannot write a session [%s]", strerror(errno));
+  if (!ReplaceFile(id, recordText(session, token), {.directory = dir_.Get()})) {
+    WEBAPI_LOG(kSource, "cannot write a session [%s]", strerror(errno));
     return false;
   }
   return true;

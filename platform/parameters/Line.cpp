@@ -3,6 +3,7 @@
 
 #include "platform/parameters/JsonText.h"
 #include "platform/parameters/PercentCode.h"
+#include "webapi/base/Text.h"
 #include "webapi/platform/WebAPIUtil.h"
 
 namespace {
@@ -25,9 +26,7 @@ bool QELO::WebAPIUtil::strPairToJsonObj(const std::string& line, Json::Value& ob
   Json::Value pairs(Json::objectValue);
   std::string_view rest = line;
   while (!rest.empty()) {
-    const size_t end = rest.find('&');
-    const std::string_view pair = rest.substr(0, end);
-    rest.remove_prefix(end == std::string_view::npos ? rest.size() : end + 1);
+    const std::string_view pair = TakePiece(rest, "&");
     if (pair.empty()) {
       continue;
     }

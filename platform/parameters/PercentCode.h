@@ -3,6 +3,8 @@
 #include <string>
 #include <string_view>
 
+#include "webapi/base/Hex.h"
+
 namespace QELO::Platform {
 
 /// Decodes %XX; a malformed escape stays as it is.
@@ -10,11 +12,7 @@ namespace QELO::Platform {
 /// @param decoded      the decoded text is added to it
 /// @return false when there was a malformed escape
 inline bool decodePercent(std::string_view text, bool plusIsBlank, std::string& decoded) {
-  const auto digit = [&text](size_t at) {
-    const char c = at < text.size() ? text[at] : '\0';
-    const char lower = static_cast<char>(c | 0x20);
-    return c >= '0' && c <= '9' ? c - '0' : lower >= 'a' && lower <= 'f' ? lower - 'a' + 10 : -1;
-  };
+  const auto digit = [&text](size_t at) { return at < text.size() ? HexValue(text[at]) : -1; };
   bool good = true;
   decoded.reserve(decoded.size() + text.size());
   for (size_t i = 0; i < text.size(); ++i) {

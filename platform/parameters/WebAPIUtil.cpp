@@ -1,23 +1,18 @@
 #include "webapi/platform/WebAPIUtil.h"
 
 #include <string_view>
+#include <utility>
 
 #include "platform/parameters/PercentCode.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Hex.h"
+#include "webapi/base/Text.h"
 
 namespace QELO::WebAPIUtil {
 namespace {
 
-std::string_view trimmed(std::string_view text) {
-  const size_t first = text.find_first_not_of(" \t");
-  return first == std::string_view::npos
-             ? std::string_view()
-             : text.substr(first, text.find_last_not_of(" \t") - first + 1);
-}
-
 bool isUnreserved(char byte) {
-  return (byte >= 'a' && byte <= 'z') || (byte >= 'A' && byte <= 'Z') ||
-         (byte >= '0' && byte <= '9') || byte == '-' || byte == '_' || byte == '.' || byte == '~';
+  return IsAlphanumeric(byte) || byte == '-' || byte == '_' || byte == '.' || byte == '~';
 }
 
 }  // namespace
@@ -33,14 +28,13 @@ std::string URLDecode(const std::string& text, bool plusIsBlank) {
 }
 
 std::string URLEncode(const std::string& text) {
-  constexpr char kDigits[] = "0123456789ABCDEF";
   std::string encoded;
   for (const char byte : text) {
     if (isUnreserved(byte)) {
       encoded += byte;
     } else {
-      const auto value = static_cast<unsigned char>(byte);
-      encoded += {'%', kDigits[value >> 4U], kDigits[value & 15U]};
+      encoded += '%';
+      AppendHex(static_cast<unsigned char>(byte), kUpperHex, encoded);
     }
   }
   return encoded;
@@ -51,9 +45,8 @@ Json::Value ParseToArray(const char* text, const char* separator) {
   std::string_view rest = text != nullptr ? text : "";
   const std::string_view between = separator != nullptr ? separator : "";
   while (!rest.empty()) {
-    const size_t end = between.empty() ? std::string_view::npos : rest.find(between);
-    const std::string_view piece = trimmed(rest.substr(0, end));
-    rest.remove_prefix(end == std::string_view::npos ? rest.size() : end + between.size());
+    const std::string_view piece =
+        Trim(between.empty() ? std::exchange(rest, {}) : TakePiece(rest, between));
     if (!piece.empty()) {
       pieces.append(Json::Value(piece.data(), piece.data() + piece.size()));
     }

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "platform/accounts/AccountDatabase.h"
-#include "platform/base/Log.h"
+#include "webapi/base/Log.h"
 #include "webapi/platform/Credential.h"
 
 namespace QELO::Platform {
@@ -34,7 +34,7 @@ bool readGroupIds(GroupIds& ids) {
 void restoreGroupIds(const GroupIds& ids) {
   if (setresgid(ids.real, ids.effective, ids.saved) != 0 ||
       setgroups(ids.supplementary.size(), ids.supplementary.data()) != 0) {
-    PLATFORM_LOG(kSource, "cannot restore the group ids [%s]", strerror(errno));
+    WEBAPI_LOG(kSource, "cannot restore the group ids [%s]", strerror(errno));
   }
 }
 
@@ -54,7 +54,7 @@ bool switchAsRoot(const Account& account, bool keepPrivilege) {
   if (setgroups(groups.size(), groups.data()) == 0 && setIds(account, keepPrivilege)) {
     return true;
   }
-  PLATFORM_LOG(kSource, "cannot become %s [%s]", account.name.c_str(), strerror(errno));
+  WEBAPI_LOG(kSource, "cannot become %s [%s]", account.name.c_str(), strerror(errno));
   restoreGroupIds(before);
   return false;
 }
@@ -69,11 +69,11 @@ bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
     case Lookup::kFound:
       break;
     case Lookup::kAbsent:
-      PLATFORM_LOG(kSource, "there is no account %s", name);
+      WEBAPI_LOG(kSource, "there is no account %s", name);
       errno = ENOENT;
       return false;
     default:
-      PLATFORM_LOG(kSource, "cannot look up the account %s", name);
+      WEBAPI_LOG(kSource, "cannot look up the account %s", name);
       errno = EIO;
       return false;
   }
@@ -86,7 +86,7 @@ bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
     return switchAsRoot(account, keepPrivilege);
   }
   if (account.uid != geteuid() || account.gid != getegid()) {
-    PLATFORM_LOG(kSource, "cannot become %s without root's rights", name);
+    WEBAPI_LOG(kSource, "cannot become %s without root's rights", name);
     errno = EPERM;
     return false;
   }

@@ -1,9 +1,9 @@
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <cstdio>
 #include <iostream>
 
+#include "webapi/base/NullDevice.h"
 #include "webapi/platform/Core.h"
 
 namespace {
@@ -14,22 +14,6 @@ void flushOutput() {
   fflush(nullptr);
 }
 
-void silenceStandardDescriptors() {
-  const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-  for (int fd = STDIN_FILENO; fd <= STDERR_FILENO; ++fd) {
-    if (null < 0) {
-      close(fd);  // nobody may be kept waiting for our end
-    } else if (null != fd) {
-      dup2(null, fd);
-    } else {
-      fcntl(fd, F_SETFD, 0);
-    }
-  }
-  if (null > STDERR_FILENO) {
-    close(null);
-  }
-}
-
 }  // namespace
 
 extern "C" {
@@ -38,7 +22,7 @@ pid_t QLIBCProcFork(void) {
   flushOutput();
   const pid_t pid = fork();
   if (pid == 0) {
-    silenceStandardDescriptors();
+    QELO::LetGoOf({STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO});
   }
   return pid;
 }

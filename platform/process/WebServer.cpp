@@ -5,14 +5,14 @@
 #include <sys/stat.h>
 
 #include <cerrno>
-#include <charconv>
 #include <cstring>
 #include <stdexcept>
 #include <string>
 
-#include "platform/base/Log.h"
 #include "platform/base/Paths.h"
 #include "platform/settings/Settings.h"
+#include "webapi/base/Log.h"
+#include "webapi/base/Number.h"
 #include "webapi/base/TextFile.h"
 
 namespace qelow3 {
@@ -42,19 +42,17 @@ int restartSignal(const std::string& name) {
 /// The process that a pid file names. @return 0 when there is none, or others may write the file
 pid_t readPid(const std::string& path) {
   constexpr size_t kLargest = 64;  // bytes
-  QELO::Platform::UniqueFd file;
+  QELO::UniqueFd file;
   struct stat info {};
   std::string text;
-  if (QELO::Platform::openRegularFile(AT_FDCWD, path.c_str(), file, info) != 0 ||
+  if (QELO::OpenRegularFile(AT_FDCWD, path.c_str(), file, info) != 0 ||
       (info.st_uid != 0 && info.st_uid != geteuid()) || (info.st_mode & (S_IWGRP | S_IWOTH)) != 0 ||
-      !QELO::Platform::readText(file.Get(), kLargest, text)) {
+      !QELO::ReadText(file.Get(), kLargest, text)) {
     return 0;
   }
   text.resize(text.find_last_not_of(" \n") + 1);
   pid_t pid = 0;
-  const char* end = text.data() + text.size();
-  const auto result = std::from_chars(text.data(), end, pid);
-  return result.ec == std::errc() && result.ptr == end && pid > 1 ? pid : 0;
+  return QELO::ParseNumber(text, pid) && pid > 1 ? pid : 0;
 }
 
 }  // namespace
@@ -80,11 +78,11 @@ bool ARDO::RestartService() {
   const EnginePrivate& settings = engine_.Settings();
   const pid_t pid = readPid(settings.pidFile);
   if (pid == 0) {
-    PLATFORM_LOG(kSource, "no process in %s", settings.pidFile.c_str());
+    WEBAPI_LOG(kSource, "no process in %s", settings.pidFile.c_str());
     return false;
   }
   if (kill(pid, settings.signal) != 0) {
-    PLATFORM_LOG(kSource, "cannot signal the web server, process %d [%s]", pid, strerror(errno));
+    WEBAPI_LOG(kSource, "cannot signal the web server, process %d [%s]", pid, strerror(errno));
     return false;
   }
   return true;

@@ -1,11 +1,9 @@
 #include "platform/settings/KeyValueFile.h"
 
-#include <fcntl.h>
-
 #include <algorithm>
 
+#include "webapi/base/Text.h"
 #include "webapi/base/TextFile.h"
-#include "webapi/base/UniqueFd.h"
 
 namespace QELO::Platform {
 namespace {
@@ -13,11 +11,7 @@ namespace {
 constexpr std::string_view kBlanks = " \t\r";
 
 std::string_view trimmed(std::string_view text) {
-  const size_t first = text.find_first_not_of(kBlanks);
-  if (first == std::string_view::npos) {
-    return {};
-  }
-  return text.substr(first, text.find_last_not_of(kBlanks) - first + 1);
+  return Trim(text, kBlanks);
 }
 
 std::string_view unquoted(std::string_view text) {
@@ -39,15 +33,15 @@ std::string_view unquoted(std::string_view text) {
 
 KeyValueFile::KeyValueFile(const char* path) {
   // An administrator may link a configuration file elsewhere, so links are followed here.
-  const UniqueFd file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  UniqueFd file;
+  struct stat info {};
   std::string text;
-  if (!file || !readText(file.Get(), kMaxSize, text)) {
+  if (OpenRegularFile(AT_FDCWD, path, file, info, 0) != 0 ||
+      !ReadText(file.Get(), kMaxSize, text)) {
     return;
   }
   for (std::string_view rest = text; !rest.empty();) {
-    const size_t end = rest.find('\n');
-    const std::string_view line = trimmed(rest.substr(0, end));
-    rest.remove_prefix(end == std::string_view::npos ? rest.size() : end + 1);
+    const std::string_view line = trimmed(TakePiece(rest, "\n"));
     const size_t equals = line.find('=');
     if (equals != std::string_view::npos && line.front() != '#') {
       lines_.emplace_back(trimmed(line.substr(0, equals)), unquoted(line.substr(equals + 1)));

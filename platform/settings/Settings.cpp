@@ -2,11 +2,11 @@
 
 #include <strings.h>
 
-#include <charconv>
 #include <cstring>
 
 #include "platform/base/KnownFile.h"
 #include "platform/base/Paths.h"
+#include "webapi/base/Number.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
@@ -38,10 +38,7 @@ std::string Settings::Get(std::string_view key, const char* fallback) const {
 int Settings::GetNumber(std::string_view key, int fallback, int lowest, int highest) const {
   const std::string text = Get(key, "");
   int number = 0;
-  const char* end = text.data() + text.size();
-  const auto result = std::from_chars(text.data(), end, number);
-  const bool good = result.ec == std::errc() && result.ptr == end;
-  return good && number >= lowest && number <= highest ? number : fallback;
+  return ParseNumber(text, number) && number >= lowest && number <= highest ? number : fallback;
 }
 
 bool Settings::GetSwitch(std::string_view key, bool fallback) const {

@@ -14,8 +14,9 @@
 #include "platform/base/FileLock.h"
 #include "platform/base/Paths.h"
 #include "platform/settings/KeyValueFile.h"
+#include "webapi/base/ReplaceFile.h"
+#include "webapi/base/Text.h"
 #include "webapi/base/TextFile.h"
-#include "webapi/base/UniqueFd.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
@@ -25,9 +26,8 @@ constexpr int kLockSeconds = 2;
 constexpr std::string_view kBlanks = " \t\r";
 
 bool isKey(std::string_view key) {
-  return !key.empty() && std::all_of(key.begin(), key.end(), [](unsigned char c) {
-    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' ||
-           c == '-' || c == '.';
+  return !key.empty() && std::all_of(key.begin(), key.end(), [](char c) {
+    return IsAlphanumeric(c) || c == '_' || c == '-' || c == '.';
   });
 }
 
@@ -103,34 +103,11 @@ std::string targetOf(const char* path) {
 }
 
 /// Reads the file, or nothing when there is none.
-/// @param info  receives its status, or that of a new file
-bool readFile(const std::string& path, std::string& text, struct stat& info) {
-  const int error = [&] {
-    UniqueFd file;
-    const int opened = openRegularFile(AT_FDCWD, path.c_str(), file, info);
-    return opened == 0 && !readText(file.Get(), KeyValueFile::kMaxSize, text) ? EFBIG : opened;
-  }();
-  if (error == ENOENT) {
-    info.st_mode = 0644;
-    info.st_uid = geteuid();
-    info.st_gid = getegid();
-  }
-  return error == 0 || error == ENOENT;
-}
-
-bool replaceFile(const std::string& path, const std::string& text, const struct stat& info) {
-  std::string fresh = path + ".XXXXXX";
-  const UniqueFd file(mkostemp(fresh.data(), O_CLOEXEC));
-  if (!file) {
-    return false;
-  }
-  if (fchown(file.Get(), info.st_uid, info.st_gid) == 0 &&
-      fchmod(file.Get(), info.st_mode & 07777) == 0 && writeText(file.Get(), text) &&
-      fsync(file.Get()) == 0 && rename(fresh.c_str(), path.c_str()) == 0) {
-    return true;
-  }
-  unlink(fresh.c_str());
-  return false;
+bool readFile(const std::string& path, std::string& text) {
+  UniqueFd file;
+  struct stat info {};
+  const int error = OpenRegularFile(AT_FDCWD, path.c_str(), file, info);
+  return error == 0 ? ReadText(file.Get(), KeyValueFile::kMaxSize, text) : error == ENOENT;
 }
 
 bool setKey(const char* name, const std::string& key, const std::string& value) {
@@ -139,13 +116,13 @@ bool setKey(const char* name, const std::string& key, const std::string& value) 
   const UniqueFd directory(
       open(path.substr(0, path.rfind('/') + 1).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   std::string text;
-  struct stat info {};
-  if (!directory || !lockFile(directory.Get(), kLockSeconds) || !readFile(path, text, info)) {
+  if (!directory || !lockFile(directory.Get(), kLockSeconds) || !readFile(path, text)) {
     return false;
   }
   const std::string changed = withKey(text, key, value);
   return changed.size() <= KeyValueFile::kMaxSize &&
-         (changed == text || replaceFile(path, changed, info));
+         (changed == text ||
+          ReplaceFile(path, changed, {.mode = 0644, .keepsOwner = true, .isSynced = true}));
 }
 
 }  // namespace

@@ -1,9 +1,10 @@
 #include "platform/tasks/Id.h"
 
 #include <algorithm>
-#include <charconv>
 
 #include "platform/base/Secrets.h"
+#include "webapi/base/Number.h"
+#include "webapi/base/Text.h"
 
 namespace QELO::Platform {
 namespace {
@@ -12,8 +13,7 @@ constexpr uid_t kNobody = static_cast<uid_t>(-1);  // to the kernel: no user at 
 
 // Objects, so that the compiler puts them into the loops: a list checks thousands of ids.
 constexpr auto isPrefixCharacter = [](char c) {
-  return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '.' ||
-         c == '_' || c == '-';
+  return IsAlphanumeric(c) || c == '.' || c == '_' || c == '-';
 };
 constexpr auto isSecretCharacter = [](char c) { return c != '.' && isPrefixCharacter(c); };
 
@@ -42,10 +42,7 @@ bool readTaskId(std::string_view id, uid_t& store) {
 
 bool readStoreName(std::string_view name, uid_t& store) {
   uid_t value = 0;
-  const char* end = name.data() + name.size();
-  const auto result = std::from_chars(name.data(), end, value);
-  if (result.ec != std::errc() || result.ptr != end || value == kNobody ||
-      name != std::to_string(value)) {
+  if (!ParseNumber(name, value) || value == kNobody || name != std::to_string(value)) {
     return false;
   }
   store = value;

@@ -6,10 +6,10 @@
 #include <algorithm>
 #include <functional>
 
-#include "platform/base/Log.h"
 #include "platform/tasks/Access.h"
 #include "platform/tasks/Values.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Log.h"
 
 using namespace QELO;
 using Platform::TaskEnding;
@@ -18,7 +18,6 @@ using Platform::TaskProperties;
 using Platform::TaskRecord;
 using Platform::TaskResult;
 using Platform::TaskStores;
-using Platform::UniqueFd;
 
 namespace ARDO {
 
@@ -136,9 +135,9 @@ bool Task::setProperty(const std::string& name, const Json::Value& value) {
   }
   std::string text;
   if (!Platform::isTaskPropertyName(name) || !Platform::writeTaskValue(value, text)) {
-    PLATFORM_LOG("Task.cpp", "a task's property is not stored: %s",
-                 text.empty() && Platform::isTaskPropertyName(name) ? "its value nests too deep"
-                                                                    : "its name cannot be one");
+    WEBAPI_LOG("Task.cpp", "a task's property is not stored: %s",
+               text.empty() && Platform::isTaskPropertyName(name) ? "its value nests too deep"
+                                                                  : "its name cannot be one");
     private_->refused = true;
     return false;
   }

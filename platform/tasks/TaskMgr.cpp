@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <vector>
 
-#include "platform/base/Log.h"
 #include "platform/tasks/Access.h"
 #include "platform/tasks/Id.h"
+#include "webapi/base/Log.h"
 #include "webapi/platform/Task.h"
 
 using namespace QELO::Platform;
@@ -52,9 +52,9 @@ Json::Value TaskMgr::getUnendedTaskId(const char* prefix) {
 
 std::string TaskUtil::getUniqueID(const std::string&, const std::string& prefix) {
   if (!isTaskPrefix(prefix)) {
-    PLATFORM_LOG("TaskMgr.cpp",
-                 "a task id's prefix holds up to %zu letters, digits, '.', '_' and '-'",
-                 kTaskPrefixLength);
+    WEBAPI_LOG("TaskMgr.cpp",
+               "a task id's prefix holds up to %zu letters, digits, '.', '_' and '-'",
+               kTaskPrefixLength);
     return "";
   }
   return makeTaskId(prefix, geteuid());

@@ -1,10 +1,10 @@
 #include "platform/accounts/AccountDatabase.h"
-#include "platform/base/Log.h"
 #include "platform/base/ModuleLoader.h"
 #include "platform/base/Paths.h"
 #include "platform/base/Secrets.h"
 #include "platform/base/TextBuffer.h"
 #include "platform/tokens/module/TokenModule.h"
+#include "webapi/base/Log.h"
 #include "webapi/platform/Token.h"
 
 using namespace QELO::Platform;
@@ -24,7 +24,7 @@ extern "C" int QeloAccessTokenGrant(const char* token, const char* api, const ch
   const int result = grant(QELO::Paths::kTokenDatabase, token, api, method, user, size, error,
                            static_cast<int>(sizeof error));
   if (result == kTokenFailed) {
-    PLATFORM_LOG(kSource, "cannot check an access token [%s]", error);
+    WEBAPI_LOG(kSource, "cannot check an access token [%s]", error);
   }
   if (result != kTokenGranted) {
     return result;

@@ -1,21 +1,18 @@
 // The CGI program: one process, one request. It stands in the description directory, where the
 // library looks API descriptions up, and serves the request.
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <cstdio>
 
 #include "webapi/WebEntry.h"
+#include "webapi/base/NullDevice.h"
 #include "webapi/platform/Paths.h"
 
 /// The answer is out. What API libraries print when they are unloaded is no part of it.
 static void closeAnswer() {
   std::fflush(stdout);
-  const int fd = open("/dev/null", O_WRONLY | O_CLOEXEC);
-  if (fd >= 0) {
-    dup2(fd, STDOUT_FILENO);
-  }
+  QELO::PutNullOver({STDOUT_FILENO});
 }
 
 int main(int argc, char** argv) {

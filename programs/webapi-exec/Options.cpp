@@ -2,12 +2,12 @@
 
 #include <getopt.h>
 
-#include <charconv>
 #include <fstream>
 #include <iostream>
 #include <iterator>
 
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Number.h"
 #include "webapi/platform/WebAPIUtil.h"
 
 namespace QELO::ExecProgram {
@@ -78,11 +78,7 @@ constexpr option kOptions[] = {{"help", no_argument, nullptr, kHelpOption},
                                {nullptr, 0, nullptr, 0}};
 
 std::string readVersion(const std::string& text, int& version) {
-  const char* end = text.data() + text.size();
-  const auto result = std::from_chars(text.data(), end, version);
-  return result.ec == std::errc() && result.ptr == end && version > 0
-             ? ""
-             : "--version takes a number from 1 on";
+  return ParseNumber(text, version) && version > 0 ? "" : "--version takes a number from 1 on";
 }
 
 /// Reads "name=value" by the rule for parameters on the wire.

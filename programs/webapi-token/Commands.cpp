@@ -7,12 +7,12 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <charconv>
 #include <map>
 
 #include "platform/base/Paths.h"
 #include "platform/tokens/module/TokenStore.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Number.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/WebAPIUtil.h"
 
@@ -58,9 +58,7 @@ ExitCode failed(const Streams& streams, const std::string& reason) {
 
 template <typename T>
 bool parse(const std::string& text, T lowest, T highest, T& number) {
-  const char* end = text.data() + text.size();
-  const auto result = std::from_chars(text.data(), end, number);
-  return result.ec == std::errc() && result.ptr == end && number >= lowest && number <= highest;
+  return ParseNumber(text, number) && number >= lowest && number <= highest;
 }
 
 /// Whether the database, or the directory that is to have it, is another account's.

@@ -161,6 +161,19 @@ def test_Rooms_FormNoCircle():
         walk(room, [])
 
 
+def test_GroundFloor_KnowsNothingOfOurs():
+    files_of_it = [path for path in cpp_files() if folder_of(path) == "webapi/base"]
+    assert files_of_it
+    wrong = [
+        f"{name(path)}:{number}: {header}"
+        for path in files_of_it
+        for number, header in includes(path)
+        if header.startswith(("webapi/", "platform/", "json/"))
+        and not header.startswith("webapi/base/")
+    ]
+    assert wrong == []
+
+
 def test_PlatformsBase_KnowsNoSubject():
     wrong = [
         f"{name(path)}:{number}: {header}"

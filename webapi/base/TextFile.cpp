@@ -1,14 +1,14 @@
 #include "webapi/base/TextFile.h"
 
-#include <fcntl.h>
+#include <poll.h>
 
 #include <cerrno>
 
-namespace QELO::Platform {
+namespace QELO {
 
-int openRegularFile(int dir, const char* name, UniqueFd& file, struct stat& info) {
+int OpenRegularFile(int dir, const char* name, UniqueFd& file, struct stat& info, int link) {
   // Not blocking: the name may turn out to be a pipe.
-  UniqueFd opened(openat(dir, name, O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY));
+  UniqueFd opened(openat(dir, name, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY | link));
   if (!opened || fstat(opened.Get(), &info) != 0) {
     return errno;
   }
@@ -19,7 +19,7 @@ int openRegularFile(int dir, const char* name, UniqueFd& file, struct stat& info
   return 0;
 }
 
-bool readText(int file, size_t limit, std::string& text) {
+bool ReadText(int file, size_t limit, std::string& text) {
   text.clear();
   char buffer[4096];
   while (true) {
@@ -27,23 +27,26 @@ bool readText(int file, size_t limit, std::string& text) {
     if (count <= 0) {
       return count == 0;
     }
-    if (text.size() + static_cast<size_t>(count) > limit) {
+    if (static_cast<size_t>(count) > limit - text.size()) {
       return false;
     }
     text.append(buffer, static_cast<size_t>(count));
   }
 }
 
-bool writeText(int file, const std::string& text) {
-  size_t done = 0;
-  while (done < text.size()) {
-    const ssize_t count = TEMP_FAILURE_RETRY(write(file, text.data() + done, text.size() - done));
-    if (count <= 0) {
+bool WriteText(int file, std::string_view text) {
+  while (!text.empty()) {
+    const ssize_t count = TEMP_FAILURE_RETRY(write(file, text.data(), text.size()));
+    if (count > 0) {
+      text.remove_prefix(static_cast<size_t>(count));
+    } else if (count < 0 && errno == EAGAIN) {
+      pollfd ready{file, POLLOUT, 0};
+      poll(&ready, 1, -1);
+    } else {
       return false;
     }
-    done += static_cast<size_t>(count);
   }
   return true;
 }
 
-}  // namespace QELO::Platform
+}  // namespace QELO

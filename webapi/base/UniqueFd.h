@@ -4,7 +4,7 @@
 
 #include <utility>
 
-namespace QELO::Platform {
+namespace QELO {
 
 /// Owns a descriptor and closes it.
 class UniqueFd {
@@ -34,4 +34,4 @@ class UniqueFd {
   int fd_;
 };
 
-}  // namespace QELO::Platform
+}  // namespace QELO

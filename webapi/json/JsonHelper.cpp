@@ -1,17 +1,13 @@
 #include "webapi/JsonHelper.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <charconv>
 #include <cmath>
-#include <cstdlib>
 #include <exception>
 #include <limits>
 #include <utility>
 
+#include "webapi/base/Number.h"
 #include "webapi/base/ReplaceFile.h"
+#include "webapi/base/TextFile.h"
 #include "webapi/json/Reader.h"
 
 namespace QELO::JsonHelper {
@@ -31,33 +27,10 @@ bool parse(const std::string& text, bool comments, Json::Value& value) {
 }
 
 bool readAll(const std::string& path, std::string& text) {
-  // Not blocking: the name may be a pipe, which has no content to wait for.
-  const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
-  if (fd < 0) {
-    return false;
-  }
+  UniqueFd file;
   struct stat info {};
-  bool good = fstat(fd, &info) == 0 && S_ISREG(info.st_mode);
-  text.clear();
-  while (good) {
-    char buffer[4096];
-    const ssize_t count = TEMP_FAILURE_RETRY(read(fd, buffer, sizeof buffer));
-    if (count <= 0) {
-      good = count == 0;
-      break;
-    }
-    text.append(buffer, static_cast<size_t>(count));
-  }
-  close(fd);
-  return good;
-}
-
-/// The number that the whole text is, or nothing.
-template <typename T>
-bool parseNumber(const std::string& text, T& number) {
-  const char* end = text.data() + text.size();
-  const auto result = std::from_chars(text.data(), end, number);
-  return !text.empty() && result.ec == std::errc() && result.ptr == end;
+  return OpenRegularFile(AT_FDCWD, path.c_str(), file, info, 0) == 0 &&
+         ReadText(file.Get(), text.max_size(), text);
 }
 
 template <typename T>
@@ -79,8 +52,12 @@ T integerForm(const Json::Value& value, T fallback) {
     case Json::booleanValue:
       return value.asBool() ? 1 : 0;
     case Json::stringValue: {
-      T number = 0;
-      return parseNumber(value.asString(), number) ? number : fallback;
+      const char* begin = nullptr;
+      const char* end = nullptr;
+      T number = fallback;
+      value.getString(&begin, &end);
+      ParseNumber(std::string_view(begin, static_cast<size_t>(end - begin)), number);
+      return number;
     }
     default:
       return fallback;
@@ -99,7 +76,7 @@ bool fromFile(const std::string& path, Json::Value& value) {
 }
 
 bool toFile(const std::string& path, const Json::Value& value) {
-  return replaceText(path, toString(value), false);
+  return ReplaceFile(path, toString(value));
 }
 
 const Json::Value* find(const Json::Value& value, std::string_view key) {

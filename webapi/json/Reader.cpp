@@ -6,6 +6,8 @@
 #include <limits>
 #include <string>
 
+#include "webapi/base/Text.h"
+
 namespace QELO::JsonHelper {
 namespace {
 
@@ -15,10 +17,6 @@ constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
 constexpr unsigned kHighSurrogate = 0xD800;
 constexpr unsigned kLowSurrogate = 0xDC00;
 constexpr unsigned kSurrogateEnd = 0xE000;
-
-bool isDigit(char c) {
-  return c >= '0' && c <= '9';
-}
 
 void appendUtf8(unsigned code, std::string& text) {
   const auto tail = [code](unsigned shift) {
@@ -252,7 +250,7 @@ class Reader {
 
   bool Digits() {
     const char* start = at_;
-    while (at_ != end_ && isDigit(*at_)) {
+    while (at_ != end_ && IsDigit(*at_)) {
       ++at_;
     }
     return at_ != start;

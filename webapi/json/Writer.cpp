@@ -5,6 +5,7 @@
 #include <cmath>
 
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Hex.h"
 
 namespace QELO::JsonHelper {
 namespace {
@@ -12,7 +13,6 @@ namespace {
 void writeValue(const Json::Value& value, std::string& text);
 
 void writeEscape(unsigned char c, std::string& text) {
-  constexpr char kDigits[] = "0123456789abcdef";
   switch (c) {
     case '"':
       text += "\\\"";
@@ -37,8 +37,7 @@ void writeEscape(unsigned char c, std::string& text) {
       break;
     default:
       text += "\\u00";
-      text += kDigits[c >> 4];
-      text += kDigits[c & 15];
+      AppendHex(c, kLowerHex, text);
   }
 }
 

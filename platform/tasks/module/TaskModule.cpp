@@ -5,10 +5,10 @@
 
 #include <functional>
 
-#include "platform/base/Log.h"
 #include "platform/tasks/Id.h"
 #include "platform/tasks/module/StoreConnection.h"
 #include "webapi/Export.h"
+#include "webapi/base/Log.h"
 
 namespace QELO::Platform {
 namespace {
@@ -125,8 +125,8 @@ TaskResult DatabaseStores::Change(uid_t store, bool create,
 TaskResult DatabaseStores::End(Use& use, uid_t store, TaskResult result) const {
   if (result == TaskResult::kFailed) {
     const bool opened = use.State() == TaskResult::kDone;
-    PLATFORM_LOG(kSource, "cannot use the task store %s/%u [%s]", settings_.directory, store,
-                 opened ? use.Database().Error().c_str() : use.Error().c_str());
+    WEBAPI_LOG(kSource, "cannot use the task store %s/%u [%s]", settings_.directory, store,
+               opened ? use.Database().Error().c_str() : use.Error().c_str());
   }
   return result;
 }

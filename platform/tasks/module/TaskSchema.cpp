@@ -9,8 +9,8 @@
 #include <cstring>
 #include <iterator>
 
-#include "platform/base/Log.h"
 #include "platform/base/Secrets.h"
+#include "webapi/base/Log.h"
 
 namespace QELO::Platform {
 namespace {
@@ -220,9 +220,9 @@ bool makeRoom(const StoreDirectory& directory, sqlite3* database, const Database
     error = strerror(lock ? errno : lockError);
     return false;
   }
-  PLATFORM_LOG("TaskModule.cpp",
-               "another version made the task records %s/%s, which are kept as %s.old",
-               directory.Path().c_str(), kTaskDatabase, kTaskDatabase);
+  WEBAPI_LOG("TaskModule.cpp",
+             "another version made the task records %s/%s, which are kept as %s.old",
+             directory.Path().c_str(), kTaskDatabase, kTaskDatabase);
   return true;
 }
 

@@ -6,10 +6,9 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <string_view>
-
 #include "programs/webapi-exec/follow/EndSignals.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/TextFile.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::ExecProgram {
@@ -18,17 +17,6 @@ namespace {
 constexpr int kLongestWait = 5;                     ///< seconds until a parent that died is noticed
 constexpr useconds_t kPauseMicroseconds = 100'000;  ///< people see no more
 constexpr char kGoneText[] = "gone";
-
-bool writeAll(int descriptor, std::string_view text) {
-  while (!text.empty()) {
-    const ssize_t count = TEMP_FAILURE_RETRY(write(descriptor, text.data(), text.size()));
-    if (count <= 0) {
-      return false;
-    }
-    text.remove_prefix(static_cast<size_t>(count));
-  }
-  return true;
-}
 
 /// Each change of the task as a line of JSON; an empty line when there was none.
 [[noreturn]] void tellChanges(const FollowedTask& task, int descriptor) noexcept {
@@ -47,7 +35,7 @@ bool writeAll(int descriptor, std::string_view text) {
       line = JsonHelper::toString(status);
       goesOn = !JsonHelper::asBool(status["finish"]);
     }
-    goesOn = writeAll(descriptor, line + "\n") && goesOn;
+    goesOn = WriteText(descriptor, line + "\n") && goesOn;
   }
   _exit(0);
 }

@@ -2,7 +2,6 @@
 // back.
 
 #include <errno.h>
-#include <fcntl.h>
 #include <signal.h>
 #include <unistd.h>
 
@@ -16,6 +15,7 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/Pipe.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/NullDevice.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO {
@@ -29,14 +29,7 @@ constexpr useconds_t kParentPollMicroseconds = 200000;
 /// The web server ends the answer when the last holder of our standard output lets go, so who
 /// waits for the parent's end must not hold it.
 void releaseStandardDescriptors() {
-  const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-  for (int descriptor = STDIN_FILENO; descriptor <= STDERR_FILENO; ++descriptor) {
-    if (null < 0) {
-      close(descriptor);
-    } else {
-      dup2(null, descriptor);
-    }
-  }
+  LetGoOf({STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO});
 }
 
 /// What every child would find out anew: the time zone for its log, the files of accounts.

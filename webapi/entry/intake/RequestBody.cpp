@@ -1,12 +1,13 @@
 #include "webapi/entry/intake/RequestBody.h"
 
-#include <fcntl.h>
 #include <poll.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdlib>
 #include <memory>
+
+#include "webapi/base/NullDevice.h"
 
 namespace QELO::RequestBody {
 namespace {
@@ -48,13 +49,7 @@ bool Read(int fd, int64_t length, std::chrono::milliseconds idleLimit, std::stri
 }
 
 void CloseStandardInput() {
-  const int fd = open("/dev/null", O_RDONLY | O_CLOEXEC);
-  if (fd > STDIN_FILENO) {
-    dup2(fd, STDIN_FILENO);
-    close(fd);
-  } else if (fd == STDIN_FILENO) {
-    fcntl(fd, F_SETFD, 0);  // children inherit it like any standard input
-  }
+  PutNullOver({STDIN_FILENO}, O_RDONLY);
 }
 
 }  // namespace QELO::RequestBody

@@ -9,6 +9,7 @@
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/Text.h"
 
 namespace QELO {
 namespace {
@@ -16,9 +17,8 @@ namespace {
 constexpr char kContentType[] = "Content-type";  // as a fresh response presets it
 
 bool isToken(const std::string& name) {
-  return !name.empty() && std::all_of(name.begin(), name.end(), [](unsigned char c) {
-    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') ||
-           (c != '\0' && strchr("!#$%&'*+-.^_`|~", c) != nullptr);
+  return !name.empty() && std::all_of(name.begin(), name.end(), [](char c) {
+    return IsAlphanumeric(c) || (c != '\0' && strchr("!#$%&'*+-.^_`|~", c) != nullptr);
   });
 }
 

@@ -5,6 +5,7 @@
 
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/Text.h"
 #include "webapi/model/response/APIResponsePrivate.h"
 #include "webapi/platform/WebAPIUtil.h"
 
@@ -16,8 +17,7 @@ constexpr time_t kLastCookieTime = 253402300799;  // the end of year 9999: years
 constexpr int kExpirySize = 1024;
 
 bool isNameCharacter(char c) {
-  return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' ||
-         c == '-';
+  return IsAlphanumeric(c) || c == '_' || c == '-';
 }
 
 /// base plus minutes, within what a cookie's date can say.

@@ -64,7 +64,7 @@ bool UsageCounter::Increase(const std::string& api, const std::string& method, i
     counters = Json::Value(Json::objectValue);
   }
   countIn(counters, api + "_" + std::to_string(version) + "_" + method);
-  const bool written = JsonHelper::replaceText(path, JsonHelper::toString(counters), true);
+  const bool written = ReplaceFile(path, JsonHelper::toString(counters), {.freshSuffix = ".new"});
   QLIBCFileUnlockByFile(lock);
   return written;
 }

@@ -1,8 +1,6 @@
 #include "webapi/ExecHandler.h"
 
 #include <errno.h>
-#include <fcntl.h>
-#include <poll.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -19,6 +17,8 @@
 #include "webapi/Pipe.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/NullDevice.h"
+#include "webapi/base/TextFile.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
 #include "webapi/runner/execution/ProcessGuards.h"
@@ -38,22 +38,6 @@ constexpr std::string_view kHeaderEnd = "\r\n\r\n";
 
 Json::Value objectOr(const Json::Value& value) {
   return value.isObject() ? value : Json::Value(Json::objectValue);
-}
-
-/// @return false when the rest cannot be written
-bool writeAll(int fd, std::string_view text) {
-  while (!text.empty()) {
-    const ssize_t count = TEMP_FAILURE_RETRY(write(fd, text.data(), text.size()));
-    if (count > 0) {
-      text.remove_prefix(static_cast<size_t>(count));
-    } else if (count < 0 && errno == EAGAIN) {
-      pollfd ready{fd, POLLOUT, 0};
-      poll(&ready, 1, -1);
-    } else {
-      return false;
-    }
-  }
-  return true;
 }
 
 /// Programs that call APIs may live long, so no dead child is left to them.
@@ -78,17 +62,10 @@ bool isSameFile(int left, int right) {
 /// The parent takes the result when it has seen the end of the output, so who still has to write
 /// the result must not hold the output.
 void letGoOfOutput() {
-  const bool isShared = isSameFile(STDOUT_FILENO, STDERR_FILENO);
-  const int null = open("/dev/null", O_WRONLY | O_CLOEXEC);
-  for (const int descriptor : {STDOUT_FILENO, STDERR_FILENO}) {
-    if (descriptor == STDERR_FILENO && !isShared) {
-      continue;
-    }
-    if (null < 0) {
-      close(descriptor);
-    } else {
-      dup2(null, descriptor);
-    }
+  if (isSameFile(STDOUT_FILENO, STDERR_FILENO)) {
+    LetGoOf({STDOUT_FILENO, STDERR_FILENO});
+  } else {
+    LetGoOf({STDOUT_FILENO});
   }
 }
 
@@ -105,7 +82,7 @@ void copyBody(Pipe& output, int fd) {
       inBody = end != std::string_view::npos;
       text.remove_prefix(inBody ? end + kHeaderEnd.size() : text.size());
     }
-    if (taken && !writeAll(fd, text)) {
+    if (taken && !WriteText(fd, text)) {
       taken = false;  // the child must not wait for us, so the rest is read all the same
       WEBAPI_LOG(kSource, "write output failed [%m]");
     }

@@ -126,7 +126,7 @@ TEST_F(SystemInfo, NothingButTheFileIsLeft) {
 }
 
 TEST_F(SystemInfo, LockThatIsHeldEndsInAFailure) {
-  const QELO::Platform::UniqueFd holder(open(Path("etc").c_str(), O_RDONLY | O_DIRECTORY));
+  const QELO::UniqueFd holder(open(Path("etc").c_str(), O_RDONLY | O_DIRECTORY));
   ASSERT_EQ(flock(holder.Get(), LOCK_EX), 0);
   EXPECT_LT(SetKey("a", "1"), 0);
 }
