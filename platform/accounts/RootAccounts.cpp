@@ -1,80 +1,121 @@
-#include <grp.h>
-#include <pwd.h>
+#include <fcntl.h>
 
 #include <algorithm>
+#include <string_view>
+#include <utility>
 
 #include "platform/accounts/AccountDatabase.h"
-#include "platform/accounts/DatabaseFile.h"
 #include "platform/base/KnownFile.h"
 #include "platform/base/Paths.h"
+#include "webapi/base/Number.h"
+#include "webapi/base/Text.h"
+#include "webapi/base/TextFile.h"
+#include "webapi/base/UniqueFd.h"
 
 namespace QELO::Platform {
 namespace {
 
-struct Group {
-  std::string name;
-  gid_t gid = 0;
-  std::vector<std::string> members;
+constexpr size_t kLargestFile = 1 << 26;  // bytes; a larger one is not read
 
-  bool Lists(const std::string& account) const {
-    return std::find(members.begin(), members.end(), account) != members.end();
-  }
-};
-
-struct AccountFile {
-  AccountFile() = default;
-  explicit AccountFile(const char* path) {
-    readable = readDatabaseFile<passwd>(path, fgetpwent_r, [this](const passwd& entry) {
-      entries.push_back({entry.pw_name, entry.pw_uid, entry.pw_gid, entry.pw_dir, entry.pw_shell});
-      return false;
-    });
+/// The text of an account file. Lines are taken apart when they are asked for: a call wants one
+/// account and one group, and making objects of all of them cost as much as the rest of its
+/// look-up.
+struct EntryFile {
+  EntryFile() = default;
+  explicit EntryFile(const char* path) {
+    UniqueFd file;
+    struct stat info {};
+    readable = OpenRegularFile(AT_FDCWD, path, file, info, 0) == 0 &&
+               ReadText(file.Get(), kLargestFile, text);
+    text.resize(readable ? text.size() : 0);
   }
 
   bool readable = false;
-  std::vector<Account> entries;
+  std::string text;
 };
 
-struct GroupFile {
-  GroupFile() = default;
-  explicit GroupFile(const char* path) {
-    readable = readDatabaseFile<group>(path, fgetgrent_r, [this](const group& entry) {
-      Group& added = entries.emplace_back(Group{entry.gr_name, entry.gr_gid, {}});
-      for (char** member = entry.gr_mem; *member != nullptr; ++member) {
-        added.members.emplace_back(*member);
-      }
-      return false;
-    });
+std::shared_ptr<const EntryFile> accounts() {
+  static KnownFile<EntryFile> file(Paths::kPasswd);
+  return file.Get();
+}
+
+std::shared_ptr<const EntryFile> groups() {
+  static KnownFile<EntryFile> file(Paths::kGroup);
+  return file.Get();
+}
+
+/// Calls `visit` with the name and the rest of each line that can be an entry.
+/// @return whether `visit` returned true, which ends the reading
+template <typename Visit>
+bool anyLine(const EntryFile& file, Visit visit) {
+  for (std::string_view rest = file.text; !rest.empty();) {
+    std::string_view line = TakePiece(rest, "\n");
+    line.remove_prefix(std::min(line.find_first_not_of(" \t"), line.size()));
+    if (line.empty() || line.front() == '#') {
+      continue;
+    }
+    const std::string_view name = TakePiece(line, ":");
+    if (visit(name, line)) {
+      return true;
+    }
   }
-
-  bool readable = false;
-  std::vector<Group> entries;
-};
-
-std::shared_ptr<const AccountFile> accounts() {
-  static KnownFile<AccountFile> file(Paths::kPasswd);
-  return file.Get();
+  return false;
 }
 
-std::shared_ptr<const GroupFile> groups() {
-  static KnownFile<GroupFile> file(Paths::kGroup);
-  return file.Get();
+/// What stands behind an account's name.
+bool readAccount(std::string_view rest, Account& account) {
+  TakePiece(rest, ":");  // the password
+  const std::string_view uid = TakePiece(rest, ":");
+  const std::string_view gid = TakePiece(rest, ":");
+  if (!ParseNumber(uid, account.uid) || !ParseNumber(gid, account.gid)) {
+    return false;
+  }
+  TakePiece(rest, ":");  // the full name
+  account.home = TakePiece(rest, ":");
+  account.shell = rest;
+  return true;
 }
 
-/// The first entry of that name counts, as it does for the C library.
-template <typename File>
-auto find(const File& file, const std::string& name) {
-  const auto found = std::find_if(file.entries.begin(), file.entries.end(),
-                                  [&name](const auto& entry) { return entry.name == name; });
-  return found != file.entries.end() ? &*found : nullptr;
+/// What stands behind a group's name.
+bool readGroup(std::string_view rest, gid_t& gid, std::string_view& members) {
+  TakePiece(rest, ":");  // the password
+  const std::string_view id = TakePiece(rest, ":");
+  members = rest;
+  return ParseNumber(id, gid);
+}
+
+bool lists(std::string_view members, std::string_view name) {
+  while (!members.empty()) {
+    std::string_view member = TakePiece(members, ",");
+    member.remove_prefix(std::min(member.find_first_not_of(" \t"), member.size()));
+    if (member == name) {
+      return true;
+    }
+  }
+  return false;
+}
+
+/// The first group of that name counts, as it does for the C library.
+Lookup readGroupNamed(const std::string& name, gid_t& gid, std::string_view& members,
+                      const EntryFile& file) {
+  const bool found = anyLine(file, [&](std::string_view entry, std::string_view rest) {
+    return entry == name && readGroup(rest, gid, members);
+  });
+  return found && !name.empty() ? Lookup::kFound
+         : file.readable        ? Lookup::kAbsent
+                                : Lookup::kFailed;
 }
 
 }  // namespace
 
 Lookup findAccount(const std::string& name, Account& account) {
   const auto file = accounts();
-  const Account* found = find(*file, name);
-  if (found != nullptr) {
-    account = *found;
+  Account found;
+  if (!name.empty() && anyLine(*file, [&](std::string_view entry, std::string_view rest) {
+        return entry == name && readAccount(rest, found);
+      })) {
+    account = std::move(found);
+    account.name = name;
     return Lookup::kFound;
   }
   return file->readable ? Lookup::kAbsent : Lookup::kFailed;
@@ -82,21 +123,21 @@ Lookup findAccount(const std::string& name, Account& account) {
 
 Lookup findGroup(const std::string& name, gid_t& gid) {
   const auto file = groups();
-  const Group* found = find(*file, name);
-  if (found != nullptr) {
-    gid = found->gid;
-    return Lookup::kFound;
-  }
-  return file->readable ? Lookup::kAbsent : Lookup::kFailed;
+  gid_t found = 0;
+  std::string_view members;
+  const Lookup lookup = readGroupNamed(name, found, members, *file);
+  gid = lookup == Lookup::kFound ? found : gid;
+  return lookup;
 }
 
 Lookup findMembership(const Account& account, const std::string& groupName) {
   const auto file = groups();
-  const Group* found = find(*file, groupName);
-  if (found == nullptr) {
-    return file->readable ? Lookup::kAbsent : Lookup::kFailed;
-  }
-  return found->gid == account.gid || found->Lists(account.name) ? Lookup::kFound : Lookup::kAbsent;
+  gid_t gid = 0;
+  std::string_view members;
+  const Lookup lookup = readGroupNamed(groupName, gid, members, *file);
+  const bool belongs =
+      lookup == Lookup::kFound && (gid == account.gid || lists(members, account.name));
+  return lookup == Lookup::kFound && !belongs ? Lookup::kAbsent : lookup;
 }
 
 Lookup findGroupsOf(const Account& account, std::vector<gid_t>& groupIds) {
@@ -105,11 +146,14 @@ Lookup findGroupsOf(const Account& account, std::vector<gid_t>& groupIds) {
     return Lookup::kFailed;
   }
   groupIds.assign(1, account.gid);
-  for (const Group& group : file->entries) {
-    if (group.gid != account.gid && group.Lists(account.name)) {
-      groupIds.push_back(group.gid);
+  anyLine(*file, [&](std::string_view, std::string_view rest) {
+    gid_t gid = 0;
+    std::string_view members;
+    if (readGroup(rest, gid, members) && gid != account.gid && lists(members, account.name)) {
+      groupIds.push_back(gid);
     }
-  }
+    return false;
+  });
   return Lookup::kFound;
 }
 

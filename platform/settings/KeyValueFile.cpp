@@ -9,6 +9,7 @@ namespace QELO::Platform {
 namespace {
 
 constexpr std::string_view kBlanks = " \t\r";
+constexpr size_t kLikelyLines = 16;
 
 std::string_view trimmed(std::string_view text) {
   return Trim(text, kBlanks);
@@ -35,12 +36,13 @@ KeyValueFile::KeyValueFile(const char* path) {
   // An administrator may link a configuration file elsewhere, so links are followed here.
   UniqueFd file;
   struct stat info {};
-  std::string text;
   if (OpenRegularFile(AT_FDCWD, path, file, info, 0) != 0 ||
-      !ReadText(file.Get(), kMaxSize, text)) {
+      !ReadText(file.Get(), kMaxSize, text_)) {
+    text_.clear();
     return;
   }
-  for (std::string_view rest = text; !rest.empty();) {
+  lines_.reserve(kLikelyLines);
+  for (std::string_view rest = text_; !rest.empty();) {
     const std::string_view line = trimmed(TakePiece(rest, "\n"));
     const size_t equals = line.find('=');
     if (equals != std::string_view::npos && line.front() != '#') {

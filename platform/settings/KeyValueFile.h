@@ -18,13 +18,16 @@ class KeyValueFile {
 
   KeyValueFile() = default;
   explicit KeyValueFile(const char* path);
+  KeyValueFile(const KeyValueFile&) = delete;
+  KeyValueFile& operator=(const KeyValueFile&) = delete;
 
   /// @return false, and `value` unchanged, when the key is not there
   bool Get(std::string_view key, std::string& value) const;
 
  private:
-  /// Names and values as they stand, in the order of the lines.
-  std::vector<std::pair<std::string, std::string>> lines_;
+  std::string text_;
+  /// Names and values within the text, in the order of the lines.
+  std::vector<std::pair<std::string_view, std::string_view>> lines_;
 };
 
 }  // namespace QELO::Platform

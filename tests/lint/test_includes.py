@@ -8,7 +8,8 @@ from sources import SOURCE, cpp_files, files, includes, name, run
 
 # The JSON type with its helpers, the mark of what is exported and the table of error codes belong to
 # everybody.
-COMMON = {"webapi/JsonHelper.h", "webapi/Export.h", "webapi/WebAPIError.h"}
+COMMON = {"webapi/JsonHelper.h", "webapi/json/Literal.h", "webapi/Export.h",
+          "webapi/WebAPIError.h"}
 
 PUBLIC = "include/webapi"
 FLOOR = {"webapi/base"}

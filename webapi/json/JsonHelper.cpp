@@ -80,7 +80,8 @@ bool toFile(const std::string& path, const Json::Value& value) {
 }
 
 const Json::Value* find(const Json::Value& value, std::string_view key) {
-  return value.isObject() ? value.find(key.data(), key.data() + key.size()) : nullptr;
+  return value.type() == Json::objectValue ? value.find(key.data(), key.data() + key.size())
+                                           : nullptr;
 }
 
 const Json::Value& member(const Json::Value& value, std::string_view key) {
@@ -117,7 +118,15 @@ uint64_t asUInt64(const Json::Value& value, uint64_t fallback) {
 }
 
 bool asBool(const Json::Value& value, bool fallback) {
-  return value.isBool() || value.isNumeric() ? value.asBool() : fallback;
+  switch (value.type()) {
+    case Json::booleanValue:
+    case Json::intValue:
+    case Json::uintValue:
+    case Json::realValue:
+      return value.asBool();
+    default:
+      return fallback;
+  }
 }
 
 }  // namespace QELO::JsonHelper

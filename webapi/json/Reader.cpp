@@ -101,12 +101,13 @@ class Reader {
     }
     do {
       Blanks();
-      std::string name;
-      if (!String(name)) {
+      std::string_view name;
+      std::string changed;
+      if (!String(name, changed)) {
         return false;
       }
       Blanks();
-      if (!Character(':') || !Value(value[name])) {
+      if (!Character(':') || !Value(*value.demand(name.data(), name.data() + name.size()))) {
         return false;
       }
     } while (Character(','));
@@ -127,33 +128,41 @@ class Reader {
   }
 
   bool StringValue(Json::Value& value) {
-    std::string text;
-    if (!String(text)) {
+    std::string_view text;
+    std::string changed;
+    if (!String(text, changed)) {
       return false;
     }
-    value = Json::Value(text);
+    value = Json::Value(text.data(), text.data() + text.size());
     return true;
   }
 
-  bool String(std::string& text) {
+  /// @param text     receives the string: where it stands, or in `changed` when it has escapes
+  bool String(std::string_view& text, std::string& changed) {
     if (!Character('"')) {
       return false;
     }
-    while (at_ != end_) {
-      const char* plain = at_;
-      while (at_ != end_ && *at_ != '"' && *at_ != '\\' &&
-             static_cast<unsigned char>(*at_) >= ' ') {
-        ++at_;
-      }
-      text.append(plain, at_);
-      if (!Character('\\')) {
-        return Character('"');
-      }
-      if (!Escape(text)) {
+    text = Plain();
+    while (Character('\\')) {
+      changed.append(text);
+      if (!Escape(changed)) {
         return false;
       }
+      text = Plain();
     }
-    return false;
+    if (!changed.empty()) {
+      text = changed.append(text);
+    }
+    return Character('"');
+  }
+
+  /// The characters up to the next that ends a string or stands for another.
+  std::string_view Plain() {
+    const char* start = at_;
+    while (at_ != end_ && *at_ != '"' && *at_ != '\\' && static_cast<unsigned char>(*at_) >= ' ') {
+      ++at_;
+    }
+    return {start, static_cast<size_t>(at_ - start)};
   }
 
   bool Escape(std::string& text) {

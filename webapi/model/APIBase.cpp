@@ -1,15 +1,21 @@
 #include "webapi/model/APIBase.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "webapi/JsonHelper.h"
+#include "webapi/json/Literal.h"
 
 namespace QELO {
 namespace {
 
+bool takesMembers(const Json::Value& value) {
+  return value.type() == Json::objectValue || value.type() == Json::nullValue;
+}
+
 bool holdsStringsAlone(const Json::Value& members) {
   return std::all_of(members.begin(), members.end(),
-                     [](const Json::Value& member) { return member.isString(); });
+                     [](const Json::Value& member) { return member.type() == Json::stringValue; });
 }
 
 }  // namespace
@@ -26,7 +32,20 @@ const Json::Value* APIBase::Find(std::string_view section, std::string_view key)
 Json::Value* APIBase::FindSection(std::string_view section) {
   // The store is ours to change; the JSON library finds members of constant values only.
   Json::Value* found = const_cast<Json::Value*>(JsonHelper::find(store_, section));
-  return found != nullptr && (found->isObject() || found->isNull()) ? found : nullptr;
+  return found != nullptr && takesMembers(*found) ? found : nullptr;
+}
+
+void APIBase::AddSection(const char* section) {
+  store_[Literal(section)] = Json::Value(Json::objectValue);
+}
+
+bool APIBase::Put(std::string_view section, const char* key, Json::Value value) {
+  Json::Value* target = FindSection(section);
+  if (target == nullptr) {
+    return false;
+  }
+  (*target)[Literal(key)].swap(value);
+  return true;
 }
 
 bool APIBase::HasData(const std::string& section, const std::string& key) const {
@@ -35,7 +54,7 @@ bool APIBase::HasData(const std::string& section, const std::string& key) const 
 
 bool APIBase::SetData(const std::string& section, const Json::Value& members, bool stringOnly) {
   Json::Value* target = FindSection(section);
-  if (target == nullptr || members.empty() || !members.isObject()) {
+  if (target == nullptr || members.type() != Json::objectValue || members.empty()) {
     return false;
   }
   if (target->empty() && (!stringOnly || holdsStringsAlone(members))) {
@@ -43,8 +62,10 @@ bool APIBase::SetData(const std::string& section, const Json::Value& members, bo
     return true;
   }
   for (auto it = members.begin(); it != members.end(); ++it) {
-    if (!stringOnly || it->isString()) {
-      (*target)[it.name()] = *it;
+    if (!stringOnly || it->type() == Json::stringValue) {
+      const char* end = nullptr;
+      const char* name = it.memberName(&end);
+      *target->demand(name, end) = *it;
     }
   }
   return true;
@@ -52,18 +73,28 @@ bool APIBase::SetData(const std::string& section, const Json::Value& members, bo
 
 bool APIBase::TakeData(const std::string& section, Json::Value&& members, bool stringOnly) {
   Json::Value* target = FindSection(section);
-  if (target != nullptr && target->empty() && members.isObject() && !members.empty() &&
-      (!stringOnly || holdsStringsAlone(members))) {
+  if (target != nullptr && target->empty() && members.type() == Json::objectValue &&
+      !members.empty() && (!stringOnly || holdsStringsAlone(members))) {
     target->swap(members);
     return true;
   }
   return SetData(section, members, stringOnly);
 }
 
+bool APIBase::ReplaceData(const std::string& section, Json::Value&& members) {
+  Json::Value* target = FindSection(section);
+  if (target != nullptr && members.type() == Json::objectValue && !members.empty()) {
+    target->swap(members);
+    return true;
+  }
+  ClearData(section, "");
+  return false;
+}
+
 bool APIBase::SetData(const std::string& section, const std::string& key, const Json::Value& value,
                       bool stringOnly) {
   Json::Value* target = FindSection(section);
-  if (target == nullptr || key.empty() || (stringOnly && !value.isString())) {
+  if (target == nullptr || key.empty() || (stringOnly && value.type() != Json::stringValue)) {
     return false;
   }
   (*target)[key] = value;
@@ -108,7 +139,7 @@ const Json::Value& APIBase::GetData(const std::string& section,
 }
 
 bool APIBase::InitField(const std::string& section) {
-  if (section.empty() || !(store_.isObject() || store_.isNull())) {
+  if (section.empty() || !takesMembers(store_)) {
     return false;
   }
   const Json::ArrayIndex former = store_.size();

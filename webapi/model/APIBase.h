@@ -50,12 +50,18 @@ class APIBase {
 
   /// As SetData() with the members of an object, which are moved where that is possible.
   bool TakeData(const std::string& section, Json::Value&& members, bool stringOnly);
+  /// As ClearData() and then TakeData().
+  bool ReplaceData(const std::string& section, Json::Value&& members);
+  /// As SetData() with a name that lives as long as the process.
+  bool Put(std::string_view section, const char* key, Json::Value value);
 
  protected:
   /// The member, or null when it or the section is missing.
   const Json::Value* Find(std::string_view section, std::string_view key) const;
   /// The section as something that takes members, or null.
   Json::Value* FindSection(std::string_view section);
+  /// Creates an empty section that is not there yet; its name lives as long as the process.
+  void AddSection(const char* section);
 
   Json::Value store_;
 };

@@ -193,7 +193,7 @@ unsigned int APIRequest::GetLoginUID() const {
 }
 
 bool APIRequest::SetAuthResult(_tag_authorized_result_ result) {
-  return private_->SetData("session", "authResult", static_cast<int>(result), false);
+  return private_->Put("session", "authResult", Json::Int64{result});
 }
 
 _tag_authorized_result_ APIRequest::GetAuthResult() const {

@@ -38,9 +38,9 @@ int userClassBit(const std::string& name) {
 APIRequestPrivate::APIRequestPrivate(APIRequest* owner) : owner_(owner) {
   for (const char* section :
        {"environ", "cookie", "reqLib", "session", "param", "attr", "url", "userAgent", "private"}) {
-    InitField(section);
+    AddSection(section);
   }
-  SetData("private", "requestMethod", APIRequest::METHOD_UNKNOWN, false);
+  Put("private", "requestMethod", Json::Int64{APIRequest::METHOD_UNKNOWN});
 }
 
 void APIRequestPrivate::InitEnv(Json::Value env) {
@@ -69,13 +69,11 @@ void APIRequestPrivate::InitParam(const Json::Value& params, bool replace) {
 }
 
 void APIRequestPrivate::InitAPIInfo(const Json::Value& description) {
-  ClearData("reqLib", "");
-  SetData("reqLib", description, false);
+  ReplaceData("reqLib", Json::Value(description));
 }
 
 void APIRequestPrivate::InitSession(Json::Value session) {
-  ClearData("session", "");
-  TakeData("session", std::move(session), false);
+  ReplaceData("session", std::move(session));
 }
 
 void APIRequestPrivate::Restore(Json::Value& record) {
@@ -85,12 +83,12 @@ void APIRequestPrivate::Restore(Json::Value& record) {
 
 void APIRequestPrivate::SetAPIDesc(const Json::Value& params) {
   for (const char* key : {"api", "method"}) {
-    if (JsonHelper::hasMember(params, key)) {
-      SetData("private", key, JsonHelper::asString(JsonHelper::member(params, key)), true);
+    if (const Json::Value* text = JsonHelper::find(params, key)) {
+      Put("private", key, text->isString() ? *text : JsonHelper::asString(*text));
     }
   }
-  if (JsonHelper::hasMember(params, "version")) {
-    SetData("private", "version", JsonHelper::asInt(JsonHelper::member(params, "version")), false);
+  if (const Json::Value* version = JsonHelper::find(params, "version")) {
+    Put("private", "version", Json::Int64{JsonHelper::asInt(*version)});
   }
 }
 
@@ -157,7 +155,7 @@ const char* APIRequestPrivate::GetQeloAccessTokenID() const {
 }
 
 bool APIRequestPrivate::IsPollingTask() const {
-  return HasData("environ", "task_id") && HasData("environ", "task_user");
+  return Find("environ", "task_id") != nullptr && Find("environ", "task_user") != nullptr;
 }
 
 bool APIRequestPrivate::IsUploadRequest() const {
@@ -171,10 +169,7 @@ bool APIRequestPrivate::IsSliceUploadRequest() const {
 }
 
 std::string APIRequestPrivate::GetCookie(const std::string& name, const std::string& def) const {
-  // A cookie may have the empty name, which GetData() takes for the whole section.
-  return HasData("cookie", name)
-             ? JsonHelper::asString(JsonHelper::member(GetData("cookie", def), name), def)
-             : def;
+  return Text("cookie", name, def);
 }
 
 std::string APIRequestPrivate::Text(std::string_view section, std::string_view key,

@@ -1,3 +1,5 @@
+#include <string_view>
+
 #include "webapi/JsonHelper.h"
 #include "webapi/model/request/APIRequestPrivate.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -5,16 +7,20 @@
 namespace QELO {
 
 void APIRequestPrivate::InitCookie() {
-  const Json::Value& header = GetData("environ", "HTTP_COOKIE", Json::Value::nullSingleton());
+  const Json::Value* header = Find("environ", "HTTP_COOKIE");
   Json::Value* cookies = FindSection("cookie");
-  if (!header.isString() || cookies == nullptr) {
+  const char* begin = nullptr;
+  const char* end = nullptr;
+  if (header == nullptr || !header->getString(&begin, &end) || cookies == nullptr) {
     return;
   }
-  for (const Json::Value& piece : WebAPIUtil::ParseToArray(header.asCString(), ";")) {
-    const std::string text = JsonHelper::asString(piece);
+  for (const Json::Value& piece : WebAPIUtil::ParseToArray(begin, ";")) {
+    piece.getString(&begin, &end);
+    const std::string_view text(begin, static_cast<size_t>(end - begin));
     const size_t equals = text.find('=');
-    if (equals != std::string::npos) {
-      (*cookies)[text.substr(0, equals)] = WebAPIUtil::URLDecode(text.substr(equals + 1), true);
+    if (equals != std::string_view::npos) {
+      const std::string value(text.substr(equals + 1));
+      *cookies->demand(begin, begin + equals) = WebAPIUtil::URLDecode(value, true);
     }
   }
 }

@@ -10,9 +10,8 @@ APIParameter<T> APIRequestPrivate::GetAndCheckParam(const std::string& name, boo
                                                     Json::ValueType type,
                                                     bool (*validator)(const T&)) const {
   APIParameter<T> parameter;
-  if (HasData("param", name)) {
-    const Json::Value& params = GetData("param", Json::Value::nullSingleton());
-    parameter.CheckValueTypeAndGet(JsonHelper::member(params, name), type, validator);
+  if (const Json::Value* value = Find("param", name)) {
+    parameter.CheckValueTypeAndGet(*value, type, validator);
   } else if (required) {
     parameter.MarkInvalid();
   }
@@ -21,11 +20,11 @@ APIParameter<T> APIRequestPrivate::GetAndCheckParam(const std::string& name, boo
 
 APIParameter<Json::Value> APIRequestPrivate::GetAndCheckUnitArrayParam(
     const std::string& name, bool required, bool (*validator)(const Json::Value&)) const {
-  if (!HasData("param", name)) {
+  const Json::Value* found = Find("param", name);
+  if (found == nullptr) {
     return GetAndCheckParam<Json::Value>(name, required, Json::arrayValue, validator);
   }
-  const Json::Value& params = GetData("param", Json::Value::nullSingleton());
-  Json::Value list = JsonHelper::member(params, name);
+  Json::Value list = *found;
   if (!list.isArray()) {
     Json::Value wrapped(Json::arrayValue);
     wrapped.append(list);

@@ -19,7 +19,7 @@ void APIRequestPrivate::InitRequestMethod() {
   } else {
     return;
   }
-  SetData("private", "requestMethod", code, false);
+  Put("private", "requestMethod", Json::Int64{code});
 }
 
 void APIRequestPrivate::InitURL() {

@@ -7,34 +7,40 @@
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
+#include "webapi/json/Literal.h"
 #include "webapi/platform/Task.h"
 
 namespace QELO {
 
 APIResponsePrivate::APIResponsePrivate(APIRequest* request, APIResponse* owner)
     : request_(request), owner_(owner) {
-  InitField("headers");
-  store_["setCookie"] = Json::Value(Json::arrayValue);
-  InitField("success");
-  InitField("option");
-  store_["code"] = 0;
+  AddSection("headers");
+  store_[Literal("setCookie")] = Json::Value(Json::arrayValue);
+  AddSection("success");
+  AddSection("option");
+  store_[Literal("code")] = Json::Int64{0};
 }
 
 void APIResponsePrivate::SetError(int code, const Json::Value& data) {
   PrepareTask();
   Json::Value body(Json::objectValue);
-  body["success"] = code == 0;
+  body[Literal("success")] = code == 0;
+  Json::Value* detail = nullptr;
   if (code != 0) {
-    body["error"]["code"] = code;
+    Json::Value& error = body[Literal("error")];
+    error[Literal("code")] = Json::Int64{code};
+    detail = data.isNull() ? nullptr : &error[Literal("errors")];
+  } else if (!data.isNull()) {
+    detail = &body[Literal("data")];
   }
-  if (!data.isNull()) {
-    (code != 0 ? body["error"]["errors"] : body["data"]) = data;
+  if (detail != nullptr) {
+    *detail = data;
   }
-  if (!store_.isObject()) {  // a record that another process sent broken
+  if (store_.type() != Json::objectValue) {  // a record that another process sent broken
     store_ = Json::Value(Json::objectValue);
   }
-  store_["code"] = code;
-  store_["body"] = std::move(body);
+  store_[Literal("code")] = Json::Int64{code};
+  store_[Literal("body")].swap(body);
   UpdateTask();
 }
 

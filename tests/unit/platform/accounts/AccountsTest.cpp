@@ -55,6 +55,24 @@ TEST_F(Accounts, BrokenLinesAreSkipped) {
   EXPECT_NE(QELOUserGetUGID("nonsense", &uid, &gid), 0);
 }
 
+TEST_F(Accounts, CommentsAndIndentedLinesAreRead) {
+  Write("etc/passwd", "#alice:x:5:5::/:/bin/sh\n \tlast:x:6:7:::/bin/sh\n");
+  uid_t uid = 0;
+  gid_t gid = 0;
+  EXPECT_NE(QELOUserGetUGID("alice", &uid, &gid), 0);
+  EXPECT_NE(QELOUserGetUGID("#alice", &uid, &gid), 0);
+  EXPECT_EQ(QELOUserGetUGID("last", &uid, &gid), 0);
+  EXPECT_EQ(uid, 6U);
+}
+
+TEST_F(Accounts, FirstOfTwoLinesCounts) {
+  Write("etc/passwd", "twice:x:6:7::/:/bin/sh\ntwice:x:8:9::/:/bin/sh\n");
+  uid_t uid = 0;
+  gid_t gid = 0;
+  EXPECT_EQ(QELOUserGetUGID("twice", &uid, &gid), 0);
+  EXPECT_EQ(uid, 6U);
+}
+
 TEST_F(Accounts, UserIdOfASessionIsTheUsers) {
   EXPECT_EQ(QeloCgiUIDGet("any", "alice"), IsRoot() ? 1002U : geteuid());
   EXPECT_EQ(QeloCgiUIDGet("any", "zoe"), 0xFFFFFFFFU);
