@@ -94,6 +94,23 @@ def test_LibraryThatChangesTheProcess_IsUndone(client, describe):
     assert call(client).data == "gone"
 
 
+@pytest.mark.parametrize("how", [
+    "closed", "descriptors", "wide", "wideCpp", "reopened", "lent", "dead", "tied", "throwing",
+    "unsynchronised", "replaced"])
+def test_LibraryThatMistreatsTheStreams_KeepsItsAnswer(client, server, describe, how):
+    describe("QELO.Test.Call", "mistreating.so")
+    crashes = server.log().count("died with signal")
+    answer = client.get(f"{CALL}&how={how}")
+    assert (answer.status, answer.body) == (200, b'{"data":"done","success":true}')
+    assert server.log().count("died with signal") == crashes  # after the answer, either
+
+
+def test_LibraryThatClosesAllDescriptors_LosesItsOwnAnswer(client, describe):
+    describe("QELO.Test.Call", "mistreating.so")
+    assert client.get(f"{CALL}&how=rest").status == 500
+    assert client.get(f"{CALL}&how=wide").status == 200
+
+
 @pytest.mark.parametrize("version, code", [(1, 444), (2, 0), (3, 117)])
 def test_CheckFunction_StopsTheCallOrNot(client, describe, version, code):
     describe("QELO.Test.Call", "checked.so")

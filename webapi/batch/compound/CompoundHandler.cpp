@@ -11,7 +11,8 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/Pipe.h"
 #include "webapi/base/Log.h"
-#include "webapi/runner/execution/ProcessGuards.h"
+#include "webapi/runner/execution/StandardStreams.h"
+#include "webapi/runner/execution/WorkingDirectory.h"
 
 namespace QELO {
 namespace {

@@ -19,7 +19,7 @@
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Task.h"
 #include "webapi/runner/execution/Fence.h"
-#include "webapi/runner/execution/ProcessGuards.h"
+#include "webapi/runner/execution/StandardStreams.h"
 
 namespace QELO {
 namespace {

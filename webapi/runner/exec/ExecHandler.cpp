@@ -21,7 +21,7 @@
 #include "webapi/base/TextFile.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
-#include "webapi/runner/execution/ProcessGuards.h"
+#include "webapi/runner/execution/WorkingDirectory.h"
 
 namespace QELO {
 namespace {

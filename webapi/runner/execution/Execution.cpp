@@ -8,7 +8,9 @@
 #include "webapi/base/Log.h"
 #include "webapi/runner/execution/Credentials.h"
 #include "webapi/runner/execution/Fence.h"
-#include "webapi/runner/execution/ProcessGuards.h"
+#include "webapi/runner/execution/Priority.h"
+#include "webapi/runner/execution/StandardStreams.h"
+#include "webapi/runner/execution/WorkingDirectory.h"
 
 namespace QELO {
 namespace {

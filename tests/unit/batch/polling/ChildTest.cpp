@@ -11,7 +11,7 @@
 #include <stdexcept>
 
 #include "tests/unit/batch/polling/Fixture.h"
-#include "webapi/runner/execution/ProcessGuards.h"
+#include "webapi/runner/execution/StandardStreams.h"
 
 namespace QELO {
 namespace {
