@@ -25,6 +25,10 @@ class WEBAPI_API ExecHandler {
   ///         101 when API, method or user is missing and 117 when the child came to nothing
   Json::Value Process();
 
+  /// After Process(): the errno of the first write to the output descriptor that failed; what came
+  /// from there on is dropped, and the answer is the call's all the same. 0: all was written.
+  int GetOutputError() const { return outputError_; }
+
   /// The steps of Process().
   /// @return false, with the result set, when the call lacks something
   bool CheckParams();
@@ -46,6 +50,7 @@ class WEBAPI_API ExecHandler {
   APIRunner runner_;
   Json::Value request_;
   Json::Value result_;
+  int outputError_ = 0;
 };
 
 }  // namespace QELO

@@ -8,7 +8,7 @@
 #include <cstring>
 
 #include "programs/webapi-exec/Accounts.h"
-#include "webapi/APIRunner.h"
+#include "webapi/ExecHandler.h"
 #include "webapi/ExecParam.h"
 #include "webapi/platform/Core.h"
 
@@ -80,8 +80,13 @@ std::string makeCall(const Options& options, Json::Value& answer) {
       .SetMethod(isBatch ? kBatchMethod : options.method)
       .SetRunner(user)
       .SetOutputFd(output);
-  answer = APIRunner::Exec(param);
-  return close(output) == 0 ? "" : options.output + ": " + strerror(errno);
+  ExecHandler handler(param);
+  answer = handler.Process();
+  int error = handler.GetOutputError();
+  if (close(output) != 0 && error == 0) {
+    error = errno;
+  }
+  return error == 0 ? "" : options.output + ": " + strerror(error);
 }
 
 }  // namespace QELO::ExecProgram

@@ -175,8 +175,8 @@ std::string take(int option, const std::string& argument, Options& options, std:
       options.method = argument;
       return "";
     case kUser:
-      options.user = argument;
-      return "";
+      // An empty name, as of a variable that is not set, must not mean the caller, who may be root.
+      return takeWord(argument, "--user takes a name", options.user);
     case kParam:
       return readParam(argument, options.params);
     case kJson:

@@ -23,6 +23,9 @@ static ExitCode run(const Options& options) {
   Json::Value answer;
   const std::string wrong = makeCall(options, answer);
   if (!wrong.empty()) {
+    if (!answer.isNull()) {  // the call was made, and nothing else tells how it ended
+      showAnswer(options, answer);
+    }
     fprintf(stderr, "webapi-exec: %s\n", wrong.c_str());
     return kFailed;
   }

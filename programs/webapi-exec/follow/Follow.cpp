@@ -20,6 +20,8 @@ ExitCode start(const Options& options, std::string& id) {
   const std::string wrong = makeCall(options, answer);
   if (!wrong.empty()) {
     fprintf(stderr, "webapi-exec: %s\n", wrong.c_str());
+  }
+  if (answer.isNull()) {
     return kFailed;
   }
   id = JsonHelper::asString(JsonHelper::member(JsonHelper::member(answer, "data"), "task_id"));

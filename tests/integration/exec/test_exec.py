@@ -157,6 +157,14 @@ def test_Output_ThatCannotBeWritten_Fails(tmp_path):
     assert "No such file or directory" in process.stderr
 
 
+@pytest.mark.parametrize("size", [10, 3000000])
+def test_Output_OnAFullDisk_FailsAndKeepsTheAnswer(size):
+    process = call(DOWNLOAD, "bytes", "--param", f"size={size}", "--output", "/dev/full")
+    assert process.returncode == 1
+    assert process.stderr == "webapi-exec: /dev/full: No space left on device\n"
+    assert json.loads(process.stdout)["success"] is True
+
+
 # Batches
 
 CALLS = [

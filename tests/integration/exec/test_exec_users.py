@@ -173,6 +173,8 @@ def test_Help_NamesEveryOption(option):
         ("--follow", "--task", "alice/x", "--api", ENTRIES, "--method", "echo"),
         ("--follow", "--task", "alice/x", "--param", "a=1"),
         ("--follow", "--task", "alice/x", "--output", "x"),
+        ("--api", ENTRIES, "--method", "echo", "--user", ""),
+        ("--batch", "/dev/null", "--user", ""),
         ("--task", "alice/x"),
     ],
 )

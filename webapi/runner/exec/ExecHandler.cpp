@@ -71,10 +71,11 @@ void letGoOfOutput() {
 
 /// Copies what stands behind the header block of CGI output. The block's end must come within one
 /// read, or all is dropped.
-void copyBody(Pipe& output, int fd) {
+/// @return 0, or the errno of the write that failed
+int copyBody(Pipe& output, int fd) {
   char chunk[kChunkSize] = {};
   bool inBody = false;
-  bool taken = true;
+  int error = 0;
   for (int count; (count = output.Read(chunk, kChunkSize - 1)) > 0;) {
     std::string_view text(chunk, static_cast<size_t>(count));
     if (!inBody) {
@@ -82,11 +83,12 @@ void copyBody(Pipe& output, int fd) {
       inBody = end != std::string_view::npos;
       text.remove_prefix(inBody ? end + kHeaderEnd.size() : text.size());
     }
-    if (taken && !WriteText(fd, text)) {
-      taken = false;  // the child must not wait for us, so the rest is read all the same
+    if (error == 0 && !WriteText(fd, text)) {
+      error = errno;  // the child must not wait for us, so the rest is read all the same
       WEBAPI_LOG(kSource, "write output failed [%m]");
     }
   }
+  return error;
 }
 
 }  // namespace
@@ -189,7 +191,7 @@ void ExecHandler::RunForkForStdout() {
   }
   output.ReadOnly(-1);
   result.ReadOnly(-1);
-  copyBody(output, param_->GetOutputFd());
+  outputError_ = copyBody(output, param_->GetOutputFd());
   ReceiveResult(result, child);
 }
 
