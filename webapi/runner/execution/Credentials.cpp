@@ -47,6 +47,27 @@ bool becomeRootGroup() {
   return true;
 }
 
+std::vector<gid_t> currentGroups() {
+  const int count = getgroups(0, nullptr);
+  std::vector<gid_t> groups(count > 0 ? static_cast<size_t>(count) : 0);
+  if (count > 0) {
+    getgroups(count, groups.data());
+  }
+  return groups;
+}
+
+bool setGroups(const std::vector<gid_t>& groups) {
+  const bool done = setgroups(groups.size(), groups.data()) == 0;
+  if (done) {
+    syslog(LOG_AUTH | LOG_INFO, "%s:%d WARNING: setgroups(%zu)", "APIRunner.cpp", __LINE__,
+           groups.size());
+  } else {
+    syslog(LOG_AUTH | LOG_ERR, "%s:%d ERROR: setgroups(%zu) [%m]", "APIRunner.cpp", __LINE__,
+           groups.size());
+  }
+  return done;
+}
+
 bool isCurrentUser(const std::string& name) {
   uid_t uid = 0;
   gid_t gid = 0;
@@ -55,39 +76,44 @@ bool isCurrentUser(const std::string& name) {
 
 }  // namespace
 
+bool Credentials::areLost_ = false;
+
 bool Credentials::Save() {
-  if (getresgid(&group_.real, &group_.effective, &group_.saved) != 0 ||
-      getresuid(&user_.real, &user_.effective, &user_.saved) != 0) {
-    return false;
-  }
-  const int count = getgroups(0, nullptr);
-  supplementary_.resize(count > 0 ? static_cast<size_t>(count) : 0);
-  if (count > 0) {
-    getgroups(count, supplementary_.data());
-  }
-  return true;
+  supplementary_ = currentGroups();
+  return getresgid(&group_.real, &group_.effective, &group_.saved) == 0 &&
+         getresuid(&user_.real, &user_.effective, &user_.saved) == 0;
 }
 
 bool Credentials::HaveChanged() const {
   return geteuid() != user_.effective || getegid() != group_.effective;
 }
 
-void Credentials::GiveBack() const {
-  // The user's supplementary groups must not stay with the next call, and root alone sets them.
-  if (user_.effective != 0 && setresuid(kUnchanged, 0, kUnchanged) == 0) {
-    setgroups(supplementary_.size(), supplementary_.data());
+bool Credentials::GiveBack() const {
+  const bool otherGroups = supplementary_ != currentGroups();
+  const bool isRoot = user_.effective == 0;
+  bool good = true;
+  if (otherGroups && !isRoot) {  // root alone sets groups
+    good = becomeRootUser() && setGroups(supplementary_);
   }
-  if (setresgid(group_.real, group_.effective, group_.saved) != 0) {
-    logFailure("resgid", group_.real, group_.effective, group_.saved, __LINE__);
-  } else if (group_.effective == 0) {
-    logChange("resgid", group_.real, group_.effective, group_.saved, __LINE__);
+  good = SetIds("resgid", setresgid, group_) && good;
+  const bool hasUser = SetIds("resuid", setresuid, user_);
+  if (otherGroups && isRoot && hasUser) {
+    good = setGroups(supplementary_) && good;
   }
-  if (setresuid(user_.real, user_.effective, user_.saved) != 0) {
-    logFailure("resuid", user_.real, user_.effective, user_.saved, __LINE__);
-  } else if (user_.effective == 0) {
-    logChange("resuid", user_.real, user_.effective, user_.saved, __LINE__);
-    setgroups(supplementary_.size(), supplementary_.data());
+  areLost_ = areLost_ || !good || !hasUser;
+  return good && hasUser;
+}
+
+bool Credentials::SetIds(const char* call, int (*set)(unsigned, unsigned, unsigned),
+                         const Ids& ids) {
+  if (set(ids.real, ids.effective, ids.saved) != 0) {
+    logFailure(call, ids.real, ids.effective, ids.saved, __LINE__);
+    return false;
   }
+  if (ids.effective == 0) {
+    logChange(call, ids.real, ids.effective, ids.saved, __LINE__);
+  }
+  return true;
 }
 
 bool Credentials::BecomeRoot() {

@@ -15,8 +15,15 @@ class Credentials {
   bool Save();
   /// Whether the effective ids are no longer the saved ones.
   bool HaveChanged() const;
-  /// Sets the saved ids again; failures are logged.
-  void GiveBack() const;
+  /// Sets the saved ids again, and the supplementary groups where they have changed; failures are
+  /// logged. For the groups a process that is not root becomes root first: a call that runs later
+  /// must not have the groups of the user before.
+  /// @return false when one of them could not be set: the credentials are lost from then on
+  bool GiveBack() const;
+
+  /// Whether the process has kept something of a method's credentials that it was to give back.
+  /// Then nothing else may be called in it.
+  static bool AreLost() { return areLost_; }
 
   /// Makes root the effective group and user, where they are not.
   /// @return false, with errno, when that is refused
@@ -29,6 +36,9 @@ class Credentials {
   struct Ids {
     unsigned int real, effective, saved;
   };
+  static bool SetIds(const char* call, int (*set)(unsigned, unsigned, unsigned), const Ids& ids);
+
+  static bool areLost_;
   Ids group_{};
   Ids user_{};
   std::vector<gid_t> supplementary_;

@@ -113,6 +113,11 @@ bool callMethod(const _tag_API_TABLE& entry, const Json::Value& attributes, APIR
 }  // namespace
 
 bool Execution::Run(const Json::Value& attributes) {
+  if (Credentials::AreLost()) {
+    WEBAPI_LOG("APIRunner.cpp", "not called: the process has credentials of a call before");
+    response_->SetError(WEBAPI_ERR_NO_ANSWER);
+    return false;
+  }
   // Loading is within the guards: a library's constructors are foreign code too. They end in
   // reverse order, streams before priority before directory.
   const WorkingDirectory directory;

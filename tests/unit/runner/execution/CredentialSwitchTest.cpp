@@ -3,12 +3,29 @@
 
 #include <fcntl.h>
 #include <grp.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <syslog.h>
 
 #include <array>
+#include <cerrno>
+#include <functional>
 
 #include "tests/unit/runner/RunnerFixture.h"
+
+namespace {
+bool failSetgroups = false;
+}  // namespace
+
+// Takes the place of the C library's for the whole test program.
+extern "C" __attribute__((visibility("default"))) int setgroups(size_t count,
+                                                                const gid_t* groups) noexcept {
+  if (failSetgroups) {
+    errno = EPERM;
+    return -1;
+  }
+  return static_cast<int>(syscall(SYS_setgroups, count, groups));
+}
 
 namespace QELO {
 namespace {
@@ -149,6 +166,52 @@ TEST_F(CredentialSwitch, IdsThatCannotBeGivenBackLeaveAThrowingMethodsResult) {
     return !ProcessPlugin("throwing", kGrantable) && response->GetError() == 117 &&
            refusals("setresgid(0, 0, 0)") == 1 && refusals("setresuid(0, 0, 0)") == 1;
   });
+}
+
+/// Groups cannot be set any more once the method has its user's.
+auto switchThatKeepsGroups() {
+  return [](const std::string&, bool) {
+    const bool switched = setgroups(0, nullptr) == 0 && setresgid(-1U, kUser, -1U) == 0 &&
+                          setresuid(-1U, kUser, -1U) == 0;
+    failSetgroups = true;
+    return switched;
+  };
+}
+
+TEST_F(CredentialSwitch, GroupsThatCannotBeGivenBackAreLoggedAndTheResultStays) {
+  platform->resetCredentials = switchThatKeepsGroups();
+  for (const unsigned effective : {0, kCaller}) {
+    InChild({0, effective, 0, 0, effective, 0}, [&] {
+      return ProcessPlugin("state", kGrantable) && RanAsUser() && response->GetError() == 0 &&
+             refusals("setgroups(2)") == 1 && SyslogCapture::Count("ERROR: ") == 1;
+    });
+  }
+}
+
+TEST_F(CredentialSwitch, EveryChangeOnTheWayBackIsLogged) {
+  InChild({kCaller, kCaller, 0, kCaller, kCaller, 0}, [&] {
+    return ProcessPlugin("state", kGrantable) &&
+           SyslogCapture::Count("WARNING: setresuid(-1, 0, -1)") == 2 &&
+           SyslogCapture::Count("WARNING: setgroups(2)") == 1;
+  });
+  InChild({kCaller, kCaller, 0, kCaller, kCaller, 0}, [&] {
+    return ProcessPlugin("state", R"({"grantByDefault": true})") &&  // which leaves the groups
+           SyslogCapture::Count("WARNING: setresuid(-1, 0, -1)") == 1 &&
+           SyslogCapture::Count("setgroups") == 0;
+  });
+}
+
+TEST_F(CredentialSwitch, ProcessThatKeepsACallersCredentialsCallsNothingElse) {
+  for (const auto& keeping : std::vector<std::function<bool(const std::string&, bool)>>{
+           switchThatKeeps(true, false), switchThatKeeps(false, true), switchThatKeepsGroups()}) {
+    platform->resetCredentials = keeping;
+    InChild({0, 0, 0, 0, 0, 0}, [&] {
+      const bool first = ProcessPlugin("state", kGrantable) && response->GetError() == 0;
+      const char* refused = "not called: the process has credentials of a call before";
+      return first && SyslogCapture::Count(refused) == 0 && !ProcessPlugin("state") &&
+             response->GetError() == 117 && SyslogCapture::Count(refused) == 1;
+    });
+  }
 }
 
 TEST_F(CredentialSwitch, WithoutGrantableTheUsersIdsStay) {
