@@ -1,9 +1,11 @@
 // The CGI program: one process, one request. It stands in the description directory, where the
 // library looks API descriptions up, and serves the request.
 
+#include <syslog.h>
 #include <unistd.h>
 
 #include <cstdio>
+#include <exception>
 
 #include "webapi/WebEntry.h"
 #include "webapi/base/NullDevice.h"
@@ -15,14 +17,26 @@ static void closeAnswer() {
   QELO::PutNullOver({STDOUT_FILENO});
 }
 
+static void serve(int argc, char** argv) {
+  QELO::WebEntry entry;
+  entry.SetArgs(argc, argv);
+  entry.Run(Json::Value());
+  closeAnswer();
+}
+
 int main(int argc, char** argv) {
   if (chdir(QELO::Paths::kDescriptionDir) != 0) {
     std::perror(QELO::Paths::kDescriptionDir);
     return 1;
   }
-  QELO::WebEntry entry;
-  entry.SetArgs(argc, argv);
-  entry.Run(Json::Value());
-  closeAnswer();
-  return 0;
+  try {
+    serve(argc, argv);
+    return 0;
+  } catch (
+      const std::exception& error) {  // before or after the answer, which has a guard of its own
+    syslog(LOG_ERR, "%s:%d %s", "main.cpp", __LINE__, error.what());
+  } catch (...) {
+    syslog(LOG_ERR, "%s:%d %s", "main.cpp", __LINE__, "an exception of no known kind");
+  }
+  return 1;
 }

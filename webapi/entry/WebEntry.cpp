@@ -10,7 +10,10 @@
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
 #include "webapi/entry/intake/Intake.h"
+#include "webapi/entry/intake/UnreadBody.h"
+#include "webapi/entry/output/AnswerText.h"
 #include "webapi/entry/output/BrokenPipe.h"
+#include "webapi/entry/output/WriteAnswer.h"
 #include "webapi/entry/permission/PermissionCheck.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"
@@ -63,6 +66,32 @@ void replaceSession(std::string& cookies, bool hadCookies, const std::string& se
   cookies += kSessionCookie + sessionId;
 }
 
+/// No memory, most likely, is no reason to leave the client without an answer.
+/// @return false, logged, when an exception was caught
+template <typename Call>
+bool guarded(Call call) {
+  try {
+    call();
+    return true;
+  } catch (const std::exception& error) {
+    WEBAPI_LOG("WebEntry.cpp", "%s", error.what());
+  } catch (...) {
+    WEBAPI_LOG("WebEntry.cpp", "an exception of no known kind");
+  }
+  return false;
+}
+
+/// Prints the response, unless the method has printed its own, and drops what is left of the body.
+void answer(const APIResponse& response, UnreadBody& body) {
+  // One text: what can fail does so before the first byte is out.
+  const std::string text =
+      response.IsEnableOutput() ? HeaderText(response) + BodyText(response) : "";
+  const BrokenPipe tolerated;
+  if (WriteAnswer(text, body)) {  // else there is nobody to keep an answer from
+    body.Drop();
+  }
+}
+
 }  // namespace
 
 WebEntry::WebEntry() : spare_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
@@ -88,16 +117,15 @@ void WebEntry::Serve() {
 }
 
 bool WebEntry::Run(const Json::Value&) {
-  try {
-    Serve();
-  } catch (const std::exception& error) {  // no memory, most likely; the client gets an answer
-    WEBAPI_LOG("WebEntry.cpp", "%s", error.what());
-    Response()->SetError(WEBAPI_ERR_NO_ANSWER);
+  UnreadBody body = UnreadBody::OfRequest();
+  if (!guarded([this] { Serve(); })) {
+    guarded([this] { Response()->SetError(WEBAPI_ERR_NO_ANSWER); });
   }
-  if (Response()->IsEnableOutput()) {
-    const BrokenPipe tolerated;
-    OutputHeader();
-    OutputBody();
+  if (!guarded([&] { answer(*Response(), body); })) {
+    guarded([&] {
+      Response()->SetError(WEBAPI_ERR_NO_ANSWER);
+      answer(*Response(), body);
+    });
   }
   if (Response()->GetHttpdRestart()) {
     Response()->SetCallbackFunc(RestartHttpd, nullptr);

@@ -3,6 +3,7 @@
 #include <dlfcn.h>
 
 #include "tests/support/CgiFixture.h"
+#include "webapi/entry/output/BrokenPipe.h"
 #include "webapi/entry/output/HeaderLines.h"
 
 namespace {
@@ -179,7 +180,7 @@ TEST_F(Output, BodyIsFlushed) {
   close(fd);
 }
 
-TEST_F(Output, BodyThatCannotBeWrittenIsPurgedSoThatNoLaterFlushSendsIt) {
+TEST_F(Output, WhatAMethodPrintedAndCannotBeWrittenIsPurgedSoThatNoLaterFlushSendsIt) {
   entry_.Response()->SetSuccess(Json::Value("lost"));
   const int full = open("/dev/full", O_WRONLY | O_CLOEXEC);
   const int later = memfd_create("later", MFD_CLOEXEC);
@@ -187,6 +188,7 @@ TEST_F(Output, BodyThatCannotBeWrittenIsPurgedSoThatNoLaterFlushSendsIt) {
   purged = nullptr;
   {
     const Redirection output(STDOUT_FILENO, full);
+    printf("lost");
     entry_.OutputBody();
   }
   {
@@ -195,9 +197,24 @@ TEST_F(Output, BodyThatCannotBeWrittenIsPurgedSoThatNoLaterFlushSendsIt) {
   }
   clearerr(stdout);
   EXPECT_EQ(purged, stdout);
+  EXPECT_EQ(SyslogCapture::Count("cannot write the answer ["), 1);
   EXPECT_EQ(lseek(later, 0, SEEK_END), 0);
   close(full);
   close(later);
+}
+
+TEST_F(Output, ClientThatIsGoneIsNotLogged) {
+  int ends[2];
+  ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);
+  close(ends[0]);
+  {
+    const BrokenPipe tolerated;
+    const Redirection output(STDOUT_FILENO, ends[1]);
+    entry_.OutputHeader();
+    entry_.OutputBody();
+  }
+  close(ends[1]);
+  EXPECT_TRUE(SyslogCapture::Messages().empty());
 }
 
 TEST_F(Output, BodyThatWasWrittenIsNotPurged) {
