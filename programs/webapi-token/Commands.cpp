@@ -12,6 +12,7 @@
 #include "platform/base/Paths.h"
 #include "platform/tokens/module/TokenStore.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/DescriptionFile.h"
 #include "webapi/base/Number.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -72,22 +73,15 @@ std::string databaseError(const TokenStore& store) {
          (lacksRights(store) ? "; root's rights are needed" : "");
 }
 
-/// Whether calls find a description of this API: in the file that is named after it, else after
-/// what stands before its last dots.
+/// Whether calls find a description of this API.
 bool isDescribed(const std::string& api) {
-  if (api.find('/') != std::string::npos) {
-    return false;
-  }
-  for (size_t end = api.size(); end != std::string::npos && end > 0;
-       end = api.find_last_of('.', end - 1)) {
-    const std::string file = Paths::kDescriptionDir + api.substr(0, end) + ".lib";
-    if (QLIBCFileExist(file.c_str()) == 1) {
-      Json::Value descriptions;
-      return WebAPIUtil::ReadJsonFile(file, descriptions) &&
-             JsonHelper::hasMember(descriptions, api);
-    }
-  }
-  return false;
+  const std::string directory = Paths::kDescriptionDir;
+  const std::string file = DescriptionFile(api, [&](const std::string& name) {
+    return QLIBCFileExist((directory + name).c_str()) == 1;
+  });
+  Json::Value descriptions;
+  return !file.empty() && WebAPIUtil::ReadJsonFile(directory + file, descriptions) &&
+         JsonHelper::hasMember(descriptions, api);
 }
 
 std::string timeText(int64_t seconds) {

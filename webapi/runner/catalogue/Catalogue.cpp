@@ -9,6 +9,7 @@
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
+#include "webapi/base/DescriptionFile.h"
 #include "webapi/base/Log.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -17,34 +18,10 @@ namespace QELO {
 namespace {
 
 constexpr int kMaxPriority = 10;
-constexpr int kMaxCandidates = 4;
-
-/// API names become file names, and clients choose them: nothing that leads out of the directory,
-/// and nothing that ends a path before its suffix.
-bool isFileName(const std::string& api) {
-  return api.find_first_of(std::string_view("/\0", 2)) == std::string::npos;
-}
 
 /// Whether members can be put into a value; the JSON library throws where they cannot.
 bool takesMembers(const Json::Value& value) {
   return value.isObject() || value.isNull();
-}
-
-/// The description file of an API: of QELO.A.lib, QELO.A.B.lib, ... the longest that exists.
-std::string descriptionFile(const std::string& api) {
-  std::string found;
-  size_t dot = api.find('.');
-  for (int candidate = 0; candidate < kMaxCandidates; ++candidate) {
-    dot = dot == std::string::npos ? dot : api.find('.', dot + 1);
-    const std::string file = api.substr(0, dot) + ".lib";
-    if (QLIBCFileExist(file.c_str()) == 1) {
-      found = file;
-    }
-    if (dot == std::string::npos) {
-      break;
-    }
-  }
-  return found;
 }
 
 /// Whether a version's entries list the method, as a plain string or as a member of an object.
@@ -124,7 +101,8 @@ bool Catalogue::InitLibDesc(Json::Value& target, const std::string& api) const {
   if (JsonHelper::hasMember(target, api)) {
     return true;
   }
-  const std::string path = isFileName(api) ? descriptionFile(api) : "";
+  const std::string path = DescriptionFile(
+      api, [](const std::string& file) { return QLIBCFileExist(file.c_str()) == 1; });
   if (path.empty()) {
     WEBAPI_LOG("APIRunner.cpp", "WebAPI %s is not valid", LogText(api).c_str());
     return false;

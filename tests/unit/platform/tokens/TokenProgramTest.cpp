@@ -120,6 +120,20 @@ TEST_F(TokenProgram, CreateForAnApiWithoutDescriptionWarns) {
   }
 }
 
+TEST_F(TokenProgram, CreateLooksForTheDescriptionWhereCallsDo) {
+  Write("usr/qelo/qeloman/webapi/Q.lib", R"({"Q.A": {}, "Q.A.B": {}})");
+  Write("usr/qelo/qeloman/webapi/Q.A.B.C.D.E.lib", R"({"Q.A.B.C.D.E": {}})");
+  for (const char* api : {"Q.A", "Q.A.B", "Q.A.B.C.D.E"}) {
+    EXPECT_EQ(Run({"create", "--user", "alice", "--api", api}), 0);
+    EXPECT_EQ(messages_.find("webapi-token: there is no API "), 0U) << api << ": " << messages_;
+  }
+  Write("usr/qelo/qeloman/webapi/Q.A.lib", R"({"Q.A": {}, "Q.A.B": {}, "Q.A.B.C.D.E": {}})");
+  for (const char* api : {"Q.A", "Q.A.B", "Q.A.B.C.D.E"}) {
+    EXPECT_EQ(Run({"create", "--user", "alice", "--api", api}), 0);
+    EXPECT_EQ(messages_.find("Token "), 0U) << api << ": " << messages_;
+  }
+}
+
 TEST_F(TokenProgram, CallsWithoutRightsSaySo) {
   EXPECT_EQ(RunWithoutRights({"create", "--user", "alice"}), 1);
   EXPECT_NE(messages_.find("; root's rights are needed\n"), std::string::npos) << messages_;
