@@ -15,8 +15,8 @@ class APIResponse;
 class WEBAPI_API APIAuth {
  public:
   /// Whether the API's "allowUser" (its description's, not a method's) names the class of `user`,
-  /// an administrator when the request's caller is one.
-  /// Refused when the list is missing or empty, or `user` is null or empty.
+  /// who counts as an administrator when the request's caller is one.
+  /// @return false also when the list is missing or empty, or `user` is null or empty
   static bool CheckAllowUser(APIRequest* request, const char* user);
 
   /// Checks a login session, the user class and the application privilege, for a program that was
@@ -32,7 +32,8 @@ class WEBAPI_API APIAuth {
   static bool CheckPermission(APIRequest* request, APIResponse* response, const char* session,
                               bool allowTimeout);
 
-  /// Counts now as the last use of the request's session. @return false when there is none
+  /// Counts now as the last use of the request's session, so that its idle limit begins anew.
+  /// @return false when there is none, or it has timed out, which nothing revives
   static bool UpdateTimeout(APIRequest* request);
 
   /// "admin." or "normal.", followed by "domain" for a name with a backslash, "ldap" for one with

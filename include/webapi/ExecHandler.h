@@ -30,14 +30,22 @@ class WEBAPI_API ExecHandler {
   int GetOutputError() const { return outputError_; }
 
   /// The steps of Process().
-  /// @return false, with the result set, when the call lacks something
+  ///
+  /// @return false, with the result set (101), when the call lacks API, method or user
   bool CheckParams();
+  /// Builds the request that Run() makes: the call's parameters as those of a POST, in a session of
+  /// its user that is authorised.
   void PrepareReq();
+  /// Makes the call in this process, and keeps its answer as the result.
   /// @param inChild  the process is a child made for the call, so nothing is given back. Else the
   ///                 variables USERNAME and QELO_WEBAPI_USERNAME get the former value of the
   ///                 latter when it had one, and otherwise keep the call's user.
   void Run(bool inChild);
+  /// Makes the call in a child and waits for its answer; 117 when none comes.
   void RunFork();
+  /// As RunFork(), and writes what the method prints behind its header lines to the call's
+  /// descriptor, while the child runs. Header lines that do not end within the first 4095 bytes
+  /// take all of the output with them. A descriptor that takes no more loses the rest (logged).
   void RunForkForStdout();
 
  private:

@@ -25,9 +25,11 @@ class WEBAPI_API ExecParam {
   ExecParam& operator=(const ExecParam& other);
   virtual ~ExecParam();
 
+  /// The call. API, method and user have to be set before it is made.
   ExecParam& SetAPI(const std::string& api);
   ExecParam& SetVersion(int version);
   ExecParam& SetMethod(const std::string& method);
+  /// The method's parameters. "api", "version" and "method" among them name the call, too.
   ExecParam& SetParams(const Json::Value& params);
   /// CGI variables; those that are no strings are ignored by the request.
   ExecParam& SetEnv(const Json::Value& env);
@@ -39,6 +41,7 @@ class WEBAPI_API ExecParam {
   ///            stays the caller. Below 0: none.
   ExecParam& SetOutputFd(int fd);
 
+  /// What was set; "" or an empty object when nothing was.
   std::string GetAPI() const;
   int GetVersion() const;  ///< 0 when not set
   std::string GetMethod() const;

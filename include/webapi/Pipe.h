@@ -27,18 +27,20 @@ class WEBAPI_API Pipe {
   /// whatever its writer is allowed to do later.
   static constexpr int kPrivilegedRoom = 16 << 20;
 
+  /// Not open: Init() opens it, before the fork.
   Pipe();
   Pipe(const Pipe&) = delete;
   Pipe& operator=(const Pipe&) = delete;
   /// Closes both ends.
   virtual ~Pipe();
 
-  /// Opens both ends.
+  /// Opens both ends, close-on-exec. A pipe that was open before is closed.
   /// @return false, and the ends as they were, on failure
   bool Init();
   /// As Init(), for any output rather than for messages: always a pipe, of the ordinary size.
   bool InitStream();
-  /// Keeps the read end alone. @param fd  0 or more: descriptor to put it on as well
+  /// Keeps the read end alone. @param fd  0 or more: descriptor to put it on as well, which is left
+  ///        to programs that are started
   void ReadOnly(int fd);
   /// Keeps the write end alone. @param fd  0 or more: descriptor to put it on as well
   void WriteOnly(int fd);

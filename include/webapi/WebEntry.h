@@ -27,37 +27,69 @@ class WEBAPI_API WebEntry : public APIRunner {
   WebEntry();
   ~WebEntry() override;
 
-  /// Serves the request; the argument is not consulted.
+  /// Serves the request: intake, call, output, callbacks. The argument is not consulted. An
+  /// exception on the way to the answer is logged and answered with 117.
   /// @return whether callbacks were started. What became of the request is in the answer.
   bool Run(const Json::Value& param) override;
+  /// Takes the request in: CGI environment, query and body, and credentials among the parameters,
+  /// which replace those of cookies and headers. The argument is not consulted.
+  /// @return false with error 101 when the query or the body cannot be read, or 117 (for an access
+  ///         token no error) when credentials cannot be put into the environment
   bool Initialize(const Json::Value& param) override;
+  /// Refuses every sharing link, with error 126: they are not served yet.
   bool CheckSharingPermission(APIRequest* request, APIResponse* response) override;
+  /// Whether the API's "authLevel" asks for a check: all but 0 do, a missing one too.
   bool NeedPermission(APIRequest* request) override;
+  /// Checks who calls (session, else access token), the user class, then the application
+  /// privilege. The caller found is the session of `request` from then on; one that was refused
+  /// leaves an inner request without a user.
+  /// @return false with 105, 106, 119, 150 or 160 set, and for all but the class and the privilege
+  ///         a server error; with null arguments without
   bool CheckPermission(APIRequest* request, APIResponse* response) override;
+  /// Passes the upload of a method with "deferUpload", which reads it itself. Others are not served
+  /// yet: false with error 108 and {"upload_err": -9}.
   bool HandleUpload(APIRequest* request, APIResponse* response) override;
+  /// Whether the method runs in spite of what the check found: "authLevel" 2.
   bool SkipPermission(APIRequest* request) override;
 
  protected:
   /// Authenticates the caller of the process's own request and fills its session.
   /// @param allowTimeout  whether a timed-out session is accepted
-  /// @return 0, or the web-API error code. Asked once per process and allowance.
+  /// @return 0, or the web-API error code: 105, 106, 119 or 150. Asked once for each of the two
+  ///         allowances and kept for the life of the process.
   int CheckPermission(bool allowTimeout);
 
   /// Parameter intake. Each fills one JSON object with names and values.
   /// @return false when the input cannot be read; `params` or `section` then holds what had been
-  ///         read so far.
+  ///         read so far. Initialize() answers 101 then.
+  ///
+  /// Query and body, as the members "getParam" and "postParam" of `params`. The body is read for
+  /// POST alone, and not when an upload's query names the whole call: then it is the method's.
   bool InitParam(Json::Value& params);
+  /// The query. One that is no text cannot be read.
   bool InitGetParam(Json::Value& section);
+  /// The body, as a parameter line whatever its type. It has to announce its length, hold 16 MiB at
+  /// most and not be empty; standard input leads to
+  /// /dev/null afterwards. What is sent too slowly is taken
+  /// as far as it came.
   bool InitPostParam(Json::Value& section);
+  /// The call of an upload whose query does not name it. Not served yet: false.
   bool LoadUploadAPIDesc(Json::Value& section);
+  /// A parameter line, "a=1&b=2", up to its first NUL: deciphered when it is enciphered, then the
+  /// two envelopes of enciphered parameters opened. An inner one that cannot be is left out.
   bool DetectAndDecryptParamLine(const std::string& line, Json::Value& section);
+  /// Opens an envelope of the platform's own cipher, and an AES one within it, into `section`.
   bool DecryptParam(const std::string& text, Json::Value& section);
+  /// Opens the section's AES envelope, whose members are gone afterwards; true when it has none.
   bool DecryptAESParam(Json::Value& section);
 
-  /// Print the response to standard output, whatever IsEnableOutput() says.
+  /// Print the response to standard output, whatever IsEnableOutput() says: header lines, cookies
+  /// and those that go with every answer; then the body as JSON, bytes that are no UTF-8 replaced.
+  /// A client that is gone is no failure.
   void OutputHeader();
   void OutputBody();
-  /// Forwards the request to the host that its parameter "relay_zt" names.
+  /// Forwards the request to the host that its parameter "relay_zt" names. Not served yet: false
+  /// with error 109.
   /// @return whether the other host's answer was printed; else the response has the error
   bool ProcessRelay(APIRequest* request, APIResponse* response);
 
@@ -72,7 +104,8 @@ class WEBAPI_API WebEntry : public APIRunner {
   Json::Value permission_;  ///< "permResult": authorisation results, by CheckPermission(bool)
 };
 
-/// After-output callback that restarts the web server; the argument is not used.
+/// After-output callback that restarts the web server; the argument is not used. Throws when the
+/// settings do not name the server's process; one that cannot be signalled is logged.
 WEBAPI_API void RestartHttpd(void* unused);
 
 }  // namespace QELO
