@@ -1,8 +1,21 @@
 # shellcheck shell=bash
 # Configuring and building a tree; for scripts to source.
 
+# show_progress: shows how much is built in one line of the terminal, from the build's own output,
+# and takes the line away at the end. Without a terminal nothing.
+show_progress() {
+  local line shown=
+  while IFS= read -r line; do
+    if [[ -t 2 && $line =~ ^\[\ *([0-9]+)%\] && ${BASH_REMATCH[1]} != "$shown" ]]; then
+      shown=${BASH_REMATCH[1]}
+      printf '\rBuilding: %3d %%' "$shown" >&2
+    fi
+  done
+  [[ -z $shown ]] || printf '\r\033[K' >&2
+}
+
 # build_tree DIR [CMAKE-OPTION...]: builds into DIR with DIR/root as the private root. Quiet unless
-# something is built or fails.
+# it fails, but for the progress on a terminal.
 build_tree() {
   local dir=$1
   shift
@@ -14,7 +27,9 @@ build_tree() {
     cat "$dir/configure.log" >&2
     return 1
   fi
-  if ! cmake --build "$dir" -j "$(nproc)" > "$dir/build.log" 2>&1; then
+  # Not in the background, where Ctrl-C would not reach it.
+  if ! (set -o pipefail
+        cmake --build "$dir" -j "$(nproc)" 2>&1 | tee "$dir/build.log" | show_progress); then
     grep -E 'error|Error|undefined' -A 3 "$dir/build.log" | head -n 60 >&2
     echo "The build failed; the whole log is $dir/build.log" >&2
     return 1
