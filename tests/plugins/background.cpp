@@ -1,5 +1,8 @@
-// A well-behaved library whose method goes on in the background, as its parameters ask. One
-// function serves several methods, which their description gives different credentials.
+// A method that goes on in the background, as its parameters ask: results, a crash, an exception, a
+// fork of its own. One function serves several methods, which their description gives different
+// credentials.
+//
+// Tests: test_task_start.py, QELO.Test.Background.lib
 
 #include <signal.h>
 #include <unistd.h>

@@ -1,4 +1,7 @@
-// The characteristics of this library are: its method ends the process by a signal.
+// Dies of a signal within its method, and the process with it: nobody but the web server can answer
+// the client any more.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include <csignal>
 

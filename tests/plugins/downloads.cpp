@@ -1,5 +1,7 @@
-// A well-behaved library whose methods print an answer of their own: header lines, an empty line
-// and a body.
+// Prints answers of its own, as downloads do: header lines, an empty line and a body. What a caller
+// with an output descriptor gets is the body alone.
+//
+// Tests: OutputTest.cpp, exec_program.py
 
 #include <unistd.h>
 

@@ -1,5 +1,7 @@
-// A well-behaved library whose methods are the entries of compound requests. Version 1 and 2 are
-// the same, so that a description can give them different attributes.
+// Well-behaved methods for compound requests to call. Versions 1 and 2 are the same, so that a
+// description can give them different attributes.
+//
+// Tests: CompoundHandlerTest.cpp, test_compound.py
 
 #include <fcntl.h>
 #include <unistd.h>

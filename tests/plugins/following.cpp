@@ -1,5 +1,7 @@
-// A well-behaved library whose task is led by the test that watches it: it sets the results that
-// its parameters list, and before each but the first waits for a file that the test makes.
+// A background task that the test leads while it watches: it sets the results that its parameters
+// list, and before each but the first waits for a file that the test makes.
+//
+// Tests: exec_follow.py
 
 #include <unistd.h>
 #include <webapi/APIPolling.h>

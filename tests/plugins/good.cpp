@@ -1,4 +1,6 @@
-// A well-behaved library: a method for each kind of answer.
+// Nothing is wrong with it: a method for each kind of answer.
+//
+// Tests: LifecycleTest.cpp, test_faulty_libraries.py
 
 #include "PluginTable.h"
 

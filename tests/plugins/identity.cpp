@@ -1,5 +1,7 @@
-// A well-behaved library that answers who the caller is and who the process is during the call.
-// One function serves several methods, which their description gives different attributes.
+// Well-behaved; answers who the caller is and who the process is during the call. One function
+// serves several methods, which their description gives different attributes.
+//
+// Tests: test_credentials.py, QELO.Test.Identity.lib
 
 #include <grp.h>
 #include <unistd.h>

@@ -1,5 +1,7 @@
-// The characteristics of this library are: it answers at once and leaves work for later, which
-// takes one second and then leaves a mark in the file that the parameter "mark" names.
+// Leaves work for after the answer: a second later a callback marks the file that the parameter
+// "mark" names. The client must not wait for it.
+//
+// Tests: test_callbacks.py
 
 #include <unistd.h>
 

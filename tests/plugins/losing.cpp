@@ -1,5 +1,7 @@
-// The characteristics of this library are: its methods lose the answer of the child process that
-// they run in, each in another way.
+// A child process that runs one of these methods gives no answer: killed, ended, hung up, or one
+// that is cut short or none at all. Each method loses it in another way.
+//
+// Tests: test_compound.py, exec_program.py
 
 #include <fcntl.h>
 #include <sys/stat.h>

@@ -1,5 +1,7 @@
-// The characteristics of this library are: its methods put the parameter "value" where a record has
-// something of another type.
+// Overwrites its request's or response's record in place: the parameter "value" stands afterwards
+// where the record has something of another type.
+//
+// Tests: RecordTest.cpp
 
 #include "PluginTable.h"
 

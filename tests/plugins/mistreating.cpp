@@ -1,5 +1,7 @@
-// The characteristics of this library are: its method leaves the standard streams and descriptors
-// of the process in a state in which nobody finds them, in the way that the parameter "how" names.
+// Spoils the standard streams and descriptors of its process, which has an answer to print after it,
+// in the way that the parameter "how" names.
+//
+// Tests: MistreatedStreamsTest.cpp, test_faulty_libraries.py
 
 #include <fcntl.h>
 #include <unistd.h>

@@ -1,5 +1,7 @@
-// The characteristics of this library are: it prints to standard output, in every way there is:
-// when it is loaded, in its method and when it is closed.
+// Prints to standard output, where the answer goes, in every way there is: while it is loaded, in
+// its method and when it is closed.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include <unistd.h>
 

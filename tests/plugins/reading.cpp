@@ -1,5 +1,7 @@
-// The characteristics of this library are: it reads standard input, in every way there is, and
-// answers what it got.
+// Reads standard input, where the request's body may still wait, in every way there is, and answers
+// what it got.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include <unistd.h>
 

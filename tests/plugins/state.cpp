@@ -1,4 +1,6 @@
-// A well-behaved library that answers what the process looks like during the call, or nothing.
+// Well-behaved; answers what the process looks like during the call, or nothing at all.
+//
+// Tests: ExecutionTest.cpp, CredentialSwitchTest.cpp
 
 #include <sys/resource.h>
 #include <unistd.h>

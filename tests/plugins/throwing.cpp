@@ -1,5 +1,7 @@
-// The characteristics of this library are: its methods let exceptions escape, after they have set
-// a success.
+// Lets exceptions escape from its methods, a standard one and one of no known type, after it has
+// set a success.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include <stdexcept>
 

@@ -1,5 +1,7 @@
-// The characteristics of this library are: a static object of it throws while the library is
-// loaded.
+// Throws from a static object's constructor, while the loader has it in hand and nothing can be
+// unwound: the process ends without an answer.
+//
+// Tests: CheckTableTest.cpp, test_faulty_libraries.py
 
 #include <stdexcept>
 

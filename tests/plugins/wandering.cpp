@@ -1,5 +1,7 @@
-// The characteristics of this library are: it leaves the process changed: another working
-// directory and another buffer behind the C++ output stream.
+// Leaves the process changed behind it: another working directory, and no buffer behind the C++
+// output stream.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include <unistd.h>
 

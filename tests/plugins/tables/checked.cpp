@@ -1,5 +1,6 @@
-// The characteristics of this library are: a check function refuses "run" in version 1, lets it
-// pass in version 2 and throws in version 3.
+// Its check function refuses "run" in version 1, lets it pass in version 2 and throws in version 3.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include <stdexcept>
 

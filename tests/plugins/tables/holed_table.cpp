@@ -1,5 +1,6 @@
-// The characteristics of this library are: its table has an entry without a method name and one
-// without a function.
+// Holes in the method table: one entry has no method name, one no function.
+//
+// Tests: HardeningTest.cpp
 
 #include "PluginTable.h"
 

@@ -1,4 +1,6 @@
-// The characteristics of this library are: it loads, but exports no method table.
+// Loads, but has no GetAPITable().
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include "PluginTable.h"
 

@@ -1,4 +1,6 @@
-// The characteristics of this library are: its methods work, its check table is null.
+// Has methods that work, and a GetAPICheckTable() that gives null.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include "PluginTable.h"
 

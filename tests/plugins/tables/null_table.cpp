@@ -1,4 +1,6 @@
-// The characteristics of this library are: its method table is null.
+// GetAPITable() gives null.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include "PluginTable.h"
 

@@ -1,7 +1,9 @@
-// The characteristics of this library are: its check table has, for "run", an entry without a
-// function (version 1), two entries of which the first passes (version 2) and entries that differ
-// from the call in one thing each (version 3); the terminating entry has a function, which refuses
-// calls that have the parameter "refuse".
+// A check table that is easily searched wrongly. For "run" it has an entry without a function
+// (version 1), two entries of which the first passes (version 2) and entries that differ from the
+// call in one thing each (version 3); its terminating entry has a function, which refuses calls
+// that have the parameter "refuse".
+//
+// Tests: CheckTableTest.cpp
 
 #include "PluginTable.h"
 

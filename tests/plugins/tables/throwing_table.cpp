@@ -1,4 +1,6 @@
-// The characteristics of this library are: asked for its method table, it throws.
+// Throws when it is asked for its method table.
+//
+// Tests: ExecutionTest.cpp, test_faulty_libraries.py
 
 #include <stdexcept>
 
