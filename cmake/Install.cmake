@@ -45,6 +45,6 @@ get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
 install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
 
 # The documents stand to each other as in the source tree, so their links work.
-install(FILES README.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
+install(FILES README.md DEVELOPING.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
 install(FILES packaging/lighttpd.conf.in DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)

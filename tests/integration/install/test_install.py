@@ -30,6 +30,7 @@ target_link_options(outside PRIVATE -Wl,--no-undefined)
 """
 
 GUIDE = (SOURCE / "docs" / "installing.md").read_text()
+PROJECT_GUIDE = (SOURCE / "docs" / "api-library.md").read_text()
 # Nothing that the guide does reaches the host: each directory is laid over with an empty one.
 OVERLAYS = """
 set -e
@@ -193,14 +194,30 @@ def test_InstalledEntry_ServesAnApiLibraryBuiltOutside(stage, prefix, outside):
     assert answer_of(result.stdout)["data"]["x"] == 5
 
 
-def step(name):
-    found = re.search(rf"<!-- test: {name} -->\n *```\w*\n(.*?)```", GUIDE, re.DOTALL)
+def step(name, guide=GUIDE):
+    found = re.search(rf"<!-- test: {name} -->\n *```\w*\n(.*?)```", guide, re.DOTALL)
     return textwrap.dedent(found[1]).replace("build/host", str(BUILD / "host"))
 
 
+@pytest.fixture
+def project(tmp_path):
+    """The guide's project of an API library outside of this tree."""
+    directory = tmp_path / "visits"
+    directory.mkdir()
+    (directory / "CMakeLists.txt").write_text(step("project", PROJECT_GUIDE))
+    (directory / "QELO.Example.Visits.lib.in").write_text(step("description", PROJECT_GUIDE))
+    (directory / "Visits.cpp").write_text(step("library", PROJECT_GUIDE))
+    return directory
+
+
+def as_tina(text, port):
+    text = text.replace("127.0.0.1/", f"127.0.0.1:{port}/")
+    return text.replace("NAME", "tina").replace("PASSWORD", "one 2 three")
+
+
 @needs_root
-def test_InstallingGuide_EndsWithALogin(stage, tmp_path):
-    """Its commands as they stand, by accounts of the host and PAM, the program set-user-id."""
+def test_Guides_EndWithALogin_AndCallsOfAnApiOfOnesOwn(stage, tmp_path, project):
+    """Their commands as they stand, by accounts of the host and PAM, the program set-user-id."""
     work = tmp_path / "work"
     work.mkdir()
     overlays = OVERLAYS.format(work=work)
@@ -208,14 +225,13 @@ def test_InstallingGuide_EndsWithALogin(stage, tmp_path):
         pytest.skip("files cannot be laid over the host's here: no overlay mount")
     port = free_port()
     configuration = step("lighttpd").replace("server.port = 80", f"server.port = {port}")
-    call = step("call").replace("127.0.0.1/", f"127.0.0.1:{port}/")
-    call = call.replace("NAME", "tina").replace("PASSWORD", "one 2 three")
     script = "\n".join([
         overlays,
         "{",
         "{ userdel -f tina; userdel -f system; groupdel administrators; } 2> /dev/null || true",
-        "useradd --no-create-home tina && echo 'tina:one 2 three' | chpasswd",
+        "useradd --create-home --home-dir /var/tina tina && echo 'tina:one 2 three' | chpasswd",
         step("accounts"), step("install"), step("pam"), step("rights"),
+        f"cd {project}", step("build", PROJECT_GUIDE),
         "mkdir -p /var/www/html /var/log/lighttpd /var/cache/lighttpd/uploads",
         "chown -R www-data: /var/log/lighttpd /var/cache/lighttpd",
         f"cat > /etc/lighttpd/lighttpd.conf << 'END'\n{configuration}END",
@@ -224,7 +240,13 @@ def test_InstallingGuide_EndsWithALogin(stage, tmp_path):
         "trap 'kill $server' EXIT",
         f"for i in $(seq 100); do (: > /dev/tcp/127.0.0.1/{port}) 2> /dev/null && break",
         "  sleep 0.05; done",
-        call,
+        as_tina(step("call"), port),
+        as_tina(step("call", PROJECT_GUIDE), port),
+        as_tina(step("call", PROJECT_GUIDE), port),
+        "stat -c '%U %a' /var/tina/.webapi /var/tina/.webapi/visits.json",
     ])
-    answer = json.loads(run("unshare", "-m", "bash", "-c", script, cwd=tmp_path))
-    assert answer["data"]["user"] == "tina"
+    lines = run("unshare", "-m", "bash", "-c", script, cwd=SOURCE).splitlines()
+    login, first, second = map(json.loads, lines[:3])
+    assert login["data"]["user"] == "tina"
+    assert (first["data"], second["data"]) == ({"visits": 1}, {"visits": 2})
+    assert lines[3:] == ["tina 700", "tina 600"]
