@@ -69,9 +69,8 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// The query. One that is no text cannot be read.
   bool InitGetParam(Json::Value& section);
   /// The body, as a parameter line whatever its type. It has to announce its length, hold 16 MiB at
-  /// most and not be empty; standard input leads to
-  /// /dev/null afterwards. What is sent too slowly is taken
-  /// as far as it came.
+  /// most and not be empty; standard input leads to /dev/null afterwards. What is sent too slowly
+  /// is taken as far as it came.
   bool InitPostParam(Json::Value& section);
   /// The call of an upload whose query does not name it. Not served yet: false.
   bool LoadUploadAPIDesc(Json::Value& section);

@@ -1,5 +1,5 @@
-// Spoils the standard streams and descriptors of its process, which has an answer to print after it,
-// in the way that the parameter "how" names.
+// Spoils the standard streams and descriptors of its process, which has an answer to print after
+// it, in the way that the parameter "how" names.
 //
 // Tests: MistreatedStreamsTest.cpp, test_faulty_libraries.py
 
