@@ -15,12 +15,13 @@ bool dieBeforeRename = false;
 }  // namespace
 
 // Takes the place of the C library's for the whole test program.
-extern "C" __attribute__((visibility("default"))) int rename(const char* from,
-                                                             const char* to) noexcept {
+extern "C" __attribute__((visibility("default"))) int renameat(int fromDirectory, const char* from,
+                                                               int toDirectory,
+                                                               const char* to) noexcept {
   if (dieBeforeRename) {
     raise(SIGKILL);
   }
-  return static_cast<int>(syscall(SYS_renameat, AT_FDCWD, from, AT_FDCWD, to));
+  return static_cast<int>(syscall(SYS_renameat, fromDirectory, from, toDirectory, to));
 }
 
 namespace QELO {
