@@ -30,6 +30,11 @@ struct FakePlatform {
   int timeoutSetting = 900;
   std::function<int(const std::string&, const std::string&)> setKeyValue;  ///< unset: 0
 
+  // Names and addresses of the network: what each check answers.
+  int hostname = 0;
+  int domain = 0;
+  int addressType = 0;
+
   // CGI library. A context that QeloCgiInit started has the language "enu", no session and no
   // options until it takes the cookies; any other has what stands here.
   std::string language = "enu";

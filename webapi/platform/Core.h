@@ -18,6 +18,8 @@ WEBAPI_API int QLIBCFileTouch(const char* path);
 /// @return 0 or more on success; a negative value when it was not to be had
 WEBAPI_API int QLIBCFileLockTimeByFile(const char* path, int type, int seconds, int* fd);
 WEBAPI_API int QLIBCFileUnlockByFile(int fd);
+/// Makes the ASCII letters of a text small, in place; other bytes stay.
+WEBAPI_API void QLIBCStrCaseLower(char* text);
 /// Whether a file of `key="value"` lines gives `key` this value. @return 1 yes, 0 no
 WEBAPI_API int QLIBCFileCheckKeyValue(const char* file, const char* key, const char* value,
                                       int ignoreCase);
