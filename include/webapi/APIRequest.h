@@ -177,6 +177,21 @@ class WEBAPI_API APIRequest {
   sharing::record::Session GetSharingSession() const;
   sharing::record::Token GetSharingToken() const;
 
+  /// The client's device, by its user-agent header: classified once, at the first of these
+  /// queries, and kept with the record; without the header all are false. They tell how to present
+  /// something, and nothing that may be relied upon: clients call themselves what they like, an
+  /// iPad of today a desktop computer.
+  bool IsMobile() const;  ///< a mobile device, unless the cookie "forceDesktop" is a number but 0
+  bool IsMobileDevice() const;   ///< a mobile device, whatever the cookie says
+  bool IsIPhone() const;         ///< iOS: an iPhone, iPod or iPad
+  bool IsAndroid() const;        ///< Android, phone or tablet
+  bool IsIEMobile() const;       ///< a mobile device that names "msie" or "iemobile"
+  bool IsIPad() const;           ///< an iPad; IsIPhone() is true too
+  bool IsPlayBook() const;       ///< a PlayBook tablet
+  bool IsBlackBerry6() const;    ///< a BlackBerry whose browser is WebKit
+  bool IsWebKit() const;         ///< WebKit, on whatever device
+  bool IsSupportWebApp() const;  ///< WebKit on iOS, Android, PlayBook or BlackBerry
+
   /// Typed parameters: nothing is converted, so the client's type must be the one asked for.
   /// @param validator  says whether a value of the right type will do; null: every one does.
   ///                   It is not asked about null, which is accepted as "reset".

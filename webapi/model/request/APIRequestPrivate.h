@@ -37,6 +37,8 @@ class APIRequestPrivate : public APIBase {
   void InitSharing();
   void InitURL();
   void InitSharingURL();
+  /// Classifies the client by its user-agent header, once; without the header no flag is stored.
+  void InitUA();
 
   /// Undoes both envelopes of enciphered parameters in place, down through "webapi".
   /// @return false when one cannot be deciphered; its members are gone all the same
@@ -53,6 +55,8 @@ class APIRequestPrivate : public APIBase {
   bool IsSliceUploadRequest() const;
   std::string GetCookie(const std::string& name, const std::string& def) const;
   int GetURLPort(int def);
+  /// A flag of "userAgent".
+  bool Device(const char* flag);
 
   /// A key's text or integer; `def` when it is missing or cannot be read as one.
   std::string Text(std::string_view section, std::string_view key,
