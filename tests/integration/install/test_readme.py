@@ -11,6 +11,7 @@ from documents import broken_links
 
 README = (SOURCE / "README.md").read_text()
 DESCRIPTION = (SOURCE / "docs" / "description.md").read_text()
+PARAMETERS = (SOURCE / "docs" / "parameters.md").read_text()
 PORT = "127.0.0.1:8080"
 
 
@@ -97,6 +98,38 @@ def test_Download_IsBuiltAndSendsTheFile(server, alice, tmp_path):
     finally:
         for name in ("Download.so", "QELO.Hello.Download.lib"):
             (DESCRIPTIONS / name).unlink(missing_ok=True)
+
+
+def test_CheckedParameters_AreBuiltAndRefused(client, describe, tmp_path):
+    table = """
+#include <webapi/APIRequest.h>
+#include <webapi/APIResponse.h>
+#include <webapi/APITable.h>
+%s
+extern "C" QELO::_tag_API_TABLE* GetAPITable() {
+  static QELO::_tag_API_TABLE table[] = {{"QELO.Test.Checks", 1, "connect", connect},
+                                         {nullptr, 0, nullptr, nullptr}};
+  return table;
+}
+"""
+    (tmp_path / "Checks.cpp").write_text(table % block("checks", PARAMETERS))
+    run("g++ -std=c++20 -Wall -Wextra -Werror -shared -fPIC -Wl,--no-undefined "
+        f"-I{SOURCE}/include -I/usr/include/jsoncpp Checks.cpp -o Checks.so "
+        f"{next(BUILD.rglob('libwebapi-ARDO5.so'))} -ljsoncpp", tmp_path, 0)
+    describe("QELO.Test.Checks", methods={"1": ["connect"]}, lib=str(tmp_path / "Checks.so"))
+    tmp_path.chmod(0o755)
+
+    def connect(query):
+        return client.get(f"api=QELO.Test.Checks&version=1&method=connect&{query}")
+
+    assert connect("host=nas.example").data == {
+        "target": "nas.example:443", "mode": "pull", "privileged": True}
+    assert connect("host=%222001:db8::1%22&port=8080&mode=push").data == {
+        "target": "2001:db8::1:8080", "mode": "push", "privileged": False}
+    for query in ("", "host=", "host=null", "host=nas_1", "host=10.1", "host=%22nas%5Cu0000x%22",
+                  "host=nas&port=65536", "host=nas&port=%22x%22", "host=nas&mode=both",
+                  "host=nas&mode=null"):
+        assert connect(query).code == 101, query
 
 
 def test_Commands_AndLinks_Exist():
