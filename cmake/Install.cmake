@@ -46,5 +46,6 @@ install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webap
 
 # The documents stand to each other as in the source tree, so their links work.
 install(FILES README.md DEVELOPING.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
-install(FILES packaging/lighttpd.conf.in DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
+install(FILES packaging/lighttpd.conf.in packaging/nginx.conf.in packaging/apache2.conf.in
+        DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)

@@ -1,12 +1,14 @@
-"""A real lighttpd in front of entry.cgi."""
+"""Real web servers in front of entry.cgi."""
 
+import os
+import signal
 import socket
 import subprocess
 import time
 from pathlib import Path
 
 SOURCE = Path(__file__).resolve().parents[3]
-TEMPLATE = SOURCE / "packaging" / "lighttpd.conf.in"
+PACKAGING = SOURCE / "packaging"
 
 
 def free_port():
@@ -16,27 +18,37 @@ def free_port():
 
 
 class WebServer:
-    """Serves one entry.cgi from a directory of its own until it is stopped."""
+    """A lighttpd that serves one entry.cgi from a directory of its own until it is stopped."""
+
+    template = "lighttpd.conf.in"
 
     def __init__(self, directory, entry, extra="", pid=None):
         self.directory = Path(directory)
         self.port = free_port()
         for folder in ("www", "uploads"):
             (self.directory / folder).mkdir(parents=True, exist_ok=True)
-        text = TEMPLATE.read_text()
+        text = (PACKAGING / self.template).read_text()
         values = {"DIR": directory, "PORT": self.port, "ENTRY": entry, "PID": pid or f"{directory}/pid"}
         for name, value in values.items():
             text = text.replace(f"@{name}@", str(value))
-        self.configuration = self.directory / "lighttpd.conf"
+        self.entry = entry
+        self.configuration = self.directory / self.template.removesuffix(".in")
         self.configuration.write_text(text + extra)
         self.process = None
+        self.helpers = []
+
+    def command(self):
+        return ["/usr/sbin/lighttpd", "-D", "-f", self.configuration]
+
+    def start_helpers(self, **identity):
+        """Starts what the server needs beside it; gives the processes, each a group's first."""
+        return []
 
     def start(self, *wrapper, **identity):
         """Runs it by a wrapping command, as another user; both optional, as Popen has them."""
+        self.helpers = self.start_helpers(**identity)
         self.process = subprocess.Popen(
-            [*wrapper, "/usr/sbin/lighttpd", "-D", "-f", self.configuration],
-            stdin=subprocess.DEVNULL,
-            **identity,
+            [*wrapper, *self.command()], stdin=subprocess.DEVNULL, **identity
         )
         deadline = time.monotonic() + 10
         while time.monotonic() < deadline:
@@ -53,8 +65,54 @@ class WebServer:
             self.process.terminate()
             self.process.wait(timeout=10)
             self.process = None
+        for helper in self.helpers:
+            os.killpg(helper.pid, signal.SIGTERM)  # fcgiwrap leaves its children behind
+            helper.wait(timeout=10)
+        self.helpers = []
 
     def log(self):
         """All that the server and the programs behind it wrote."""
         files = [self.directory / name for name in ("error.log", "cgi.log", "access.log")]
         return "".join(file.read_text(errors="replace") for file in files if file.exists())
+
+
+class Nginx(WebServer):
+    """nginx, and fcgiwrap with some processes."""
+
+    template = "nginx.conf.in"
+    processes = 4
+
+    def command(self):
+        log = self.directory / "error.log"  # until it has read its configuration
+        return ["/usr/sbin/nginx", "-e", log, "-c", self.configuration, "-g", "daemon off;"]
+
+    def start_helpers(self, **identity):
+        path = self.directory / "fcgiwrap.sock"
+        with open(self.directory / "cgi.log", "ab") as log:
+            helper = subprocess.Popen(
+                ["/usr/sbin/fcgiwrap", "-f", "-c", str(self.processes), "-p", self.entry,
+                 "-s", f"unix:{path}"],
+                stdin=subprocess.DEVNULL, stdout=log, stderr=log, start_new_session=True, **identity,
+            )
+        deadline = time.monotonic() + 10
+        while not path.exists() and time.monotonic() < deadline:
+            time.sleep(0.01)
+        assert path.exists(), self.log()
+        return [helper]
+
+
+class ApacheCgi(WebServer):
+    """Apache with a process a connection."""
+
+    template = "apache2.conf.in"
+    definitions = ()
+
+    def command(self):
+        options = [word for name in self.definitions for word in ("-D", name)]
+        return ["/usr/sbin/apache2", *options, "-D", "FOREGROUND", "-f", self.configuration]
+
+
+class ApacheCgid(ApacheCgi):
+    """Apache with threads."""
+
+    definitions = ("CGID",)
