@@ -111,6 +111,15 @@ def test_Post_ArrivesWhole(client, echo):
     assert client.post(f"{echo}&x={'y' * size}").data["x"] == "y" * size
 
 
+def test_ChunkedPost_HasALengthUnlessItIsApaches(server, client, echo):
+    pieces = [f"{echo}&x=".encode(), b"y" * 100_000]
+    answer = client.post(iter(pieces))
+    if isinstance(server, ApacheCgi):
+        assert answer.code == 101
+    else:
+        assert answer.data["x"] == "y" * 100_000
+
+
 def test_LargeAnswer_ArrivesWhole(client, echo):
     size = 4 << 20
     answer = client.get(f"{echo.replace('echo', 'large')}&size={size}")
