@@ -194,8 +194,8 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
   if (!IsPermitted(request, response)) {
     return false;
   }
-  const Json::Value attributes = rooms_->catalogue.GetAttributes(
-      request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
+  const Json::Value attributes =
+      GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
   const auto isSet = [&attributes](const char* name) {
     return JsonHelper::asBool(JsonHelper::member(attributes, name));
   };

@@ -92,6 +92,20 @@ TEST_F(RequestCheck, UploadNeedsItsAttribute) {
   }
 }
 
+TEST_F(RequestCheck, AttributesThatAreNoObjectAllowNothingWhateverTheDefaults) {
+  WriteLibDef(R"({"methods": {"allowUpload": true}})");
+  Json::Value description = Description("state");
+  description["methods"] = Parse(R"({"1": ["plain", {"odd": "text"}, {"none": null}]})");
+  WriteDescription(description);
+  for (const auto& [method, code] :
+       {std::pair("plain", 0), std::pair("odd", 115), std::pair("none", 115)}) {
+    MakeRequest("QELO.Test.Call", 1, method);
+    request->InitEnv(Parse(R"({"CONTENT_TYPE": "multipart/form-data; boundary=x"})"));
+    TestRunner().CheckRequestParam(request.get(), response.get());
+    EXPECT_EQ(response->GetError(), code) << method;
+  }
+}
+
 class Dispatch : public RunnerTest {};
 
 TEST_F(Dispatch, HooksOfTheBaseAreConstant) {

@@ -32,6 +32,11 @@ void releaseStandardDescriptors() {
   LetGoOf({STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO});
 }
 
+bool transfersFile(const Json::Value& attributes) {
+  return JsonHelper::asBool(JsonHelper::member(attributes, "allowUpload")) ||
+         JsonHelper::asBool(JsonHelper::member(attributes, "allowDownload"));
+}
+
 /// What every child would find out anew: the time zone for its log, the files of accounts.
 void lookAhead(const APIRequest& request) {
   tzset();
@@ -63,8 +68,8 @@ int CompoundHandler::CompoundProcessEntry(const Json::Value& entry, unsigned ind
   if (stopWhenError_ && hasFail_) {
     return RefuseEntry(WEBAPI_ERR_COMPOUND_STOPPED, "compound stop when error.", index);
   }
-  if (runner_->GetMethodAttr(entryRequest_.get(), "allowUpload") ||
-      runner_->GetMethodAttr(entryRequest_.get(), "allowDownload")) {
+  if (transfersFile(runner_->GetMethod(entryRequest_->GetAPIClass(), entryRequest_->GetAPIVersion(),
+                                       entryRequest_->GetAPIMethod()))) {
     return RefuseEntry(WEBAPI_ERR_COMPOUND_TRANSFER, "not allow upload or download API.", index);
   }
   if (parallel_ || (!runner_->GetMethodAttr(entryRequest_.get(), "grantable") &&

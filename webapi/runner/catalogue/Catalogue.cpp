@@ -32,6 +32,10 @@ bool isListed(const Json::Value& entries, const std::string& method) {
          });
 }
 
+bool isSet(const Json::Value& attributes, const char* name) {
+  return JsonHelper::asBool(JsonHelper::member(attributes, name));
+}
+
 }  // namespace
 
 bool Catalogue::CheckLibDescription(const Json::Value& description) {
@@ -144,15 +148,11 @@ const Json::Value& Catalogue::GetMethod(const std::string& api, int version,
   return defaults;
 }
 
-const Json::Value& Catalogue::GetAttributes(const std::string& api, int version,
-                                            const std::string& method) {
-  const Json::Value& attributes = GetMethod(api, version, method);
-  return attributes.isObject() ? attributes : JsonHelper::member(libDef_, "methods");
-}
-
 bool Catalogue::GetMethodAttr(const std::string& api, int version, const std::string& method,
                               const std::string& attribute) {
-  return JsonHelper::asBool(JsonHelper::member(GetAttributes(api, version, method), attribute));
+  const Json::Value& own = GetMethod(api, version, method);
+  const Json::Value& attributes = own.isObject() ? own : JsonHelper::member(libDef_, "methods");
+  return JsonHelper::asBool(JsonHelper::member(attributes, attribute));
 }
 
 int Catalogue::CheckRequestParam(APIRequest& request) {
@@ -173,10 +173,11 @@ int Catalogue::CheckRequestParam(APIRequest& request) {
   if (!isListed(JsonHelper::member(description["methods"], std::to_string(version)), method)) {
     return WEBAPI_ERR_NO_SUCH_METHOD;
   }
-  if (!GetMethodAttr(api, version, method, "allowUpload") && request.IsUploadRequest()) {
+  const Json::Value& attributes = GetMethod(api, version, method);
+  if (!isSet(attributes, "allowUpload") && request.IsUploadRequest()) {
     return WEBAPI_ERR_UPLOAD_REFUSED;
   }
-  if (!GetMethodAttr(api, version, method, "allowDemo") && request.IsDemoMode()) {
+  if (!isSet(attributes, "allowDemo") && request.IsDemoMode()) {
     return WEBAPI_ERR_DEMO_REFUSED;
   }
   return WEBAPI_ERR_NONE;

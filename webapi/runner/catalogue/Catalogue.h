@@ -24,8 +24,6 @@ class Catalogue {
   bool InitLibDesc(Json::Value& target, const std::string& api) const;
   bool AddAPIInfo(APIRequest* request) const;
   const Json::Value& GetMethod(const std::string& api, int version, const std::string& method);
-  /// GetMethod(), or the defaults where a description gives the method no object.
-  const Json::Value& GetAttributes(const std::string& api, int version, const std::string& method);
   bool GetMethodAttr(const std::string& api, int version, const std::string& method,
                      const std::string& attribute);
   /// Whether the request's call is one that can be run.

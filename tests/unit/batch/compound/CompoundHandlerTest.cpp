@@ -187,6 +187,16 @@ TEST_F(Compound, UploadAndDownloadMethodsAre113AndTheOthersRun) {
   }
 }
 
+TEST_F(Compound, DefaultsForbidNoMethodWhoseAttributesAreNoObject) {
+  WriteLibDef(R"({"methods": {"allowDownload": true}})");
+  Json::Value description = Listing("entries", {"echo"}, R"({"1": null})");
+  description["methods"]["1"].append("process");
+  WriteDescription(description, "QELO.Test.Entries");
+  const Json::Value result = RunCompound(List({Entry("echo"), Entry("process")}));
+  EXPECT_EQ(Code(result[0]), 0);
+  EXPECT_EQ(Code(result[1]), 113);  // listed as a text, it has the defaults
+}
+
 TEST_F(Compound, RefusedTransferStopsTheOthers) {
   const Json::Value result = RunCompound(List({Entry("upload"), Entry("echo")}), kStop);
   EXPECT_EQ(Code(result[1]), 112);

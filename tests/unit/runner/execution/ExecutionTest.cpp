@@ -4,6 +4,7 @@
 #include <sys/wait.h>
 #include <syslog.h>
 
+#include <algorithm>
 #include <iostream>
 
 #include "tests/unit/runner/RunnerFixture.h"
@@ -76,6 +77,18 @@ TEST_F(Execution, ExceptionOfAMethodIsLoggedAndAnswers117) {
   EXPECT_EQ(SyslogCapture::Count("method threw an exception: method failed"), 1);
   EXPECT_FALSE(ProcessPlugin("throwing", "{}", 2));
   EXPECT_EQ(response->GetError(), 117);
+}
+
+TEST_F(Execution, AttributesThatAreNoObjectTakeNoDefaults) {
+  WriteLibDef(R"({"methods": {"grantByDefault": true, "runAs": "nobody"}})");
+  for (const char* attributes : {"null", "\"text\"", "[]"}) {
+    platform->calls.clear();
+    ProcessPlugin("state", attributes);
+    EXPECT_EQ(std::count(platform->calls.begin(), platform->calls.end(),
+                         "ResetCredentialsByName(system, drop)"),
+              1)
+        << attributes;
+  }
 }
 
 TEST_F(Execution, CrashEndsItsOwnProcess) {

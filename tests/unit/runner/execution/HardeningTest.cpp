@@ -173,12 +173,6 @@ TEST_F(Hardening, TableEntryWithoutNameIsSkippedAndWithoutFunctionIs121) {
   EXPECT_EQ(response->GetError(), 121);
 }
 
-TEST_F(Hardening, AttributesThatAreNoObjectGiveTheDefaultsThroughout) {
-  WriteLibDef(R"({"methods": {"grantable": true, "runAs": "backup"}})");
-  EXPECT_TRUE(ProcessPlugin("state", "null"));
-  EXPECT_EQ(platform->calls.back(), "ResetCredentialsByName(backup, keep)");
-}
-
 TEST_F(Hardening, BodyThatIsNoObjectIsReplacedInTheAnswer) {
   TestRunner tested;
   tested.Response()->Serialize()["body"] = "text";
