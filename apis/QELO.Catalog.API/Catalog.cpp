@@ -1,6 +1,7 @@
 // QELO.Catalog.API: the APIs, versions and methods that the caller may call.
 
 #include <webapi/APIAuth.h>
+#include <webapi/APIDescription.h>
 #include <webapi/APIRequest.h>
 #include <webapi/APIResponse.h>
 #include <webapi/APIRunner.h>
@@ -12,6 +13,7 @@
 
 namespace {
 
+using QELO::APIDescription;
 using QELO::APIRequest;
 using QELO::APIResponse;
 using QELO::APIRunner;
@@ -59,58 +61,40 @@ class Catalogue {
  private:
   /// Whether nobody is asked who he is, so that "allowUser" means nothing.
   static bool IsForEverybody(const Json::Value& description) {
-    return JsonHelper::member(description, "authLevel") == Json::Value(0);
+    return APIDescription(description).GetAuthLevel() == APIDescription::AUTH_NONE;
   }
 
   Json::Value Versions(const std::string& api, const Json::Value& description) {
-    const int last = JsonHelper::asInt(JsonHelper::member(description, "maxVersion"));
-    const Json::Value& listed = JsonHelper::member(description, "methods");
     Json::Value versions(Json::objectValue);
-    for (auto it = listed.begin(); it != listed.end(); ++it) {
-      const int version = JsonHelper::asInt(it.name());
-      if (version < JsonHelper::asInt(JsonHelper::member(description, "minVersion"), 1) ||
-          version < 1 || version > last || std::to_string(version) != it.name()) {
-        continue;
-      }
-      const Json::Value methods = Methods(api, version, description, *it);
+    for (const int version : APIDescription(description).Versions()) {
+      const Json::Value methods = Methods(api, version, description);
       if (!methods.empty()) {
-        versions[it.name()] = methods;
+        versions[std::to_string(version)] = methods;
       }
     }
     return versions;
   }
 
-  Json::Value Methods(const std::string& api, int version, const Json::Value& description,
-                      const Json::Value& entries) {
+  Json::Value Methods(const std::string& api, int version, const Json::Value& description) {
     Json::Value methods(Json::objectValue);
-    if (!entries.isArray()) {
-      return methods;
-    }
-    for (const Json::Value& entry : entries) {
-      if (entry.isString()) {
-        Add(api, version, description, JsonHelper::asString(entry), methods);
-      } else if (entry.isObject()) {
-        for (auto it = entry.begin(); it != entry.end(); ++it) {
-          Add(api, version, description, it.name(), methods);
-        }
+    for (const std::string& method : APIDescription(description).Methods(version)) {
+      const Json::Value& attributes = runner_.GetMethod(api, version, method);
+      if (QELO::APIAuth::MayCall(request_, description, attributes)) {
+        methods[method] = Shown(attributes, !IsForEverybody(description));
       }
     }
     return methods;
   }
 
-  void Add(const std::string& api, int version, const Json::Value& description,
-           const std::string& method, Json::Value& methods) {
-    const Json::Value& attributes = runner_.GetMethod(api, version, method);
-    if (!QELO::APIAuth::MayCall(request_, description, attributes)) {
-      return;
-    }
-    Json::Value& shown = methods[method] = Json::Value(Json::objectValue);
-    const bool showsUsers = !IsForEverybody(description);
-    for (auto it = attributes.begin(); it != attributes.end(); ++it) {
-      if (it->isBool() || (it.name() == "allowUser" && showsUsers)) {
+  /// What of a method's attributes its callers may know.
+  static Json::Value Shown(const Json::Value& attributes, bool withUsers) {
+    Json::Value shown(Json::objectValue);
+    for (auto it = attributes.begin(); attributes.isObject() && it != attributes.end(); ++it) {
+      if (it->isBool() || (it.name() == "allowUser" && withUsers)) {
         shown[it.name()] = *it;
       }
     }
+    return shown;
   }
 
   const APIRequest& request_;

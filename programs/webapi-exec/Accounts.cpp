@@ -9,6 +9,7 @@
 #include <string_view>
 #include <vector>
 
+#include "webapi/APIDescription.h"
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/platform/Core.h"
@@ -19,7 +20,6 @@ namespace {
 
 constexpr bool kIsHost = sizeof WEBAPI_ROOT_PREFIX == 1;
 constexpr char kPasswd[] = WEBAPI_ROOT_PREFIX "/etc/passwd";
-constexpr char kDefaultRunAs[] = "system";
 constexpr std::string_view kNoLogin = "nologin";
 
 bool mayCallAs(uid_t uid) {
@@ -33,13 +33,9 @@ bool isLogin(std::string_view shell) {
 /// The account that a method without grantByDefault runs as.
 std::string accountOf(const Json::Value& description, const Json::Value& attributes,
                       const std::string& user) {
-  if (JsonHelper::asBool(JsonHelper::member(attributes, "grantByUser"))) {
-    return user;
-  }
-  const Json::Value& own = JsonHelper::member(attributes, "runAs");
-  const std::string name =
-      JsonHelper::asString(own.isNull() ? JsonHelper::member(description, "runAs") : own);
-  return name.empty() ? kDefaultRunAs : name;
+  return APIDescription::IsSet(attributes, "grantByUser")
+             ? user
+             : APIDescription(description).GetRunAs(attributes);
 }
 
 }  // namespace
@@ -64,7 +60,7 @@ std::string missingRights(const std::string& api, int version, const std::string
     return "";
   }
   const Json::Value& attributes = runner.GetMethod(api, version, method);
-  if (JsonHelper::asBool(JsonHelper::member(attributes, "grantByDefault"))) {
+  if (APIDescription::IsSet(attributes, "grantByDefault")) {
     return geteuid() == 0 ? "" : "the method runs as root: call it as root";
   }
   const std::string account = accountOf(JsonHelper::member(found, api), attributes, user);

@@ -4,7 +4,10 @@
 
 #include <cstdio>
 #include <set>
+#include <string>
+#include <vector>
 
+#include "webapi/APIDescription.h"
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/platform/Paths.h"
@@ -12,36 +15,29 @@
 namespace QELO::ExecProgram {
 namespace {
 
-/// The methods of all versions, or of one.
-std::set<std::string> methodsOf(const Json::Value& description, int version) {
+/// The methods of all versions that can be called, or of one.
+std::set<std::string> methodsOf(const APIDescription& description, int version) {
   std::set<std::string> names;
-  const Json::Value& versions = JsonHelper::member(description, "methods");
-  for (const std::string& key : versions.getMemberNames()) {
-    if (!versions[key].isArray() || (version != 0 && key != std::to_string(version))) {
-      continue;
-    }
-    for (const Json::Value& entry : versions[key]) {
-      if (entry.isString()) {
-        names.insert(entry.asString());
-      } else if (entry.isObject()) {
-        const std::vector<std::string> listed = entry.getMemberNames();
-        names.insert(listed.begin(), listed.end());
-      }
+  for (const int known : description.Versions()) {
+    if (version == 0 || version == known) {
+      const std::vector<std::string> listed = description.Methods(known);
+      names.insert(listed.begin(), listed.end());
     }
   }
   return names;
 }
 
 /// @return false, with a message, when the options name a version that the API does not have
-bool checkVersion(const Options& options, const Json::Value& description) {
-  const Json::Value& versions = JsonHelper::member(description, "methods");
-  if (options.version == 0 ||
-      JsonHelper::member(versions, std::to_string(options.version)).isArray()) {
-    return true;
-  }
+bool checkVersion(const Options& options, const APIDescription& description) {
   std::string known;
-  for (const std::string& key : versions.getMemberNames()) {
-    known += (known.empty() ? "" : ", ") + key;
+  for (const int version : description.Versions()) {
+    if (options.version == version) {
+      return true;
+    }
+    known += (known.empty() ? "" : ", ") + std::to_string(version);
+  }
+  if (options.version == 0) {
+    return true;
   }
   fprintf(stderr, "webapi-exec: no such version: %s has %s\n", options.api.c_str(),
           known.empty() ? "none" : known.c_str());
@@ -59,15 +55,16 @@ ExitCode listNames(const Options& options) {
   }
   std::set<std::string> names;
   if (options.api.empty()) {
-    const std::vector<std::string> apis = catalogue.getMemberNames();
-    names.insert(apis.begin(), apis.end());
+    for (auto it = catalogue.begin(); it != catalogue.end(); ++it) {
+      names.insert(it.name());
+    }
   } else if (!JsonHelper::hasMember(catalogue, options.api)) {
     fprintf(stderr, "webapi-exec: there is no API %s\n", options.api.c_str());
     return kFailed;
-  } else if (!checkVersion(options, catalogue[options.api])) {
+  } else if (!checkVersion(options, APIDescription(catalogue[options.api]))) {
     return kFailed;
   } else {
-    names = methodsOf(catalogue[options.api], options.version);
+    names = methodsOf(APIDescription(catalogue[options.api]), options.version);
   }
   for (const std::string& name : names) {
     printf("%s\n", name.c_str());

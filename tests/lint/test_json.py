@@ -20,7 +20,6 @@ GUARD_DISTANCE = 6  # lines
 ALLOWED = {
     "webapi/json/JsonHelper.cpp": "it is the place where types are asked for",
     "webapi/json/Writer.cpp": "it branches on the type of every value that it writes",
-    "programs/webapi-exec/Names.cpp": "the runner loads only objects with an object of methods",
 }
 
 

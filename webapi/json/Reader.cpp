@@ -49,6 +49,9 @@ class Reader {
     return Value(value) && at_ == end_;
   }
 
+  /// How many bytes were not taken.
+  size_t Left() const { return Rest().size(); }
+
  private:
   std::string_view Rest() const { return {at_, static_cast<size_t>(end_ - at_)}; }
 
@@ -311,6 +314,12 @@ class Reader {
 
 bool readJsonText(std::string_view text, bool comments, int maxDepth, Json::Value& value) {
   return Reader(text, comments, maxDepth).Text(value);
+}
+
+size_t jsonTextFault(std::string_view text, bool comments, int maxDepth) {
+  Reader reader(text, comments, maxDepth);
+  Json::Value value;
+  return reader.Text(value) ? std::string_view::npos : text.size() - reader.Left();
 }
 
 }  // namespace QELO::JsonHelper

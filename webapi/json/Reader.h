@@ -2,6 +2,7 @@
 
 #include <json/json.h>
 
+#include <cstddef>
 #include <string_view>
 
 namespace QELO::JsonHelper {
@@ -22,5 +23,9 @@ namespace QELO::JsonHelper {
 /// @return false when the text is none, or holds a number too large for a real, or half of a
 ///         surrogate pair
 bool readJsonText(std::string_view text, bool comments, int maxDepth, Json::Value& value);
+
+/// How many bytes of a text could be the beginning of one that readJsonText() takes; npos when it
+/// takes all of it.
+size_t jsonTextFault(std::string_view text, bool comments, int maxDepth);
 
 }  // namespace QELO::JsonHelper

@@ -8,6 +8,7 @@
 #include <cstring>
 #include <utility>
 
+#include "webapi/APIDescription.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/CompoundHandler.h"
@@ -15,8 +16,6 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
-#include "webapi/platform/Paths.h"
-#include "webapi/platform/WebAPIUtil.h"
 #include "webapi/runner/APIRunnerPrivate.h"
 #include "webapi/runner/Callbacks.h"
 #include "webapi/runner/CompoundCall.h"
@@ -41,10 +40,7 @@ APIRunner::APIRunner()
       private_(std::make_unique<APIRunnerPrivate>(this)),
       rooms_(new Rooms{Catalogue(libDef, catalogue), LibraryCache(libraries_)}) {
   setsid();
-  Json::Value defaults;
-  if (WebAPIUtil::ReadJsonFile(Paths::kLibDef, defaults) && defaults.isObject()) {
-    libDef.swap(defaults);
-  }
+  Catalogue::ReadLibDef(libDef);
 }
 
 APIRunner::~APIRunner() {
@@ -196,14 +192,13 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
   }
   const Json::Value attributes =
       GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
-  const auto isSet = [&attributes](const char* name) {
-    return JsonHelper::asBool(JsonHelper::member(attributes, name));
-  };
-  if (JsonHelper::asBool(request_->GetAttr("_collector_count_webapi")) && !isSet("allowTimeout") &&
+  if (JsonHelper::asBool(request_->GetAttr("_collector_count_webapi")) &&
+      !APIDescription::IsSet(attributes, "allowTimeout") &&
       JsonHelper::asBool(request->GetAPIInfo("count", true))) {
     IncreaseCounter(request);
   }
-  if (request->IsUploadRequest() && !(isSet("allowUpload") && HandleUpload(request, response))) {
+  if (request->IsUploadRequest() &&
+      !(APIDescription::IsSet(attributes, "allowUpload") && HandleUpload(request, response))) {
     return false;
   }
   return Execution(*this, request, response).Run(attributes);

@@ -8,6 +8,7 @@
 #include <ctime>
 #include <string>
 
+#include "webapi/APIDescription.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/APIRunner.h"
@@ -33,8 +34,8 @@ void releaseStandardDescriptors() {
 }
 
 bool transfersFile(const Json::Value& attributes) {
-  return JsonHelper::asBool(JsonHelper::member(attributes, "allowUpload")) ||
-         JsonHelper::asBool(JsonHelper::member(attributes, "allowDownload"));
+  return APIDescription::IsSet(attributes, "allowUpload") ||
+         APIDescription::IsSet(attributes, "allowDownload");
 }
 
 /// What every child would find out anew: the time zone for its log, the files of accounts.

@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <utility>
 
+#include "webapi/APIDescription.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
@@ -68,10 +69,20 @@ int checkSession(const APIRequest& request, const char* session, bool allowTimeo
   return errorOf(result);
 }
 
-/// The request knows whether its own login user is an administrator; of others the host does.
-bool isAdmin(const APIRequest& request, const std::string& user) {
-  return request.GetLoginUserName() == user ? request.IsAdmin()
-                                            : QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
+/// The user-class test for the session's user. A request's word on who is an administrator holds
+/// for its own login user alone: of another user the host is asked.
+bool isAllowed(APIRequest& request, const std::string& user) {
+  if (request.GetLoginUserName() == user) {
+    return APIAuth::CheckAllowUser(&request, user.c_str());
+  }
+  Json::Value description(Json::objectValue);
+  description["allowUser"] = request.GetAPIInfo("allowUser", Json::Value());
+  Json::Value session(Json::objectValue);
+  session["isAdmin"] = QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
+  APIRequest own;
+  own.InitAPIInfo(description);
+  own.InitSession(std::move(session));
+  return APIAuth::CheckAllowUser(&own, user.c_str());
 }
 
 }  // namespace
@@ -96,9 +107,7 @@ bool APIAuth::CheckPermission(APIRequest* request, APIResponse* response, const 
   }
   std::string user;
   int code = checkSession(*request, session, allowTimeout, user);
-  if (code == WEBAPI_ERR_NONE &&
-      (user.empty() || !ListsUserClass(request->GetAPIInfo("allowUser", Json::Value()),
-                                       GetUserClass(isAdmin(*request, user), user)))) {
+  if (code == WEBAPI_ERR_NONE && !isAllowed(*request, user)) {
     code = WEBAPI_ERR_NO_PERMISSION;
   }
   if (code == WEBAPI_ERR_NONE &&
@@ -120,17 +129,15 @@ bool APIAuth::UpdateTimeout(APIRequest* request) {
 
 bool APIAuth::MayCall(const APIRequest& request, const Json::Value& description,
                       const Json::Value& attributes) {
-  const int level = AuthLevelOf(JsonHelper::member(description, "authLevel"));
-  if (level == AUTH_NONE || level == AUTH_SKIP) {
+  const APIDescription api(description);
+  if (api.GetAuthLevel() == APIDescription::AUTH_NONE ||
+      api.GetAuthLevel() == APIDescription::AUTH_SKIP) {
     return true;
   }
   const std::string user = request.GetLoginUserName();
-  const Json::Value& allowUser = JsonHelper::hasMember(attributes, "allowUser")
-                                     ? JsonHelper::member(attributes, "allowUser")
-                                     : JsonHelper::member(description, "allowUser");
   return request.IsAuthorized() && !user.empty() &&
-         ListsUserClass(allowUser, GetUserClass(request.IsAdmin(), user)) &&
-         HoldsAppPriv(JsonHelper::member(description, "appPriv"), user, request.GetRemoteIP());
+         ListsUserClass(api.GetAllowUser(attributes), GetUserClass(request.IsAdmin(), user)) &&
+         HoldsAppPriv(api.GetAppPriv(), user, request.GetRemoteIP());
 }
 
 }  // namespace QELO

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "webapi/APIAuth.h"
+#include "webapi/APIDescription.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/APIRunner.h"
@@ -64,6 +65,15 @@ bool IsTokenGranted(const APIRequest& request, char* user, int size) {
                                                   request.GetAPIMethod().c_str(), user, size) >= 0;
 }
 
+/// The description that the request's API was found to have.
+APIDescription descriptionOf(APIRequest& request) {
+  return APIDescription(JsonHelper::member(request.Serialize(), "reqLib"));
+}
+
+int authLevelOf(APIRequest& request) {
+  return descriptionOf(request).GetAuthLevel();
+}
+
 std::string optionOf(QeloCgiContext* context, const char* name, const char* def = "") {
   char value[kOptionSize] = {};
   return QeloCgiGetOption(context, name, value, kOptionSize) == 1 ? value : def;
@@ -96,14 +106,12 @@ Json::Value emptySessionOf(const APIRequest& caller) {
 
 }  // namespace
 
-bool PermissionCheck::NeedPermission(const APIRequest* request) {
-  return request == nullptr ||
-         AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) != AUTH_NONE;
+bool PermissionCheck::NeedPermission(APIRequest* request) {
+  return request == nullptr || authLevelOf(*request) != APIDescription::AUTH_NONE;
 }
 
-bool PermissionCheck::SkipPermission(const APIRequest* request) {
-  return request != nullptr &&
-         AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) == AUTH_SKIP;
+bool PermissionCheck::SkipPermission(APIRequest* request) {
+  return request != nullptr && authLevelOf(*request) == APIDescription::AUTH_SKIP;
 }
 
 bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response) {
@@ -117,8 +125,7 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
     result = AUTHORIZED_UNAUTHENTICATED;
     code = errorOf(result);
   }
-  if (result == AUTHORIZED_TOKEN_MISMATCH &&
-      AuthLevelOf(request->GetAPIInfo("authLevel", AUTH_LOGIN)) == AUTH_LOGIN) {
+  if (result == AUTHORIZED_TOKEN_MISMATCH && authLevelOf(*request) == APIDescription::AUTH_LOGIN) {
     syslog(LOG_ERR, "%s:%d Token Authentication Fail.", "WebEntry", kTokenFailLine);
   }
   if (request != &caller_) {
@@ -138,7 +145,7 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
     response->SetError(WEBAPI_ERR_NO_PERMISSION);
     return false;
   }
-  const Json::Value appPriv = request->GetAPIInfo("appPriv", "");
+  const Json::Value appPriv = descriptionOf(*request).GetAppPriv();
   if (!HoldsAppPriv(appPriv, caller_.GetLoginUserName(), caller_.GetRemoteIP())) {
     response->SetError(WEBAPI_ERR_NO_APP_PRIVILEGE);
     return false;
@@ -167,12 +174,8 @@ bool PermissionCheck::CoversInnerCall(const APIRequest& request) {
 
 bool PermissionCheck::IsAllowedUser(APIRequest* request) {
   const std::string user = caller_.GetLoginUserName();
-  Json::Value allowUser = request->GetAPIInfo("allowUser", Json::Value());
-  const Json::Value& method =
-      runner_.GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
-  if (JsonHelper::hasMember(method, "allowUser")) {
-    allowUser = method["allowUser"];
-  }
+  const Json::Value& allowUser = descriptionOf(*request).GetAllowUser(
+      runner_.GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod()));
   return !user.empty() && ListsUserClass(allowUser, APIAuth::GetUserClass(caller_.IsAdmin(), user));
 }
 

@@ -24,8 +24,8 @@ class PermissionCheck {
                   Json::Value& permission)
       : runner_(runner), caller_(caller), context_(context), permission_(permission) {}
 
-  static bool NeedPermission(const APIRequest* request);
-  static bool SkipPermission(const APIRequest* request);
+  static bool NeedPermission(APIRequest* request);
+  static bool SkipPermission(APIRequest* request);
   bool CheckPermission(APIRequest* request, APIResponse* response);
   int CheckPermission(bool allowTimeout);
 

@@ -14,11 +14,6 @@ bool ListsUserClass(const Json::Value& allowUser, const std::string& userClass) 
                      [&wanted](const Json::Value& entry) { return entry == wanted; });
 }
 
-int AuthLevelOf(const Json::Value& level) {
-  const bool isInteger = level.type() == Json::intValue || level.type() == Json::uintValue;
-  return isInteger ? JsonHelper::asInt(level, AUTH_LOGIN) : AUTH_LOGIN;
-}
-
 bool HoldsAppPriv(const Json::Value& appPriv, const std::string& user, const std::string& address) {
   if (appPriv.isNull()) {
     return true;

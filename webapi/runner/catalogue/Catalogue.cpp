@@ -3,56 +3,49 @@
 #include <errno.h>
 #include <glob.h>
 
-#include <algorithm>
-#include <string_view>
-
+#include "webapi/APIDescription.h"
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/DescriptionFile.h"
 #include "webapi/base/Log.h"
+#include "webapi/json/Fault.h"
 #include "webapi/platform/Core.h"
+#include "webapi/platform/Paths.h"
 #include "webapi/platform/WebAPIUtil.h"
 
 namespace QELO {
 namespace {
 
-constexpr int kMaxPriority = 10;
+/// Says, beside that a file is not valid, where it is wrong.
+void logFault(const std::string& path) {
+  JsonHelper::Position fault;
+  if (JsonHelper::findFileFault(path, fault)) {
+    WEBAPI_LOG("APIRunner.cpp", "%s:%zu:%zu: no JSON from here on", path.c_str(), fault.line,
+               fault.column);
+  }
+}
 
 /// Whether members can be put into a value; the JSON library throws where they cannot.
 bool takesMembers(const Json::Value& value) {
   return value.isObject() || value.isNull();
 }
 
-/// Whether a version's entries list the method, as a plain string or as a member of an object.
-bool isListed(const Json::Value& entries, const std::string& method) {
-  return entries.isArray() &&
-         std::any_of(entries.begin(), entries.end(), [&](const Json::Value& entry) {
-           return entry == Json::Value(method) || JsonHelper::hasMember(entry, method);
-         });
-}
-
-bool isSet(const Json::Value& attributes, const char* name) {
-  return JsonHelper::asBool(JsonHelper::member(attributes, name));
-}
-
 }  // namespace
 
+void Catalogue::ReadLibDef(Json::Value& libDef) {
+  Json::Value defaults;
+  if (!WebAPIUtil::ReadJsonFile(Paths::kLibDef, defaults)) {
+    logFault(Paths::kLibDef);
+  } else if (!defaults.isObject()) {
+    WEBAPI_LOG("APIRunner.cpp", "%s: it is no object", Paths::kLibDef);
+  } else {
+    libDef.swap(defaults);
+  }
+}
+
 bool Catalogue::CheckLibDescription(const Json::Value& description) {
-  if (!description.isObject()) {
-    return false;
-  }
-  if (!JsonHelper::member(description, "lib").isString() ||
-      !JsonHelper::member(description, "minVersion").isInt() ||
-      !JsonHelper::member(description, "maxVersion").isInt() ||
-      !JsonHelper::member(description, "methods").isObject()) {
-    return false;
-  }
-  if (!JsonHelper::hasMember(description, "priority")) {
-    return true;
-  }
-  const Json::Value& priority = description["priority"];
-  return priority.isInt() && priority.asInt() <= kMaxPriority && priority.asInt() >= -kMaxPriority;
+  return APIDescription(description).Fault().empty();
 }
 
 Json::Value& Catalogue::ApplyLibDef(Json::Value& description) const {
@@ -73,8 +66,10 @@ void Catalogue::AddDescriptions(Json::Value& target, Json::Value& file) const {
     return;
   }
   for (auto it = file.begin(); it != file.end(); ++it) {
-    if (!CheckLibDescription(*it)) {
+    const std::string fault = APIDescription(*it).Fault();
+    if (!fault.empty()) {
       WEBAPI_LOG("APIRunner.cpp", "WebAPI description %s is not valid.", it.name().c_str());
+      WEBAPI_LOG("APIRunner.cpp", "description %s: %s", it.name().c_str(), fault.c_str());
       continue;
     }
     ApplyLibDef(*it);
@@ -92,6 +87,8 @@ bool Catalogue::InitLibDesc(Json::Value& target) const {
     Json::Value file;
     if (WebAPIUtil::ReadJsonFile(files.gl_pathv[i], file)) {
       AddDescriptions(target, file);
+    } else {
+      logFault(files.gl_pathv[i]);
     }
   }
   globfree(&files);
@@ -115,6 +112,7 @@ bool Catalogue::InitLibDesc(Json::Value& target, const std::string& api) const {
   Json::Value file;
   if (!WebAPIUtil::ReadJsonFile(path, file)) {
     WEBAPI_LOG("APIRunner.cpp", "WebAPI description file %s is not valid", path.c_str());
+    logFault(path);
     return false;
   }
   AddDescriptions(target, file);
@@ -135,24 +133,16 @@ const Json::Value& Catalogue::GetMethod(const std::string& api, int version,
   if (!InitLibDesc(known_, api)) {
     return defaults;
   }
-  const Json::Value& versions = JsonHelper::member(JsonHelper::member(known_, api), "methods");
-  const Json::Value& entries = JsonHelper::member(versions, std::to_string(version));
-  if (!entries.isArray()) {
-    return defaults;
-  }
-  for (const Json::Value& entry : entries) {
-    if (entry.isObject() && !entry.empty() && entry.begin().name() == method) {
-      return *entry.begin();
-    }
-  }
-  return defaults;
+  const Json::Value* own =
+      APIDescription(JsonHelper::member(known_, api)).Attributes(version, method);
+  return own != nullptr ? *own : defaults;
 }
 
 bool Catalogue::GetMethodAttr(const std::string& api, int version, const std::string& method,
                               const std::string& attribute) {
   const Json::Value& own = GetMethod(api, version, method);
   const Json::Value& attributes = own.isObject() ? own : JsonHelper::member(libDef_, "methods");
-  return JsonHelper::asBool(JsonHelper::member(attributes, attribute));
+  return APIDescription::IsSet(attributes, attribute);
 }
 
 int Catalogue::CheckRequestParam(APIRequest& request) {
@@ -165,19 +155,18 @@ int Catalogue::CheckRequestParam(APIRequest& request) {
   if (!InitLibDesc(known_, api) || !JsonHelper::hasMember(known_, api)) {
     return WEBAPI_ERR_NO_SUCH_API;
   }
-  const Json::Value& description = known_[api];
-  if (version < JsonHelper::asInt(description["minVersion"]) ||
-      version > JsonHelper::asInt(description["maxVersion"])) {
+  const APIDescription description(known_[api]);
+  if (!description.HasVersion(version)) {
     return WEBAPI_ERR_NO_SUCH_VERSION;
   }
-  if (!isListed(JsonHelper::member(description["methods"], std::to_string(version)), method)) {
+  if (!description.Lists(version, method)) {
     return WEBAPI_ERR_NO_SUCH_METHOD;
   }
   const Json::Value& attributes = GetMethod(api, version, method);
-  if (!isSet(attributes, "allowUpload") && request.IsUploadRequest()) {
+  if (!APIDescription::IsSet(attributes, "allowUpload") && request.IsUploadRequest()) {
     return WEBAPI_ERR_UPLOAD_REFUSED;
   }
-  if (!isSet(attributes, "allowDemo") && request.IsDemoMode()) {
+  if (!APIDescription::IsSet(attributes, "allowDemo") && request.IsDemoMode()) {
     return WEBAPI_ERR_DEMO_REFUSED;
   }
   return WEBAPI_ERR_NONE;

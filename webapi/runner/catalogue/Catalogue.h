@@ -18,6 +18,10 @@ class Catalogue {
   Catalogue(const Catalogue&) = delete;
   Catalogue& operator=(const Catalogue&) = delete;
 
+  /// Takes lib.def's contents; `libDef` stays as it is when there is no such file, or none that can
+  /// be used, which is logged.
+  static void ReadLibDef(Json::Value& libDef);
+
   static bool CheckLibDescription(const Json::Value& description);
   Json::Value& ApplyLibDef(Json::Value& description) const;
   bool InitLibDesc(Json::Value& target) const;

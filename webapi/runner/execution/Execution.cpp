@@ -1,5 +1,6 @@
 #include "webapi/runner/execution/Execution.h"
 
+#include "webapi/APIDescription.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/APIRunner.h"
@@ -14,12 +15,6 @@
 
 namespace QELO {
 namespace {
-
-constexpr char kDefaultRunAs[] = "system";
-
-bool isSet(const Json::Value& attributes, const char* name) {
-  return JsonHelper::asBool(JsonHelper::member(attributes, name));
-}
 
 /// The first entry for the request's call, or the terminating one.
 template <typename Entry>
@@ -52,10 +47,11 @@ bool passesCheck(const _tag_API_CHECK_TABLE* table, APIRequest* request, APIResp
 
 /// Takes the credentials that the description asks for.
 /// @param giveBack  receives whether they are given back after the call
-bool takeCredentials(const APIRequest& request, const Json::Value& attributes, bool* giveBack) {
-  const bool keepPrivilege = isSet(attributes, "grantable");
+bool takeCredentials(APIRequest& request, const Json::Value& attributes, bool* giveBack) {
+  const APIDescription description(JsonHelper::member(request.Serialize(), "reqLib"));
+  const bool keepPrivilege = APIDescription::IsSet(attributes, "grantable");
   *giveBack = keepPrivilege;
-  if (isSet(attributes, "grantByDefault")) {
+  if (APIDescription::IsSet(attributes, "grantByDefault")) {
     *giveBack = true;
     if (!Credentials::BecomeRoot()) {
       WEBAPI_LOG("APIRunner.cpp", "grantByDefault failed. [%m]");
@@ -63,7 +59,7 @@ bool takeCredentials(const APIRequest& request, const Json::Value& attributes, b
     }
     return true;
   }
-  if (isSet(attributes, "grantByUser")) {
+  if (APIDescription::IsSet(attributes, "grantByUser")) {
     const std::string user = request.GetLoginUserName();
     if (user.empty()) {
       WEBAPI_LOG("APIRunner.cpp", "grantByUser: failed to get login username.");
@@ -75,9 +71,7 @@ bool takeCredentials(const APIRequest& request, const Json::Value& attributes, b
     }
     return true;
   }
-  const std::string runAs = JsonHelper::asString(JsonHelper::hasMember(attributes, "runAs")
-                                                     ? attributes["runAs"]
-                                                     : request.GetAPIInfo("runAs", kDefaultRunAs));
+  const std::string runAs = description.GetRunAs(attributes);
   if (!Credentials::BecomeUser(runAs, keepPrivilege)) {
     WEBAPI_LOG("APIRunner.cpp", "grantable failed. [%m]");
     return false;
@@ -122,8 +116,8 @@ bool Execution::Run(const Json::Value& attributes) {
   // reverse order, streams before priority before directory.
   const WorkingDirectory directory;
   Priority priority;
-  const StandardStreams streams(!isSet(attributes, "allowUpload"),
-                                !isSet(attributes, "allowDownload"));
+  const StandardStreams streams(!APIDescription::IsSet(attributes, "allowUpload"),
+                                !APIDescription::IsSet(attributes, "allowDownload"));
   if (!streams.IsShut()) {
     WEBAPI_LOG("APIRunner.cpp", "cannot shut the standard streams. [%m]");
     response_->SetError(WEBAPI_ERR_NO_ANSWER);

@@ -232,6 +232,36 @@ TEST_F(Catalogue, UnparsableFileOrDirectoryIsLogged) {
   EXPECT_EQ(SyslogCapture::Count("WebAPI description file QELO.D.lib is not valid"), 1);
 }
 
+TEST_F(Catalogue, FileThatIsNoJsonIsLoggedWithThePlace) {
+  Write("QELO.A.lib", "{\n  \"QELO.A\": {\n    \"lib\" \"x.so\"\n  }\n}\n");
+  EXPECT_FALSE(TestRunner().InitLibDesc(catalogue, "QELO.A"));
+  EXPECT_EQ(SyslogCapture::Count("QELO.A.lib:3:11: no JSON from here on"), 1);
+  SyslogCapture::Clear();
+  EXPECT_TRUE(TestRunner().InitLibDesc(catalogue));
+  EXPECT_EQ(SyslogCapture::Count("QELO.A.lib:3:11: no JSON from here on"), 1);
+}
+
+TEST_F(Catalogue, InvalidDescriptionIsLoggedWithTheKeyThatIsWrong) {
+  Json::Value file;
+  file["QELO.A.B"] = Valid();
+  file["QELO.A.B"]["maxVersion"] = "2";
+  file["QELO.A.C"] = Valid();
+  Write("QELO.A.lib", JsonHelper::toString(file));
+  EXPECT_TRUE(TestRunner().InitLibDesc(catalogue, "QELO.A.B"));
+  EXPECT_EQ(SyslogCapture::Count("APIRunner.cpp:"), 2);
+  EXPECT_EQ(SyslogCapture::Count("WebAPI description QELO.A.B is not valid."), 1);
+  EXPECT_EQ(SyslogCapture::Count("description QELO.A.B: \"maxVersion\" is no integer"), 1);
+}
+
+TEST_F(Catalogue, LibDefThatCannotBeUsedIsLogged) {
+  WriteLibDef("{\"authLevel\": }");
+  TestRunner();
+  EXPECT_EQ(SyslogCapture::Count(std::string(Paths::kLibDef) + ":1:15: no JSON from here on"), 1);
+  WriteLibDef("[]");
+  TestRunner();
+  EXPECT_EQ(SyslogCapture::Count(std::string(Paths::kLibDef) + ": it is no object"), 1);
+}
+
 TEST_F(Catalogue, FileOfAnotherTypeAddsNothing) {
   Write("QELO.A.lib", "[1, {\"QELO.A\": {}}]");
   EXPECT_TRUE(TestRunner().InitLibDesc(catalogue, "QELO.A"));

@@ -1,0 +1,34 @@
+#include "webapi/json/Fault.h"
+
+#include "webapi/JsonHelper.h"
+#include "webapi/base/TextFile.h"
+#include "webapi/json/Reader.h"
+
+namespace QELO::JsonHelper {
+
+bool findFault(std::string_view text, Position& fault) {
+  const size_t offset = jsonTextFault(text, true, kMaxDepth);
+  if (offset == std::string_view::npos) {
+    return false;
+  }
+  fault = Position();
+  for (const char c : text.substr(0, offset)) {
+    if (c == '\n') {
+      ++fault.line;
+      fault.column = 1;
+    } else if ((static_cast<unsigned char>(c) & 0xC0U) != 0x80U) {
+      ++fault.column;
+    }
+  }
+  return true;
+}
+
+bool findFileFault(const std::string& path, Position& fault) {
+  UniqueFd file;
+  struct stat info {};
+  std::string text;
+  return OpenRegularFile(AT_FDCWD, path.c_str(), file, info, 0) == 0 &&
+         ReadText(file.Get(), text.max_size(), text) && findFault(text, fault);
+}
+
+}  // namespace QELO::JsonHelper
