@@ -2,6 +2,7 @@
 
 #include <json/json.h>
 
+#include <memory>
 #include <string>
 
 #include "webapi/APIRunner.h"
@@ -10,6 +11,8 @@
 struct QeloCgiContext;
 
 namespace QELO {
+
+class PermissionCheck;
 
 /// The front of one CGI invocation: reads the request from the CGI environment and standard
 /// input, checks the caller, runs the API and prints headers and body to standard output.
@@ -101,6 +104,7 @@ class WEBAPI_API WebEntry : public APIRunner {
   Json::Value spare_;                            ///< an array; not used
   alignas(void*) unsigned char cgiContext_[60];  ///< the CGI library's, see Context()
   Json::Value permission_;  ///< "permResult": authorisation results, by CheckPermission(bool)
+  std::unique_ptr<PermissionCheck> check_;  ///< over the members above
 };
 
 /// After-output callback that restarts the web server; the argument is not used. Throws when the

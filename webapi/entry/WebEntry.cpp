@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <exception>
+#include <memory>
 #include <utility>
 
 #include "webapi/APIRequest.h"
@@ -97,6 +98,7 @@ void answer(const APIResponse& response, UnreadBody& body) {
 WebEntry::WebEntry() : spare_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
   static_assert(sizeof cgiContext_ == sizeof(QeloCgiContext));
   permission_["permResult"] = Json::Value(Json::arrayValue);
+  check_ = std::make_unique<PermissionCheck>(*this, *Request(), Context(), permission_);
 }
 
 WebEntry::~WebEntry() = default;
@@ -221,12 +223,11 @@ bool WebEntry::SkipPermission(APIRequest* request) {
 }
 
 bool WebEntry::CheckPermission(APIRequest* request, APIResponse* response) {
-  return PermissionCheck(*this, *Request(), Context(), permission_)
-      .CheckPermission(request, response);
+  return check_->CheckPermission(request, response);
 }
 
 int WebEntry::CheckPermission(bool allowTimeout) {
-  return PermissionCheck(*this, *Request(), Context(), permission_).CheckPermission(allowTimeout);
+  return check_->CheckPermission(allowTimeout);
 }
 
 bool WebEntry::InitParam(Json::Value& params) {

@@ -24,6 +24,7 @@
 namespace QELO {
 namespace {
 
+constexpr char kUserVariable[] = "QELO_WEBAPI_USERNAME";
 constexpr int kOptionSize = 1024;    ///< bytes of a session's option with its NUL
 constexpr int kTokenFailLine = 577;  ///< administrators' log filters know the message by this line
 
@@ -120,8 +121,9 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
   }
   const bool allowTimeout = runner_.GetMethodAttr(request, "allowTimeout");
   int code = CheckPermission(allowTimeout);
-  int result = JsonHelper::asInt(KnownResult(allowTimeout), AUTHORIZED_UNKNOWN);
-  if (code == WEBAPI_ERR_NONE && !CoversInnerCall(*request)) {
+  const unsigned slot = SlotOf(allowTimeout);
+  int result = JsonHelper::asInt(KnownResult(slot), AUTHORIZED_UNKNOWN);
+  if (code == WEBAPI_ERR_NONE && !CoversInnerCall(*request, findings_[slot])) {
     result = AUTHORIZED_UNAUTHENTICATED;
     code = errorOf(result);
   }
@@ -164,8 +166,8 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
 }
 
 /// A token stands for the calls that it was made for, within a compound request too.
-bool PermissionCheck::CoversInnerCall(const APIRequest& request) {
-  if (&request == &caller_ || !JsonHelper::asBool(JsonHelper::member(permission_, "token"))) {
+bool PermissionCheck::CoversInnerCall(const APIRequest& request, const Finding& finding) {
+  if (&request == &caller_ || !finding.byToken) {
     return true;
   }
   char user[kUserNameSize] = {};
@@ -179,19 +181,43 @@ bool PermissionCheck::IsAllowedUser(APIRequest* request) {
   return !user.empty() && ListsUserClass(allowUser, APIAuth::GetUserClass(caller_.IsAdmin(), user));
 }
 
-const Json::Value& PermissionCheck::KnownResult(bool allowTimeout) const {
+const Json::Value& PermissionCheck::KnownResult(unsigned slot) const {
   const Json::Value& results = JsonHelper::member(permission_, "permResult");
-  const Json::ArrayIndex slot = allowTimeout ? 0 : 1;
   return results.isArray() && results.isValidIndex(slot) ? results[slot]
                                                          : Json::Value::nullSingleton();
 }
 
 int PermissionCheck::CheckPermission(bool allowTimeout) {
-  const Json::Value& known = KnownResult(allowTimeout);
+  const unsigned slot = SlotOf(allowTimeout);
+  TurnTo(slot);
+  const Json::Value& known = KnownResult(slot);
   const int result = known.isInt() ? known.asInt() : Authorise(allowTimeout);
-  permission_["permResult"][allowTimeout ? 0U : 1U] = result;
+  permission_["permResult"][slot] = result;
   caller_.SetAuthResult(static_cast<_tag_authorized_result_>(result));
   return errorOf(result);
+}
+
+/// Nobody may go on with what another allowance has found: the caller's request is put back to how
+/// this one's check has left it, or, before that, to how it came.
+void PermissionCheck::TurnTo(unsigned slot) {
+  Finding* next = &findings_[slot];
+  if (now_ == nullptr) {
+    unchecked_.sessionId = caller_.GetSessionID();
+  } else if (now_ != next) {
+    now_->session = JsonHelper::member(caller_.Serialize(), "session");
+    now_->sessionId = caller_.GetSessionID();
+    const bool isKnown = KnownResult(slot).isInt();
+    if (!isKnown) {
+      unchecked_.session = emptySessionOf(caller_);
+      QeloCgiInit("", context_);
+      QeloCgiLoadInCookies(context_);
+    }
+    const Finding& shown = isKnown ? *next : unchecked_;
+    caller_.InitSession(shown.session);
+    caller_.SetCookie("id", shown.sessionId);
+    setenv(kUserVariable, caller_.GetLoginUserName().c_str(), 1);
+  }
+  now_ = next;
 }
 
 /// The caller's session is asked first, then the access token.
@@ -217,7 +243,7 @@ int PermissionCheck::Authorise(bool allowTimeout) {
     }
     const bool granted = IsTokenGranted(caller_, user, kUserNameSize);
     result = granted ? AUTHORIZED_YES : AUTHORIZED_UNAUTHENTICATED;
-    permission_["token"] = granted;
+    findings_[SlotOf(allowTimeout)].byToken = granted;
     if (!granted) {
       user[0] = '\0';
     }
@@ -244,7 +270,7 @@ bool PermissionCheck::KeepsIdle() {
 
 void PermissionCheck::FillSession(const std::string& user, const std::string& language,
                                   bool isAuthorized) {
-  setenv("QELO_WEBAPI_USERNAME", user.c_str(), 1);
+  setenv(kUserVariable, user.c_str(), 1);
   Json::Value session(Json::objectValue);
   session["username"] = user;
   session["isAdmin"] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;

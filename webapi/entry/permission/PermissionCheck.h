@@ -23,6 +23,8 @@ class PermissionCheck {
   PermissionCheck(APIRunner& runner, APIRequest& caller, QeloCgiContext* context,
                   Json::Value& permission)
       : runner_(runner), caller_(caller), context_(context), permission_(permission) {}
+  PermissionCheck(const PermissionCheck&) = delete;
+  PermissionCheck& operator=(const PermissionCheck&) = delete;
 
   static bool NeedPermission(APIRequest* request);
   static bool SkipPermission(APIRequest* request);
@@ -30,10 +32,19 @@ class PermissionCheck {
   int CheckPermission(bool allowTimeout);
 
  private:
-  const Json::Value& KnownResult(bool allowTimeout) const;
+  /// What was found with an allowance, so that the caller's request can hold it again.
+  struct Finding {
+    Json::Value session;
+    std::string sessionId;
+    bool byToken = false;  ///< an access token stands in for the session
+  };
+
+  static unsigned SlotOf(bool allowTimeout) { return allowTimeout ? 0 : 1; }
+  const Json::Value& KnownResult(unsigned slot) const;
+  void TurnTo(unsigned slot);
   int Authorise(bool allowTimeout);
   void FillSession(const std::string& user, const std::string& language, bool isAuthorized);
-  bool CoversInnerCall(const APIRequest& request);
+  bool CoversInnerCall(const APIRequest& request, const Finding& finding);
   bool KeepsIdle();
   bool IsAllowedUser(APIRequest* request);
 
@@ -41,6 +52,9 @@ class PermissionCheck {
   APIRequest& caller_;
   QeloCgiContext* context_;
   Json::Value& permission_;
+  Finding findings_[2];
+  Finding unchecked_;       ///< the caller's request as it came
+  Finding* now_ = nullptr;  ///< what the caller's request holds; null: as it came
 };
 
 }  // namespace QELO

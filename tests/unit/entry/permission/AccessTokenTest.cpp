@@ -119,5 +119,102 @@ TEST_F(Permission, RefusedAccessTokenLeavesNoUserBehind) {
   EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "");
 }
 
+class PermissionTwice : public Permission {
+ protected:
+  /// A session that has timed out, and a token.
+  void SetUp() override {
+    Permission::SetUp();
+    Set("HTTP_COOKIE", "id=S");
+    token = "T";
+    platform->tokenGrant = 0;
+    platform->tokenUser = "bob";
+    platform->options = {{"app", "Desk"}};
+    Describe(kOpenToAll);
+    MakeRequest(*entry_);
+  }
+
+  /// One allowance's check. @return user, session id, application and environment of the request
+  std::string Ask(bool allowTimeout) {
+    platform->authorized = allowTimeout ? 2 : -1;
+    EXPECT_EQ(entry_->CheckPermission(allowTimeout), 0);
+    const APIRequest& request = *entry_->Request();
+    return request.GetLoginUserName() + " " + request.GetSessionID() + " " +
+           request.GetApplication() + " " + Environment("QELO_WEBAPI_USERNAME") + " " +
+           std::to_string(request.GetAuthResult());
+  }
+
+  static constexpr char kBySession[] = "ann S Desk ann 2";
+  static constexpr char kByToken[] = "bob   bob 1";
+};
+
+TEST_F(PermissionTwice, SessionIsAskedAgainWhereATokenStoodInForIt) {
+  EXPECT_EQ(Ask(false), kByToken);
+  EXPECT_EQ(Ask(true), kBySession);
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 2);
+}
+
+TEST_F(PermissionTwice, TokenStandsInWhereTheSessionWasGoodForTheOtherAllowance) {
+  EXPECT_EQ(Ask(true), kBySession);
+  EXPECT_EQ(Ask(false), kByToken);
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 2);
+}
+
+TEST_F(PermissionTwice, TokenOfTheOneAllowanceIsNoAnswerForTheOther) {
+  platform->authorized = -5;
+  EXPECT_EQ(entry_->CheckPermission(true), 0);
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "bob");
+  platform->authorized = 1;
+  EXPECT_EQ(entry_->CheckPermission(false), 0);
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "ann");
+  EXPECT_EQ(entry_->Request()->GetSessionID(), "S");
+}
+
+TEST_F(PermissionTwice, AllowancesFoundBeforeKeepTheirOwnCaller) {
+  for (int i = 0; i < 2; ++i) {
+    EXPECT_EQ(Ask(true), kBySession);
+    EXPECT_EQ(Ask(false), kByToken);
+  }
+  EXPECT_EQ(Calls("QeloCgiIsAuthorizedEx"), 2);
+  EXPECT_EQ(Calls("QeloAccessTokenGrant"), 1);
+}
+
+TEST_F(PermissionTwice, RefusedAllowanceKeepsNothingOfTheOtherOnesCaller) {
+  token.clear();
+  entry_ = std::make_unique<TestEntry>();
+  MakeRequest(*entry_);
+  EXPECT_EQ(Ask(true), kBySession);
+  platform->authorized = -1;
+  EXPECT_EQ(entry_->CheckPermission(false), 106);
+  EXPECT_EQ(entry_->Request()->GetLoginUserName(), "");
+  EXPECT_FALSE(entry_->Request()->IsAuthorized());
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "");
+  EXPECT_EQ(Ask(true), kBySession);
+}
+
+TEST_F(PermissionTwice, InnerCallsHaveTheCallerOfTheirOwnAllowance) {
+  Json::Value file = Parse(R"({"QELO.Test.Good": {"lib": "", "minVersion": 1, "maxVersion": 1,
+      "methods": {"1": [{"echo": {"allowTimeout": true}}, {"whoami": {}}]}}})");
+  file["QELO.Test.Good"]["allowUser"] = Parse(kOpenToAll)["allowUser"];
+  std::ofstream("QELO.Test.Good.lib") << JsonHelper::toString(file);
+  entry_ = std::make_unique<TestEntry>();
+  MakeRequest(*entry_);
+  const auto inner = [this](const char* method) {
+    platform->authorized = std::string(method) == "echo" ? 2 : -1;
+    APIRequest request(*entry_->Request());
+    Json::Value params;
+    params["postParam"]["method"] = method;
+    request.InitParam(params, true);
+    APIResponse answer(&request);
+    entry_->CheckPermission(&request, &answer);
+    return request.GetLoginUserName() + " " + request.GetSessionID() + " " +
+           std::to_string(answer.GetError());
+  };
+  EXPECT_EQ(inner("whoami"), "bob  0");
+  EXPECT_EQ(inner("echo"), "ann S 0");
+  platform->tokenGrant = -1;  // of the token alone is it asked what it covers
+  EXPECT_EQ(inner("echo"), "ann S 0");
+  EXPECT_EQ(inner("whoami"), "  119");
+}
+
 }  // namespace
 }  // namespace QELO
