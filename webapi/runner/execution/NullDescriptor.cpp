@@ -6,20 +6,12 @@
 #include <cerrno>
 #include <utility>
 
+#include "webapi/base/NullDevice.h"
+
 namespace QELO {
 namespace {
 
 constexpr int kFirstOther = 3;  // the descriptors below are the standard ones
-
-void putNull(int descriptor) {
-  const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-  if (null == descriptor) {
-    fcntl(null, F_SETFD, 0);
-  } else if (null >= 0) {
-    dup2(null, descriptor);
-    close(null);
-  }
-}
 
 }  // namespace
 
@@ -55,7 +47,8 @@ bool NullDescriptor::GiveBack() {
   }
   const int former = std::exchange(former_, -1);
   if (!identity_.IsAt(former)) {
-    putNull(descriptor);  // foreign code may have closed that, too, and opened something there
+    PutNullOver(
+        {descriptor});  // foreign code may have closed that, too, and opened something there
     return false;
   }
   dup2(former, descriptor);
