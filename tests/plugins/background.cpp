@@ -9,6 +9,9 @@
 #include <webapi/APIPolling.h>
 #include <webapi/JsonHelper.h>
 
+#include <cstdio>
+#include <string>
+
 #include "PluginTable.h"
 
 using QELO::APIPolling;
@@ -26,8 +29,14 @@ static void tell(APIResponse* response, int step) {
   response->SetSuccess(data);
 }
 
+/// With a stream that the method had opened it writes to that first, more than a page.
+///
 /// "silent" tenths of a second without a result, then "steps" results, "pause" milliseconds each.
-static void work(APIRequest* request, APIResponse* response, void*) {
+static void work(APIRequest* request, APIResponse* response, void* stream) {
+  if (stream != nullptr) {
+    fputs(std::string(8192, 'x').c_str(), static_cast<FILE*>(stream));
+    fflush(static_cast<FILE*>(stream));
+  }
   usleep(static_cast<useconds_t>(asInt(request->GetParam("silent"))) * 100000);
   const int steps = asInt(request->GetParam("steps"), 1);
   for (int step = 1; step <= steps; ++step) {
@@ -44,7 +53,9 @@ static void start(APIRequest* request, APIResponse* response) {
     response->SetError(105);
     return;
   }
-  polling.Start(response, work, nullptr);
+  // Opened before the task store is, so that its number is the lower one.
+  FILE* stream = asBool(request->GetParam("stream")) ? popen("cat > /dev/null", "w") : nullptr;
+  polling.Start(response, work, stream);
   if (asBool(request->GetParam("die"))) {
     kill(getpid(), SIGKILL);
   }

@@ -103,6 +103,14 @@ def test_Start_WithinACallFromCode_ThatDies_DoesNotHoldTheAnswer(alice):
     assert alice.status(find_task(alice, "die_exec_")).data["finish"] is False
 
 
+@pytest.mark.parametrize("method", ["start", "asUser", "asRoot"])
+def test_Start_WhoseWorkWritesToAStreamOfTheMethod_LosesNoRecord(alice, method):
+    before = alice.start(method, steps=1)
+    full_id = alice.start(method, stream=True, steps=2)
+    assert alice.wait_for_end(full_id)["data"]["step"] == 2
+    assert alice.status(before).data["finish"] is True
+
+
 def test_Start_WithAnUnusablePrefix_MakesNoTask(alice):
     before = alice.call(TASK, "list").data
     assert alice.call(WORK, "start", prefix="a/b").code == 117

@@ -13,10 +13,13 @@
 #include <string>
 #include <vector>
 
+#include "webapi/base/UniqueFd.h"
+
 namespace QELO {
 namespace {
 
 constexpr char kDescriptors[] = "/proc/self/fd";
+constexpr char kNull[] = "/dev/null";
 
 struct PipeEnd {
   int descriptor = -1;
@@ -38,6 +41,13 @@ std::vector<int> listDescriptors() {
     closedir(directory);
   }
   return descriptors;
+}
+
+/// Puts /dev/null over the descriptor. It must not become free: a stream may hold the number still,
+/// and would write into what is opened next, the task's own record for one.
+void mute(int descriptor, const UniqueFd& null) {
+  const int flags = fcntl(descriptor, F_GETFD);
+  dup3(null.Get(), descriptor, flags >= 0 && (flags & FD_CLOEXEC) == 0 ? 0 : O_CLOEXEC);
 }
 
 /// Whether it is a pipe without a name: one that has a name is opened by whoever knows it.
@@ -64,22 +74,27 @@ bool isSocketPairOfAnother(int descriptor, pid_t starter) {
          maker.pid != starter && maker.pid != getpid();
 }
 
-void closeOrphans(const std::vector<PipeEnd>& ends) {
+void muteOrphans(const std::vector<PipeEnd>& ends, const UniqueFd& null) {
   for (const PipeEnd& end : ends) {
     const bool canRead = std::any_of(ends.begin(), ends.end(), [&](const PipeEnd& other) {
       return other.access != O_WRONLY && other.device == end.device && other.inode == end.inode;
     });
     if (!canRead) {
-      close(end.descriptor);
+      mute(end.descriptor, null);
     }
   }
 }
 
 }  // namespace
 
-void closePipesToOthers(pid_t starter) noexcept {
+void mutePipesToOthers(pid_t starter) noexcept {
   std::vector<PipeEnd> ends;
-  for (const int descriptor : listDescriptors()) {
+  const std::vector<int> descriptors = listDescriptors();
+  const UniqueFd null(open(kNull, O_RDWR | O_CLOEXEC));
+  if (!null) {
+    return;  // who waits for a pipe's end waits longer; a record that is written over is lost
+  }
+  for (const int descriptor : descriptors) {
     struct stat info {};
     if (fstat(descriptor, &info) != 0) {
       continue;
@@ -88,10 +103,10 @@ void closePipesToOthers(pid_t starter) noexcept {
       ends.push_back(
           {descriptor, fcntl(descriptor, F_GETFL) & O_ACCMODE, info.st_dev, info.st_ino});
     } else if (S_ISSOCK(info.st_mode) && isSocketPairOfAnother(descriptor, starter)) {
-      close(descriptor);
+      mute(descriptor, null);
     }
   }
-  closeOrphans(ends);
+  muteOrphans(ends, null);
 }
 
 }  // namespace QELO

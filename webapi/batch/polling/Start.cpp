@@ -141,7 +141,7 @@ void APIPollingPrivate::LeaveStarter(pid_t starter) noexcept {
   signal(SIGTERM, SIG_DFL);
   sigprocmask(SIG_UNBLOCK, &stop, nullptr);
   StandardStreams::LetGo();
-  closePipesToOthers(starter);
+  mutePipesToOthers(starter);
 }
 
 /// Nothing may leave this function: behind it lies the parent's work.

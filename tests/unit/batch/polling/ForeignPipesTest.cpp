@@ -24,6 +24,23 @@ void useDescriptor(APIRequest*, APIResponse* own, void* arg) {
   own->SetSuccess(fcntl(descriptor, F_GETFD) >= 0 && write(descriptor, "x", 1) == 1);
 }
 
+/// What becomes of a stream that the method had open when the work opens a file of its own.
+struct Stream {
+  int descriptor;
+  std::string file;
+};
+
+void writeToOldStream(APIRequest*, APIResponse* own, void* arg) {
+  const auto* stream = static_cast<const Stream*>(arg);
+  const int file = open(stream->file.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
+  struct stat info {};
+  Json::Value data;
+  data["written"] = write(stream->descriptor, "x", 1) == 1;
+  data["closesOnExec"] = fcntl(stream->descriptor, F_GETFD) == FD_CLOEXEC;
+  data["fileIsEmpty"] = fstat(file, &info) == 0 && info.st_size == 0;
+  own->SetSuccess(data);
+}
+
 class PollingPipes : public PollingTest {
  protected:
   void SetUp() override {
@@ -80,6 +97,47 @@ TEST_F(PollingPipes, ToTheStartersParentAreClosedWhenTheyAreSockets) {
   StartInChild(ends);
   EXPECT_TRUE(EndsSoon(ends[0]));
   close(ends[0]);
+}
+
+TEST_F(PollingPipes, ThatAreCutOffKeepTheirNumberAndSwallowWhatIsWritten) {
+  for (const int flags : {0, O_CLOEXEC}) {
+    int ends[2];
+    ASSERT_EQ(pipe2(ends, flags), 0);
+    close(ends[0]);
+    tasks->nextId = "id" + std::to_string(flags);
+    Stream stream{ends[1], std::filesystem::path(tasks->directory).parent_path() / "p.file"};
+    EXPECT_TRUE(polling->Start(response.get(), writeToOldStream, &stream));
+    JoinChild();
+    const Json::Value data = Property("alice", tasks->nextId, "body")["data"];
+    EXPECT_EQ(data["written"], true) << flags;
+    EXPECT_EQ(data["fileIsEmpty"], true) << flags;
+    EXPECT_EQ(data["closesOnExec"], flags == O_CLOEXEC) << flags;
+    close(ends[1]);
+  }
+}
+
+TEST_F(PollingPipes, ThatAreCutOffKeepTheirNumberWhenTheyAreSockets) {
+  const pid_t maker = Fork([&] {
+    int sockets[2];
+    socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, sockets);
+    const pid_t child = fork();
+    if (child == 0) {
+      Stream stream{sockets[1], std::filesystem::path(tasks->directory).parent_path() / "p.file"};
+      polling->Start(response.get(), writeToOldStream, &stream);
+      while (wait(nullptr) > 0) {
+      }
+      _exit(0);
+    }
+    waitpid(child, nullptr, 0);
+    char byte = 0;
+    _exit(recv(sockets[0], &byte, 1, MSG_DONTWAIT) == 1 ? 1 : 0);
+  });
+  int status = -1;
+  EXPECT_EQ(waitpid(maker, &status, 0), maker);
+  EXPECT_EQ(status, 0) << "what was written arrived";
+  const Json::Value data = Property("alice", "id1", "body")["data"];
+  EXPECT_EQ(data["written"], true);
+  EXPECT_EQ(data["fileIsEmpty"], true);
 }
 
 TEST_F(PollingPipes, BetweenStarterAndWorkStayOpen) {
