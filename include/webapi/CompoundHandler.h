@@ -22,8 +22,14 @@ class Pipe;
 ///
 /// The request's parameters: "compound" (array of objects with "api", "version", "method" and the
 /// method's own), "mode" ("parallel"; anything else: one after the other) and "stop_when_error"
-/// (one after the other only). An entry whose credentials cannot be given back after it, and every
+/// (one after the other only). What an entry does not name of "api", "version" and "method" is as
+/// the entry before it left it. An entry whose credentials cannot be given back after it, and every
 /// entry of a parallel request, runs in a forked child.
+///
+/// A request with more entries than the host's settings allow, those of compound requests within it
+/// counted, answers 110 before any of them runs. When the answer goes to standard output and nobody
+/// reads that any more, or the parent that waits for it has gone, entries that have not begun are
+/// left out.
 class WEBAPI_API CompoundHandler {
  public:
   /// The three are not owned and outlive the handler.
@@ -93,6 +99,9 @@ class WEBAPI_API CompoundHandler {
  private:
   void PrepareEnvironment();
   void RepairRequest();
+  /// @return the error for a request with too many entries
+  int RefuseSize();
+  bool IsClientGone() const;
   void TakeEntry(const Json::Value& entry);
   int RefuseEntry(int code, const char* message, unsigned index);
   int ForkEntry(unsigned index);
@@ -113,6 +122,7 @@ class WEBAPI_API CompoundHandler {
   Json::Value info_;
   std::list<Child> children_;
   std::string message_;
+  unsigned entryCount_ = 0;  ///< at all levels
 };
 
 }  // namespace QELO

@@ -54,6 +54,8 @@ class WEBAPI_API Pipe {
   bool WriteJson(const Json::Value& value);
   /// Whether a message was begun since the pipe was opened, be it cut short.
   bool HasWritten() const { return hasWritten_; }
+  /// Whether somebody could read what is sent: false when the write end is not open here, too.
+  bool HasReader() const;
   /// Waits for one value. @return false, with the reason logged, when none arrives whole
   bool ReadJson(Json::Value& value);
 

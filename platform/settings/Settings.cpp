@@ -54,3 +54,7 @@ bool Settings::GetSwitch(std::string_view key, bool fallback) const {
 extern "C" int QLIBCConfGetARDOTimeout(void) {
   return QELO::Platform::Settings().SessionTimeout();
 }
+
+extern "C" int QLIBCConfGetCompoundEntries(int loggedIn) {
+  return QELO::Platform::Settings().CompoundEntries(loggedIn != 0);
+}

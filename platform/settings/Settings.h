@@ -25,6 +25,11 @@ class Settings {
 
   /// Idle time-out of login sessions in seconds.
   int SessionTimeout() const { return GetNumber("session_timeout", 900, 1, 366 * 86400); }
+  /// How many entries a compound request may have.
+  int CompoundEntries(bool loggedIn) const {
+    return loggedIn ? GetNumber("compound_entries", 1024, 0, 1'000'000)
+                    : GetNumber("compound_entries_anonymous", 256, 0, 1'000'000);
+  }
   bool TokenEnabled() const { return GetSwitch("enable_token", true); }
 
  private:

@@ -79,13 +79,20 @@ static void aborted(QELO::APIRequest*, QELO::APIResponse*) {
   std::abort();
 }
 
+/// Ends its parent, and lives on for "ms" milliseconds.
+static void orphaned(QELO::APIRequest* request, QELO::APIResponse*) {
+  kill(getppid(), SIGKILL);
+  usleep(request->GetParam("ms").asUInt() * 1000);
+}
+
 #define LOSING(method) \
   { "QELO.Test.Losing", 1, #method, method }
 
 PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
-  static QELO::_tag_API_TABLE table[] = {
-      LOSING(killed),  LOSING(ended),   LOSING(hangsUp),
-      LOSING(rubbish), LOSING(nothing), LOSING(scalar),
-      LOSING(cut),     LOSING(aborted), {nullptr, 0, nullptr, nullptr}};
+  static QELO::_tag_API_TABLE table[] = {LOSING(killed),   LOSING(ended),
+                                         LOSING(hangsUp),  LOSING(rubbish),
+                                         LOSING(nothing),  LOSING(scalar),
+                                         LOSING(cut),      LOSING(aborted),
+                                         LOSING(orphaned), {nullptr, 0, nullptr, nullptr}};
   return table;
 }

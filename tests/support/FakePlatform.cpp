@@ -173,6 +173,10 @@ int QELOGroupPreferenceDirGet(const char* group, char* path, int size) {
   return preferenceDir(path, size);
 }
 
+int QLIBCConfGetCompoundEntries(int loggedIn) {
+  return loggedIn != 0 ? fake().compoundEntries : fake().compoundEntriesAnonymous;
+}
+
 int QLIBCConfGetARDOTimeout(void) {
   return fake().timeoutSetting;
 }

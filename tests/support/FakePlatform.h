@@ -28,6 +28,8 @@ struct FakePlatform {
   std::string preferenceDir = "/fake/preferences";  ///< "": the look-up fails
   int preferenceResult = 1;                         ///< result of a look-up that finds it
   int timeoutSetting = 900;
+  int compoundEntries = 1024;
+  int compoundEntriesAnonymous = 256;
   std::function<int(const std::string&, const std::string&)> setKeyValue;  ///< unset: 0
 
   // Names and addresses of the network: what each check answers.

@@ -1,5 +1,6 @@
 #include "webapi/WebEntry.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <exception>
@@ -18,6 +19,7 @@
 #include "webapi/entry/permission/PermissionCheck.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"
+#include "webapi/runner/CompoundCall.h"
 
 namespace QELO {
 namespace {
@@ -36,8 +38,11 @@ struct Credential {
 Credential readCredential(const APIRequest& request, const char* name) {
   const APIParameter<std::string> parameter =
       request.GetAndCheckString(name, APIRequest::PARAM_OPTIONAL, nullptr);
-  // Environment variables end at a NUL. What they and the request hold must not differ.
-  return {parameter.IsSet(), parameter.Get().c_str()};
+  // Environment variables end at a NUL, and a credential that something follows is another text.
+  // What stands in its place is a part of none.
+  std::string value = parameter.Get();
+  std::replace(value.begin(), value.end(), '\0', '?');
+  return {parameter.IsSet(), value};
 }
 
 std::string environmentText(const char* name) {
@@ -139,6 +144,7 @@ bool WebEntry::Initialize(const Json::Value&) {
   QeloCgiInit("", Context());
   QeloCgiLoadInCookies(Context());
   Request()->SetAttr("_collector_count_webapi", true);
+  Request()->SetAttr(kAnswersOnOutput, true);
   Json::Value session(Json::objectValue);
   session["uiLang"] = QeloCgiGetLang(Context());
   session["tokenEnable"] = QeloCgiIsTokenEnable(Context());

@@ -55,5 +55,8 @@ WEBAPI_API int QELOUserPreferenceDirGet(const char* user, char* path, int size);
 WEBAPI_API int QELOGroupPreferenceDirGet(const char* group, char* path, int size);
 /// The idle time-out of login sessions in seconds.
 WEBAPI_API int QLIBCConfGetARDOTimeout(void);
+/// The most entries of one compound request, those of compound requests within it counted.
+/// @param loggedIn  0: for a caller who is not logged in; else for one who is
+WEBAPI_API int QLIBCConfGetCompoundEntries(int loggedIn);
 
 }  // extern "C"

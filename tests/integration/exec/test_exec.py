@@ -198,7 +198,7 @@ def test_Batch_ShowsTheResultsInTheOrderOfTheCalls(tmp_path):
         "error 444: an error of the API's own",
         "no answer",
         "ok",
-        "error 101: bad or missing input",
+        "error 102: no such API",
     )
     assert process.stderr == "webapi-exec: 3 of 5 calls failed\n"
 
@@ -212,7 +212,7 @@ def test_Batch_InParallel_AndFromStandardInput():
         "error 444: an error of the API's own",
         "error 117: the method could not be run or gave no answer",
         "ok",
-        "error 101: bad or missing input",
+        "error 102: no such API",
     )
 
 

@@ -32,7 +32,7 @@ class Compound:
         fields["compound"] = json.dumps(entries)
         if self.sid is not None:
             fields["_sid"] = self.sid
-        command = ["curl", "-sS", "--include", "--max-time", "60", self.url]
+        command = ["curl", "-sS", "--include", "--max-time", "60", "-H", "Expect:", self.url]
         text = ""
         for name, value in fields.items():
             value = value if isinstance(value, str) else json.dumps(value)

@@ -87,10 +87,16 @@ TEST_F(CredentialParameters, SidSentAsNullEndsTheSession) {
   EXPECT_EQ(entry_.Request()->GetSessionID(), "");
 }
 
-TEST_F(CredentialParameters, SidWithANulIsCutSoThatRequestAndEnvironmentAgree) {
+TEST_F(CredentialParameters, CredentialWithANulIsAnotherText) {
   Initialize("_sid=X%00Y&_sharing_id=S&_sharing_sid=T%00", "a=1; id=OLD");
-  EXPECT_EQ(Environment("HTTP_COOKIE"), "a=1; abandoned=OLD; sharing_sid=T; id=X");
+  EXPECT_EQ(Environment("HTTP_COOKIE"), "a=1; abandoned=OLD; sharing_sid=T?; id=X?Y");
   EXPECT_EQ(RequestCookies(), Environment("HTTP_COOKIE"));
+}
+
+TEST_F(CredentialParameters, TokenWithANulIsAnotherText) {
+  Initialize("tid=T%00");
+  EXPECT_EQ(Environment("qeloAccessToken"), "T?");
+  EXPECT_STREQ(entry_.Request()->GetQeloAccessTokenID(), "T?");
 }
 
 TEST_F(CredentialParameters, SidWinsOverTid) {

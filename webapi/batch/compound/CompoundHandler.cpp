@@ -3,6 +3,9 @@
 
 #include "webapi/CompoundHandler.h"
 
+#include <poll.h>
+#include <unistd.h>
+
 #include <new>
 
 #include "webapi/APIRequest.h"
@@ -11,6 +14,9 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/Pipe.h"
 #include "webapi/base/Log.h"
+#include "webapi/batch/compound/EntryLimit.h"
+#include "webapi/batch/pipe/AnswerPipe.h"
+#include "webapi/runner/CompoundCall.h"
 #include "webapi/runner/execution/StandardStreams.h"
 #include "webapi/runner/execution/WorkingDirectory.h"
 
@@ -48,6 +54,8 @@ bool CompoundHandler::Process() {
     WEBAPI_LOG(kSource, "ParseParams failed");
   } else if ((code = PrepareNewCompReqResp()) != WEBAPI_ERR_NONE) {
     WEBAPI_LOG(kSource, "PrepareNewCompReqResp failed");
+  } else if (!EntryLimit::AllowsCaller(*request_, entryCount_, *runner_)) {
+    code = RefuseSize();
   } else if ((code = CompoundProcess()) != WEBAPI_ERR_NONE) {
     WEBAPI_LOG(kSource, "CompoundProcess failed");
   }
@@ -63,7 +71,18 @@ int CompoundHandler::ParseParams() {
   parallel_ = JsonHelper::asString(request_->GetParam("mode", "sequential")) == "parallel";
   stopWhenError_ = !parallel_ && JsonHelper::asBool(request_->GetParam("stop_when_error", false));
   entries_ = &request_->GetParamRef("compound", null);
-  return entries_->isArray() ? WEBAPI_ERR_NONE : WEBAPI_ERR_NO_COMPOUND;
+  if (!entries_->isArray()) {
+    return WEBAPI_ERR_NO_COMPOUND;
+  }
+  const unsigned most = EntryLimit::Most(*request_);
+  entryCount_ = EntryLimit::Count(*entries_, most);
+  return entryCount_ <= most ? WEBAPI_ERR_NONE : RefuseSize();
+}
+
+int CompoundHandler::RefuseSize() {
+  message_ = "too many compound entries.";
+  WEBAPI_LOG(kSource, "too many compound entries");
+  return WEBAPI_ERR_NO_COMPOUND;
 }
 
 int CompoundHandler::PrepareNewCompReqResp() {
@@ -105,13 +124,8 @@ void CompoundHandler::RepairRequest() {
   }
 }
 
-/// What an entry does not name must not come from the one before it, which would run again.
 void CompoundHandler::TakeEntry(const Json::Value& entry) {
   RepairRequest();
-  Json::Value& call = entryRequest_->Serialize()["private"];
-  for (const char* key : {"api", "version", "method"}) {
-    call.removeMember(key);
-  }
   entryRequest_->InitParam(asPostParameters(entry), true);
 }
 
@@ -142,12 +156,26 @@ void CompoundHandler::PreloadLibs(const Json::Value& value, bool top) {
   runner_->CacheLib(entryRequest_.get(), &handle);
 }
 
+/// Work for a client, or a parent, who has gone helps nobody.
+bool CompoundHandler::IsClientGone() const {
+  pollfd output{STDOUT_FILENO, 0, 0};
+  return !isAnswerAwaited() ||
+         (JsonHelper::asBool(request_->GetAttr(kAnswersOnOutput)) && poll(&output, 1, 0) > 0 &&
+          (output.revents & (POLLERR | POLLHUP)) != 0);
+}
+
 int CompoundHandler::CompoundProcess() {
   data_["result"] = Json::Value(Json::arrayValue);
   if (!parallel_) {
     PreloadLibs();
   }
   for (unsigned index = 0; index < entries_->size(); ++index) {
+    if (IsClientGone()) {
+      WEBAPI_LOG(kSource, "nobody reads the answer, %u entries are left out",
+                 entries_->size() - index);
+      hasFail_ = true;
+      break;
+    }
     if (CompoundProcessEntry((*entries_)[index], index) != WEBAPI_ERR_NONE) {
       hasFail_ = true;
     }

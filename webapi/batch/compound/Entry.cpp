@@ -17,6 +17,8 @@
 #include "webapi/Pipe.h"
 #include "webapi/base/Log.h"
 #include "webapi/base/NullDevice.h"
+#include "webapi/batch/compound/EntryLimit.h"
+#include "webapi/batch/pipe/AnswerPipe.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO {
@@ -64,6 +66,7 @@ int CompoundHandler::RefuseEntry(int code, const char* message, unsigned index) 
 
 int CompoundHandler::CompoundProcessEntry(const Json::Value& entry, unsigned index) {
   TakeEntry(entry);
+  EntryLimit::Mark(*entryRequest_, entryCount_);
   // An entry that ends without an answer must not show the one before it.
   entryResponse_->SetError(WEBAPI_ERR_NO_ANSWER);
   if (stopWhenError_ && hasFail_) {
@@ -141,6 +144,7 @@ void CompoundHandler::RunChild(Pipe& pipe, pid_t parent) noexcept {
   }
   entryResponse_->GetCallbackFuncs()->clear();
   pipe.WriteOnly(-1);
+  takeAnswerPipe(pipe);
   runner_->Process(entryRequest_.get(), entryResponse_.get());
   SendAnswer(pipe);
   pipe.Close();

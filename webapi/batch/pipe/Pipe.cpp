@@ -2,6 +2,7 @@
 
 #include <errno.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <signal.h>
 #include <sys/socket.h>
 #include <unistd.h>
@@ -189,6 +190,11 @@ bool Pipe::WriteJson(const Json::Value& value) {
   }
   hasWritten_ = true;
   return TEMP_FAILURE_RETRY(write(writeEnd_, text.data(), length)) == static_cast<ssize_t>(length);
+}
+
+bool Pipe::HasReader() const {
+  pollfd end{writeEnd_, 0, 0};
+  return writeEnd_ >= 0 && poll(&end, 1, 0) >= 0 && (end.revents & (POLLERR | POLLHUP)) == 0;
 }
 
 bool Pipe::ReadJson(Json::Value& value) {

@@ -19,6 +19,8 @@
 #include "webapi/base/Log.h"
 #include "webapi/base/NullDevice.h"
 #include "webapi/base/TextFile.h"
+#include "webapi/batch/pipe/AnswerPipe.h"
+#include "webapi/model/request/CallerSession.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
 #include "webapi/runner/execution/WorkingDirectory.h"
@@ -130,12 +132,7 @@ bool ExecHandler::CheckParams() {
 }
 
 void ExecHandler::PrepareReq() {
-  Json::Value session;
-  session["username"] = param_->GetRunner();
-  session["isAdmin"] = QLIBGroupIsAdminGroupMem(param_->GetRunner().c_str(), 0) == 1;
-  session["isTimeout"] = false;
-  session["isAuthorized"] = true;
-  request_["session"] = session;
+  request_["session"] = makeUserSession(param_->GetRunner());
   request_["environ"] = objectOr(param_->GetEnv());
   request_["environ"]["REQUEST_METHOD"] = "POST";
   request_["postParam"] = objectOr(param_->GetParams());
@@ -197,6 +194,7 @@ void ExecHandler::RunForkForStdout() {
 
 void ExecHandler::RunChild(Pipe& result) noexcept {
   result.WriteOnly(-1);
+  takeAnswerPipe(result);
   Run(true);
   std::cout.flush();
   fflush(stdout);

@@ -154,6 +154,7 @@ TEST_F(CompoundChild, LimitOfDescriptorsGivesTheRest117) {
 }
 
 TEST_F(CompoundChild, FiveHundredInParallelAllAnswer) {
+  platform->compoundEntriesAnonymous = 500;
   const Json::Value result = RunCompound(manyEntries(Entry("echo"), 500), kParallel);
   ASSERT_EQ(result.size(), 500u);
   for (unsigned i = 0; i < 500; ++i) {

@@ -53,21 +53,15 @@ TEST_F(Compound, ResultIsTheBodyWithTheCallInBothModesAndPlaces) {
   }
 }
 
-TEST_F(Compound, EntryThatNamesNoCallIs101AndRunsNothing) {
+TEST_F(Compound, EntryThatNamesACallInAnUnusableWayIs101) {
   for (const char* more : {"{}", kParallel}) {
-    Json::Value compound = List({Entry("echo", 2)});
-    for (const char* text : {"{}", "5", "null", "[]", "\"text\"", R"({"a": 1})",
-                             R"({"api": "", "version": 1, "method": "echo"})",
-                             R"({"api": "QELO.Test.Entries", "version": 0, "method": "echo"})",
-                             R"({"api": "QELO.Test.Entries", "method": "echo"})",
-                             R"({"api": "QELO.Test.Entries", "version": 2})"}) {
-      compound.append(Parse(text));
-    }
-    const Json::Value result = RunCompound(compound, more);
-    ASSERT_EQ(result.size(), 11u);
-    EXPECT_EQ(Code(result[0]), 0);
-    for (unsigned i = 1; i < result.size(); ++i) {
-      EXPECT_EQ(result[i], Parse(R"({"success": false, "error": {"code": 101}})")) << i;
+    const Json::Value result = RunCompound(
+        List({Parse(R"({"api": "", "version": 1, "method": "echo"})"),
+              Parse(R"({"api": "QELO.Test.Entries", "version": 0, "method": "echo"})")}),
+        more);
+    ASSERT_EQ(result.size(), 2u);
+    for (const Json::Value& entry : result) {
+      EXPECT_EQ(entry, Parse(R"({"success": false, "error": {"code": 101}})"));
     }
   }
 }

@@ -24,11 +24,11 @@ class CompoundTest : public RunnerTest {
     std::filesystem::permissions(directory, std::filesystem::perms::all);
     WriteLibDef("{}");
     DescribeEntries();
-    WriteDescription(
-        Listing("losing",
-                {"killed", "ended", "hangsUp", "rubbish", "nothing", "scalar", "cut", "aborted"},
-                R"({"1": {}})"),
-        "QELO.Test.Losing");
+    WriteDescription(Listing("losing",
+                             {"killed", "ended", "hangsUp", "rubbish", "nothing", "scalar", "cut",
+                              "aborted", "orphaned"},
+                             R"({"1": {}})"),
+                     "QELO.Test.Losing");
     Json::Value entry = Parse(R"({"lib": "", "minVersion": 1, "maxVersion": 1})");
     entry["methods"]["1"][0] = "request";
     WriteDescription(entry, "QELO.Entry.Request");
@@ -45,11 +45,12 @@ class CompoundTest : public RunnerTest {
   }
 
   static void DescribeEntries() {
-    WriteDescription(Listing("entries",
-                             {"echo", "process", "fail", "large", "slow", "deep", "mark", "found",
-                              "restart", "silent", "later", "refused", "upload", "download"},
-                             R"({"1": {}, "2": {"grantable": true}})"),
-                     "QELO.Test.Entries");
+    WriteDescription(
+        Listing("entries",
+                {"echo", "process", "fail", "large", "slow", "deep", "mark", "found", "restart",
+                 "silent", "later", "refused", "upload", "download", "descriptors"},
+                R"({"1": {}, "2": {"grantable": true}})"),
+        "QELO.Test.Entries");
   }
 
   /// A description of these methods in the versions, each with its attributes; "upload" and

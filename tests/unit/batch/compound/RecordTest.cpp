@@ -59,6 +59,35 @@ TEST_F(CompoundRecord, HeadersOfEntriesAreNotTheOuterOnes) {
   EXPECT_FALSE(response->HasHeader("X-Mark"));
 }
 
+TEST_F(CompoundRecord, WhatAnEntryDoesNotNameIsAsTheOneBeforeItLeftIt) {
+  for (const char* more : {"{}", kParallel}) {
+    Json::Value compound = List({Entry("echo", 2, R"({"x": 1})")});
+    for (const char* text : {"{}", "5", "null", "[]", R"("text")", R"({"a": 1})",
+                             R"({"api": "QELO.Test.Entries", "method": "echo"})"}) {
+      compound.append(Parse(text));
+    }
+    compound.append(Parse(R"({"method": "silent"})"));
+    compound.append(Parse(R"({"version": 1, "method": "echo"})"));
+    compound.append(Parse("{}"));
+    const Json::Value result = RunCompound(compound, more);
+    ASSERT_EQ(result.size(), 11u);
+    for (unsigned i = 0; i < 8; ++i) {
+      EXPECT_EQ(Code(result[i]), 0) << i;
+      EXPECT_EQ(result[i]["version"], 2) << i;
+      EXPECT_EQ(result[i]["data"].isMember("x"), i == 0) << "parameters are each entry's own";
+    }
+    EXPECT_EQ(Code(result[8]), 117) << "the silent method's";
+    EXPECT_EQ(result[10]["version"], 1);
+    EXPECT_EQ(result[10]["method"], "echo");
+  }
+}
+
+TEST_F(CompoundRecord, FirstEntryThatNamesNothingIsAsTheOuterCall) {
+  const Json::Value result = RunCompound(List({Parse("{}")}), kParallel);
+  EXPECT_EQ(Code(result[0]), 110);
+  EXPECT_EQ(result[0]["api"], "QELO.Entry.Request");
+}
+
 // What no record should hold
 
 TEST_F(CompoundRecord, BodyThatIsNoObjectShowsTheCallAlone) {
