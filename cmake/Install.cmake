@@ -41,11 +41,27 @@ set(webapi_task_dir ${WEBAPI_ROOT_PREFIX}/var/lib/webapi/tasks)
 install(DIRECTORY DESTINATION ${webapi_task_dir})
 install(CODE "execute_process(COMMAND chmod 1733 \"\$ENV{DESTDIR}${webapi_task_dir}\"
                               COMMAND_ERROR_IS_FATAL ANY)")
+# The places of root and of the account that methods run as, before somebody else takes them. A
+# package makes them where it is installed, by the ids of that host.
+install(CODE "
+  if(NOT \"\$ENV{DESTDIR}\")
+    execute_process(COMMAND sh -c \"
+      for name in root system; do
+        uid=\\$(id -u \\$name 2> /dev/null) || continue
+        place='${webapi_task_dir}'/\\$uid
+        if mkdir -m 0700 \\\"\\$place\\\" 2> /dev/null; then
+          chown -h \\$uid:\\$(id -g \\$name) \\\"\\$place\\\"
+        elif [ \\\"\\$(stat -c %u \\\"\\$place\\\")\\\" != \\$uid ]; then
+          echo \\\"\\$place is not \\$name's: remove it, or \\$name can have no tasks\\\" >&2
+        fi
+      done\" COMMAND_ERROR_IS_FATAL ANY)
+  endif()")
 get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
 install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
 
 # The documents stand to each other as in the source tree, so their links work.
 install(FILES README.md DEVELOPING.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
-install(FILES packaging/lighttpd.conf.in packaging/nginx.conf.in packaging/apache2.conf.in
+install(FILES packaging/lighttpd.conf.in packaging/lighttpd.service.conf packaging/nginx.conf.in
+              packaging/apache2.conf.in
         DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)

@@ -27,7 +27,8 @@ using QELO::APIRequest;
 using QELO::APIResponse;
 
 constexpr char kPrefix[] = "checksum_";
-constexpr int kMostRunning = 4;  ///< tasks of a user at once
+constexpr int kMostRunning = 4;     ///< tasks of a user at once
+constexpr int kLimitReached = 507;  ///< of APIPolling
 constexpr int kNiceness = 10;
 
 enum Error : int { kUnreadable = 400, kTooMany = 401 };
@@ -94,14 +95,12 @@ void Start(APIRequest* request, APIResponse* response) {
     return;
   }
   APIPolling polling(request);
-  int running = 0;
-  if (!polling.CountRunning(kPrefix, running) || running >= kMostRunning) {
-    response->SetError(kTooMany);
-    return;
-  }
   polling.SetPrefixAttr(kPrefix);
   polling.SetRemoveAttr(false);  // the result is there to be fetched
-  polling.Start(response, Work, &job);
+  polling.SetLimit(kMostRunning);
+  if (!polling.Start(response, Work, &job) && polling.GetError() == kLimitReached) {
+    response->SetError(kTooMany);
+  }
 }
 
 QELO::_tag_API_TABLE table[] = {

@@ -29,8 +29,10 @@ class APIResponse;
 /// | 501 | the record could not be changed                                         |
 /// | 502 | no request, or bad parameters                                           |
 /// | 503 | not a task id, or another user's task; List(): unknown group            |
+/// | 504 | the store of the record is busy; there may be such a task all the same  |
 /// | 505 | List(): the administrators' tasks, asked by somebody else               |
 /// | 506 | the process could not be signalled                                      |
+/// | 507 | Start(): as many tasks run as SetLimit() allows                         |
 /// | 508 | no such task                                                            |
 class WEBAPI_API APIPolling {
  public:
@@ -45,6 +47,8 @@ class WEBAPI_API APIPolling {
   APIPolling(const APIPolling&) = delete;
   APIPolling& operator=(const APIPolling&) = delete;
   virtual ~APIPolling();
+  /// For programs that serve no request and answer for the user: what this user may do.
+  static std::unique_ptr<APIPolling> ForUser(const std::string& user);
   void SetRequest(APIRequest* request);
 
   /// What the next Start() goes by. @return false, and nothing changes, when it is refused
@@ -58,6 +62,9 @@ class WEBAPI_API APIPolling {
   /// "": the login user's own task, the default; "admin": the administrators', by one of them
   /// only; "everyone": everybody's, who may all see its parameters and stop it.
   bool SetGroupAttr(const std::string& group);
+  /// So many of the owner's tasks with the prefix run at once, however many are started at the same
+  /// moment; a further start is 507. 0: any number, the default.
+  void SetLimit(int most);
 
   /// Runs `work` in a background process, which outlives the request and has the credentials of
   /// the moment. The response answers {"task_id": full id}: at once when the work sets its first
@@ -65,11 +72,11 @@ class WEBAPI_API APIPolling {
   ///
   /// In the background process: `work` gets the same request and response and sets a result as
   /// often as it likes; each is what a status shows from then on. The request's environment is
-  /// replaced by "task_id", "task_user" and "full_task_id". When `work` returns the task ends; when
-  /// it throws, returns without a result, or its last one cannot be stored, the result is error
-  /// 117. It need not return: a stop is SIGTERM. Standard streams lead to /dev/null; ends of pipes
-  /// and socket pairs whose other end only other processes have are closed. `work` does not run
-  /// when the task was stopped before.
+  /// replaced by "task_id", "task_user" and "full_task_id". When `work` returns or throws the task
+  /// ends with the result that was stored last, error 117 when none was. It need not return: a stop
+  /// is SIGTERM. Standard streams lead to /dev/null; ends of pipes and socket pairs whose other end
+  /// only other processes have lead there too. `work` does not run when the task was stopped
+  /// before.
   ///
   /// "info" never holds the credentials that a request may carry as parameters.
   /// @param arg  handed to `work`
@@ -80,7 +87,8 @@ class WEBAPI_API APIPolling {
   /// The status of one task.
   bool Status(const std::string& fullId, Json::Value& out);
   bool Status(const char* fullId, Json::Value& out);
-  /// The status of each task by its full id; {} for one that is missing or not the caller's.
+  /// The status of each task by its full id; {} for one that is missing or not the caller's,
+  /// {"busy": true} for one whose store is busy.
   /// @param fullIds  array of strings
   bool Status(const Json::Value& fullIds, Json::Value& out);
 
@@ -95,6 +103,12 @@ class WEBAPI_API APIPolling {
   /// An id that cannot be split is 502 here.
   bool Stop(const std::string& fullId, bool remove);
 
+  /// Keeps the record of a task that would go with the end of its work, its last result with it.
+  /// @return whether it does so because of this; 500 in GetError() when it is kept anyway
+  bool Keep(const std::string& fullId);
+  /// Takes Keep() back: the record goes with the end of the work, at once when that has ended.
+  bool Release(const std::string& fullId);
+
   /// The full ids of the caller's tasks by group: arrays, null for none.
   /// @param prefix  only task ids that start with it; "": all
   /// @param groups  array of "user", "admin" and "everyone"
@@ -107,6 +121,8 @@ class WEBAPI_API APIPolling {
 
   void SetError(int code);
   int GetError() const;
+  /// What an error above means, for people; null for other numbers.
+  static const char* ErrorText(int code);
 
  private:
   std::unique_ptr<APIPollingPrivate> private_;

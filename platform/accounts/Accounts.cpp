@@ -18,7 +18,7 @@ int isAdministrator(const Settings& settings, const Account& account) {
 
 bool isBarredFromLogin(const Account& account) {
   const std::string shell = account.shell.substr(account.shell.rfind('/') + 1);
-  return account.name == "system" || shell == "nologin" || shell == "false";
+  return account.name == kWorkingAccount || shell == "nologin" || shell == "false";
 }
 
 }  // namespace QELO::Platform

@@ -9,6 +9,9 @@ namespace QELO::Platform {
 /// @return 1 or 0, -1 when that cannot be told
 int isAdministrator(const Settings& settings, const Account& account);
 
+/// The account that methods run as when their description names no other.
+inline constexpr char kWorkingAccount[] = "system";
+
 /// Accounts that nobody logs in to, whatever the password: "system", and those without a shell.
 bool isBarredFromLogin(const Account& account);
 

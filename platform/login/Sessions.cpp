@@ -3,6 +3,7 @@
 #include "platform/base/TextBuffer.h"
 #include "platform/login/SessionStore.h"
 #include "platform/settings/Settings.h"
+#include "platform/tasks/StorePlace.h"
 #include "webapi/platform/Session.h"
 
 using namespace QELO::Platform;
@@ -34,6 +35,7 @@ int QeloSessionCreate(const char* user, const char* address, char* id, char* tok
   if (!store.Create(session, newId, newToken)) {
     return -1;
   }
+  reserveTaskStore(account.uid, account.gid);
   fillBuffer(newId, id, kBufferSize);
   fillBuffer(newToken, token, kBufferSize);
   return 0;

@@ -49,28 +49,36 @@ TaskStores* openTaskStores() {
 
 bool makeTaskKey(const std::string& owner, const std::string& id, TaskKey& key) {
   uid_t store = 0;
-  if (owner.empty() || owner.size() > kOwnerLength || !readTaskId(id, store)) {
+  if (owner.empty() || owner.size() > kOwnerLength || !readTaskId(id, store) ||
+      (store != geteuid() && geteuid() != 0)) {
     return false;
   }
-  if (store != geteuid() && (geteuid() != 0 || !mayHoldTasksOf(store, owner))) {
+  const Standing standing = standingOf(store, owner);
+  if (standing == Standing::kNothing) {
     return false;
   }
-  key = {store, owner, id};
+  key = {store, owner, id, patienceWith(standing)};
   return true;
 }
 
-bool mayHoldTasksOf(uid_t store, const std::string& owner) {
+Standing standingOf(uid_t store, const std::string& owner) {
   Account account;
   if (store == geteuid()) {
-    return true;
+    return Standing::kOwn;
   }
   if (findAccount(nameOf(store), account) != Lookup::kFound || account.uid != store) {
-    return false;
+    return Standing::kNothing;
   }
-  if (isBarredFromLogin(account) || owner == account.name || owner == kEverybody) {
-    return true;
+  if (account.name == kWorkingAccount || owner == account.name) {
+    return Standing::kOwn;
   }
-  return owner == kAdministrators && isAdministrator(Settings(), account) == 1;
+  const bool isShared = owner == kEverybody ||
+                        (owner == kAdministrators && isAdministrator(Settings(), account) == 1);
+  return isShared ? Standing::kShared : Standing::kNothing;
+}
+
+int patienceWith(Standing standing) {
+  return standing == Standing::kOwn ? kOwnStoreMs : kForeignStoreMs;
 }
 
 }  // namespace QELO::Platform

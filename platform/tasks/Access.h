@@ -16,9 +16,20 @@ TaskStores* openTaskStores();
 ///         not reach that store: everybody may reach his own, root all
 bool makeTaskKey(const std::string& owner, const std::string& id, TaskKey& key);
 
-/// Whether a user's store may hold tasks of this owner. What a user's processes write there, that
-/// user may forge: it counts for the user, for everybody, and with an administrator for the
-/// administrators. Accounts that nobody logs in to do work for others.
-bool mayHoldTasksOf(uid_t store, const std::string& owner);
+/// What a user's store counts for when tasks of an owner are asked for.
+enum class Standing {
+  kNothing,  ///< it may hold none of them
+  kShared,   ///< it may hold what is everybody's or the administrators'; nobody waits for it for
+             ///< long
+  kOwn       ///< it is the process's own, the owner's or that of the account that methods run as
+};
+
+/// What a user's processes write to the user's store, that user may forge: it counts for the user,
+/// for everybody, and with an administrator for the administrators. The account "system" alone does
+/// work for others.
+Standing standingOf(uid_t store, const std::string& owner);
+
+/// How long to wait for a store, in milliseconds.
+int patienceWith(Standing standing);
 
 }  // namespace QELO::Platform

@@ -30,6 +30,7 @@ struct TaskPrivate {
   bool refused = false;  ///< a value of the update cannot be stored
   TaskProperties pending;
   Read read = Read::kNot;
+  bool busy = false;      ///< the last read found the store busy
   bool wasThere = false;  ///< the record was seen or stored by this object
   TaskRecord record;
 
@@ -97,6 +98,7 @@ bool TaskPrivate::Load() {
     record = {};
   }
   read = result == TaskResult::kDone ? Read::kThere : Read::kMissing;
+  busy = result == TaskResult::kBusy;
   wasThere = wasThere || read == Read::kThere;
   return read == Read::kThere;
 }
@@ -203,6 +205,10 @@ bool Task::reload() {
   return private_->Load();
 }
 
+bool Task::isBusy() const {
+  return private_->busy;
+}
+
 bool Task::setCreatePid(int pid) {
   Platform::ProcessIdentity process;
   return Platform::identifyProcess(pid, process) &&
@@ -236,7 +242,7 @@ bool Task::waitForDataReady(const std::string& name, int limit) {
     if (there && private_->record.properties.count(name) > 0) {
       return true;
     }
-    const bool over = there ? private_->IsFinished() : private_->wasThere;
+    const bool over = there ? private_->IsFinished() : private_->wasThere && !private_->busy;
     if (over || !sleepUntilChange(watch, deadline)) {
       return false;
     }
@@ -251,8 +257,9 @@ bool Task::waitForChange(int limit) {
   const TaskEnding ending = private_->record.ending;
   while (true) {
     const bool there = private_->Load();
-    if (there != before || private_->record.version != version ||
-        private_->record.ending != ending) {
+    const bool changed =
+        there != before || private_->record.version != version || private_->record.ending != ending;
+    if (changed && !private_->busy) {
       return true;
     }
     if (!sleepUntilChange(watch, deadline)) {

@@ -14,17 +14,24 @@ namespace ARDO {
 
 namespace {
 
-Json::Value listTasks(const std::string& owner, const char* prefix, bool unended) {
+/// @param incomplete  receives whether a store that is waited for was busy
+Json::Value listTasks(const std::string& owner, const char* prefix, bool unended,
+                      bool& incomplete) {
   Json::Value ids(Json::arrayValue);
   std::vector<ListedTask> tasks;
+  incomplete = false;
   TaskStores* stores = openTaskStores();
   if (stores == nullptr) {
     return ids;
   }
   for (const uid_t store : stores->Stores()) {
-    if (mayHoldTasksOf(store, owner)) {
-      stores->List({store, owner, prefix != nullptr ? prefix : "", unended}, tasks);
+    const Standing standing = standingOf(store, owner);
+    if (standing == Standing::kNothing) {
+      continue;
     }
+    const TaskResult result = stores->List(
+        {store, owner, prefix != nullptr ? prefix : "", unended, patienceWith(standing)}, tasks);
+    incomplete = incomplete || (result == TaskResult::kBusy && standing == Standing::kOwn);
   }
   const auto isOlder = [](const ListedTask& left, const ListedTask& right) {
     return left.created < right.created;
@@ -43,11 +50,11 @@ Json::Value listTasks(const std::string& owner, const char* prefix, bool unended
 TaskMgr::TaskMgr(const std::string& owner) : owner_(owner) {}
 
 Json::Value TaskMgr::getAllTaskId(const char* prefix) {
-  return listTasks(owner_, prefix, false);
+  return listTasks(owner_, prefix, false, isIncomplete_);
 }
 
 Json::Value TaskMgr::getUnendedTaskId(const char* prefix) {
-  return listTasks(owner_, prefix, true);
+  return listTasks(owner_, prefix, true, isIncomplete_);
 }
 
 std::string TaskUtil::getUniqueID(const std::string&, const std::string& prefix) {

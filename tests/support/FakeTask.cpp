@@ -201,7 +201,9 @@ bool Task::endUpdate() {
           record["properties"][name] = private_->pending[name];
         }
       });
-  return stored && reload();
+  const bool there = stored && reload();
+  passTime("endUpdate");
+  return there;
 }
 
 Json::Value Task::getProperty(const std::string& name) const {
@@ -239,8 +241,13 @@ bool Task::remove() {
 }
 
 bool Task::reload() {
-  private_->record = FakeTask::Get().Record(private_->owner, private_->id);
+  private_->record =
+      FakeTask::Get().busy ? Json::Value() : FakeTask::Get().Record(private_->owner, private_->id);
   return !private_->record.isNull();
+}
+
+bool Task::isBusy() const {
+  return FakeTask::Get().busy && private_->record.isNull();
 }
 
 bool Task::setCreatePid(int pid) {
@@ -300,10 +307,11 @@ Json::Value TaskMgr::getUnendedTaskId(const char* prefix) {
 }
 
 Json::Value TaskMgr::getAllTaskId(const char* prefix) {
+  isIncomplete_ = FakeTask::Get().busy;
   note("getAllTaskId(" + owner_ + ", " + (prefix != nullptr ? prefix : "null") + ")");
   Json::Value ids(Json::arrayValue);
   for (const std::string& id : FakeTask::Get().Ids(owner_)) {
-    if (prefix == nullptr || id.rfind(prefix, 0) == 0) {
+    if (!isIncomplete_ && (prefix == nullptr || id.rfind(prefix, 0) == 0)) {
       ids.append(id);
     }
   }
@@ -316,7 +324,7 @@ std::string TaskUtil::getUniqueID(const std::string& owner, const std::string& p
 }
 
 bool TaskUtil::checkTaskExists(const std::string& owner, const std::string& taskId) {
-  const bool exists = !FakeTask::Get().Record(owner, taskId).isNull();
+  const bool exists = !FakeTask::Get().busy && !FakeTask::Get().Record(owner, taskId).isNull();
   passTime("checkTaskExists");
   return exists;
 }

@@ -25,6 +25,7 @@ struct FakeTask {
   bool finish = true;               ///< false: nothing is stored
   bool setCreatePid = true;         ///< false: nothing is stored
   bool tellDead = false;            ///< getCreatePid answers a process that has ended, too
+  bool busy = false;                ///< no record can be read
   size_t largestUpdate = SIZE_MAX;  ///< longer ones, as JSON text, are not stored
   /// Called by operations once they have looked at the records or changed them: what another
   /// process does in that moment. Named as in `calls`.

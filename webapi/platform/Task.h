@@ -46,6 +46,8 @@ class WEBAPI_API Task {
   bool remove();
   /// Reads the record anew. @return false when there is none
   bool reload();
+  /// Whether the last read found the store busy, so that there may be a record all the same.
+  bool isBusy() const;
 
   /// Records the process that does the work, by its id and start time.
   bool setCreatePid(int pid);
@@ -77,9 +79,13 @@ class WEBAPI_API TaskMgr {
   Json::Value getAllTaskId(const char* prefix);
   /// Of those the ones that nobody has found ended yet. Ended ones cost nothing, however many.
   Json::Value getUnendedTaskId(const char* prefix);
+  /// Whether the last list lacks tasks of the owner because a store that is waited for was busy.
+  /// Stores of other users, which may hold what is everybody's, are left out when they are.
+  bool isIncomplete() const { return isIncomplete_; }
 
  private:
   std::string owner_;
+  bool isIncomplete_ = false;
 };
 
 class WEBAPI_API TaskUtil {

@@ -51,29 +51,36 @@ void StoreConnection::Drop() {
 }
 
 StoreConnection::Use::Use(StoreConnection& connection, const TaskStoreSettings& settings,
-                          uid_t store, bool create)
+                          const Wanted& wanted, bool create)
     : connection_(connection), entered_(connection.Enter()) {
+  if (entered_) {
+    patience_.emplace(wanted.patienceMs);
+  }
   if (!entered_) {
     error_ = "an operation is under way";
   } else if (connection_.database_ && connection_.process_ != getpid()) {
     error_ = "the connection belongs to a parent process";
-  } else if (connection_.database_ && connection_.store_ == store &&
+  } else if (connection_.database_ && connection_.store_ == wanted.store &&
              findDatabaseFile(connection_.directory_) == connection_.file_) {
-    state_ =
-        TakeRights(store, connection_.directory_.Group()) ? TaskResult::kDone : TaskResult::kFailed;
+    connection_.database_->SetPatience(wanted.patienceMs);
+    state_ = TakeRights(wanted.store, connection_.directory_.Group()) ? TaskResult::kDone
+                                                                      : TaskResult::kFailed;
   } else {
-    Open(settings, store, create);
+    Open(settings, wanted, create);
   }
 }
 
 StoreConnection::Use::~Use() {
   rights_.reset();
+  patience_.reset();
   if (entered_) {
     connection_.Leave();
   }
 }
 
-void StoreConnection::Use::Open(const TaskStoreSettings& settings, uid_t store, bool create) {
+void StoreConnection::Use::Open(const TaskStoreSettings& settings, const Wanted& wanted,
+                                bool create) {
+  const uid_t store = wanted.store;
   connection_.Drop();
   StoreDirectory directory;
   const StoreDirectory::Result opened = directory.Open(settings.directory, store, create);
@@ -86,10 +93,8 @@ void StoreConnection::Use::Open(const TaskStoreSettings& settings, uid_t store, 
   if (!TakeRights(store, directory.Group())) {
     return;
   }
-  bool missing = false;
-  sqlite3* database = openTaskDatabase(directory, store, create, missing, error_);
+  sqlite3* database = openTaskDatabase(directory, store, create, state_, error_);
   if (database == nullptr) {
-    state_ = missing && !create ? TaskResult::kMissing : TaskResult::kFailed;
     return;
   }
   connection_.process_ = getpid();
@@ -97,6 +102,7 @@ void StoreConnection::Use::Open(const TaskStoreSettings& settings, uid_t store, 
   connection_.file_ = findDatabaseFile(directory);
   connection_.directory_ = std::move(directory);
   connection_.database_ = std::make_unique<TaskDatabase>(database, settings.keepSeconds);
+  connection_.database_->SetPatience(wanted.patienceMs);
   state_ = TaskResult::kDone;
 }
 

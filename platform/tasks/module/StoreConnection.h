@@ -9,6 +9,7 @@
 #include <string>
 
 #include "platform/tasks/module/FileUser.h"
+#include "platform/tasks/module/Patience.h"
 #include "platform/tasks/module/StoreDirectory.h"
 #include "platform/tasks/module/TaskDatabase.h"
 #include "platform/tasks/module/TaskSchema.h"
@@ -24,17 +25,24 @@ class StoreConnection {
  public:
   static StoreConnection& Get();
 
+  /// Which store, and how long to wait for it.
+  struct Wanted {
+    uid_t store;
+    int patienceMs;
+  };
+
   /// Uses the connection while it lives, with the rights of the store's user, and keeps other
   /// threads and forks waiting.
   class Use {
    public:
     /// @param create  makes the store when missing, if it is the effective user's own
-    Use(StoreConnection& connection, const TaskStoreSettings& settings, uid_t store, bool create);
+    Use(StoreConnection& connection, const TaskStoreSettings& settings, const Wanted& wanted,
+        bool create);
     ~Use();
     Use(const Use&) = delete;
     Use& operator=(const Use&) = delete;
 
-    /// kDone: Database() can be used; kMissing: there is no store; kFailed: see Error().
+    /// kDone: Database() can be used; kMissing: there is no store; kFailed, kBusy: see Error().
     TaskResult State() const { return state_; }
     TaskDatabase& Database() { return *connection_.database_; }
     /// Tells those who watch the store that it has changed.
@@ -42,11 +50,12 @@ class StoreConnection {
     const std::string& Error() const { return error_; }
 
    private:
-    void Open(const TaskStoreSettings& settings, uid_t store, bool create);
+    void Open(const TaskStoreSettings& settings, const Wanted& wanted, bool create);
     bool TakeRights(uid_t store, gid_t group);
 
     StoreConnection& connection_;
     bool entered_;
+    std::optional<Patience> patience_;
     std::optional<FileUser> rights_;
     TaskResult state_ = TaskResult::kFailed;
     std::string error_;

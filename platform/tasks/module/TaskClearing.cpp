@@ -65,7 +65,7 @@ void TaskDatabase::Tidy() {
       transaction.Commit();
     }
   }
-  sqlite3_busy_timeout(database_.get(), kTaskBusyMs);
+  sqlite3_busy_timeout(database_.get(), patienceMs_);
 }
 
 bool TaskDatabase::HasEnded(int64_t before) {

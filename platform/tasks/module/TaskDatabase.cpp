@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <tuple>
 
+#include "platform/tasks/module/Patience.h"
 #include "platform/tasks/module/Transaction.h"
 
 namespace QELO::Platform {
@@ -127,6 +128,13 @@ TaskResult TaskDatabase::List(const TaskQuery& query, std::vector<ListedTask>& t
   return statement.Good() ? TaskResult::kDone : Fail();
 }
 
+void TaskDatabase::SetPatience(int milliseconds) {
+  if (milliseconds != patienceMs_) {
+    patienceMs_ = milliseconds;
+    sqlite3_busy_timeout(database_.get(), milliseconds);
+  }
+}
+
 sqlite3_stmt* TaskDatabase::Prepare(const char* sql) {
   auto& statement = statements_[sql];
   if (!statement) {
@@ -204,7 +212,7 @@ TaskResult TaskDatabase::Changed(bool run) {
 
 TaskResult TaskDatabase::Fail() {
   error_ = sqlite3_errmsg(database_.get());
-  return TaskResult::kFailed;
+  return isHeldByOthers(database_.get()) ? TaskResult::kBusy : TaskResult::kFailed;
 }
 
 }  // namespace QELO::Platform

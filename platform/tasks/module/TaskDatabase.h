@@ -14,7 +14,7 @@ namespace QELO::Platform {
 /// One connection to the records of one store. It must not be used by a child of the process that
 /// made it, nor be open when that process forks.
 ///
-/// Every operation is a transaction of its own; Error() tells why one returned kFailed.
+/// Every operation is a transaction of its own; Error() tells why one returned kFailed or kBusy.
 class TaskDatabase {
  public:
   /// Most bytes that the properties of one record may hold.
@@ -41,6 +41,9 @@ class TaskDatabase {
   /// Clears first, unless others are writing.
   /// @param tasks  receives the tasks, oldest first, when it is empty
   TaskResult List(const TaskQuery& query, std::vector<ListedTask>& tasks);
+
+  /// How long it waits for others from now on.
+  void SetPatience(int milliseconds);
 
   const std::string& Error() const { return error_; }
 
@@ -80,6 +83,7 @@ class TaskDatabase {
 
   std::unique_ptr<sqlite3, Close> database_;
   KeepSeconds keepSeconds_;
+  int patienceMs_ = 0;
   std::unordered_map<const char*, std::unique_ptr<sqlite3_stmt, Finalize>> statements_;
   std::string error_;
 };

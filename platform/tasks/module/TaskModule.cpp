@@ -21,18 +21,18 @@ class DatabaseStores final : public TaskStores {
 
   TaskResult Load(const TaskKey& key, TaskRecord& record) override;
   TaskResult Update(const TaskKey& key, const TaskProperties& properties) override {
-    return Change(key.store, true,
+    return Change(key, true,
                   [&](TaskDatabase& database) { return database.Update(key, properties); });
   }
   TaskResult SetProcess(const TaskKey& key, const ProcessIdentity& process) override {
-    return Change(key.store, false,
+    return Change(key, false,
                   [&](TaskDatabase& database) { return database.SetProcess(key, process); });
   }
   TaskResult Finish(const TaskKey& key) override {
-    return Change(key.store, false, [&](TaskDatabase& database) { return database.Finish(key); });
+    return Change(key, false, [&](TaskDatabase& database) { return database.Finish(key); });
   }
   TaskResult Remove(const TaskKey& key) override {
-    return Change(key.store, false, [&](TaskDatabase& database) { return database.Remove(key); });
+    return Change(key, false, [&](TaskDatabase& database) { return database.Remove(key); });
   }
   TaskResult List(const TaskQuery& query, std::vector<ListedTask>& tasks) override;
   std::vector<uid_t> Stores() override {
@@ -43,7 +43,7 @@ class DatabaseStores final : public TaskStores {
  private:
   using Use = StoreConnection::Use;
 
-  TaskResult Change(uid_t store, bool create,
+  TaskResult Change(const TaskKey& key, bool create,
                     const std::function<TaskResult(TaskDatabase&)>& operation);
   /// What a use of the store came to; failures are logged.
   TaskResult End(Use& use, uid_t store, TaskResult result) const;
@@ -56,7 +56,7 @@ bool isSameProcess(const ProcessIdentity& left, const ProcessIdentity& right) {
 }
 
 TaskResult DatabaseStores::Load(const TaskKey& key, TaskRecord& record) {
-  Use use(StoreConnection::Get(), settings_, key.store, false);
+  Use use(StoreConnection::Get(), settings_, {key.store, key.patienceMs}, false);
   TaskResult result = use.State();
   if (result == TaskResult::kDone) {
     result = use.Database().Load(key, record);
@@ -77,7 +77,7 @@ TaskResult DatabaseStores::Load(const TaskKey& key, TaskRecord& record) {
 }
 
 TaskResult DatabaseStores::List(const TaskQuery& query, std::vector<ListedTask>& tasks) {
-  Use use(StoreConnection::Get(), settings_, query.store, false);
+  Use use(StoreConnection::Get(), settings_, {query.store, query.patienceMs}, false);
   TaskResult result = use.State();
   if (result == TaskResult::kDone) {
     std::vector<ListedTask> found;
@@ -109,9 +109,9 @@ UniqueFd DatabaseStores::Watch(uid_t store) {
   return watch;
 }
 
-TaskResult DatabaseStores::Change(uid_t store, bool create,
+TaskResult DatabaseStores::Change(const TaskKey& key, bool create,
                                   const std::function<TaskResult(TaskDatabase&)>& operation) {
-  Use use(StoreConnection::Get(), settings_, store, create);
+  Use use(StoreConnection::Get(), settings_, {key.store, key.patienceMs}, create);
   TaskResult result = use.State();
   if (result == TaskResult::kDone) {
     result = operation(use.Database());
@@ -119,11 +119,11 @@ TaskResult DatabaseStores::Change(uid_t store, bool create,
       use.Announce();
     }
   }
-  return End(use, store, result);
+  return End(use, key.store, result);
 }
 
 TaskResult DatabaseStores::End(Use& use, uid_t store, TaskResult result) const {
-  if (result == TaskResult::kFailed) {
+  if (result == TaskResult::kFailed || result == TaskResult::kBusy) {
     const bool opened = use.State() == TaskResult::kDone;
     WEBAPI_LOG(kSource, "cannot use the task store %s/%u [%s]", settings_.directory, store,
                opened ? use.Database().Error().c_str() : use.Error().c_str());

@@ -13,11 +13,17 @@
 /// What the module of task records offers to the platform, which loads it.
 namespace QELO::Platform {
 
+/// How long one waits for a store that others hold, in milliseconds: one that is the caller's or
+/// the system's own, and one of another user, who could hold it for ever.
+inline constexpr int kOwnStoreMs = 5000;
+inline constexpr int kForeignStoreMs = 100;
+
 /// Names one record.
 struct TaskKey {
   uid_t store = 0;    ///< the user whose store holds it
   std::string owner;  ///< any text
   std::string id;
+  int patienceMs = kOwnStoreMs;  ///< longest wait for the store
 };
 
 enum class TaskEnding : int {
@@ -42,7 +48,8 @@ enum class TaskResult {
   kDone,
   kMissing,  ///< there is no such record
   kRemoved,  ///< there was one
-  kFailed    ///< the store cannot be used (logged)
+  kFailed,   ///< the store cannot be used (logged)
+  kBusy      ///< others hold the store (logged)
 };
 
 /// Which tasks of one store.
@@ -51,6 +58,7 @@ struct TaskQuery {
   std::string owner;
   std::string prefix;    ///< of the ids; "": all
   bool unended = false;  ///< those alone that nobody has found ended yet
+  int patienceMs = kOwnStoreMs;
 };
 
 struct ListedTask {

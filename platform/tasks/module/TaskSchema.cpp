@@ -10,6 +10,7 @@
 #include <iterator>
 
 #include "platform/base/Secrets.h"
+#include "platform/tasks/module/Patience.h"
 #include "webapi/base/Log.h"
 
 namespace QELO::Platform {
@@ -46,21 +47,23 @@ bool execute(sqlite3* database, const std::string& sql, std::string& error) {
   return false;
 }
 
-sqlite3* openFile(const std::string& path, std::string& error) {
+sqlite3* openFile(const std::string& path, std::string& error, bool& busy) {
   constexpr int kFlags = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX | SQLITE_OPEN_NOFOLLOW;
   sqlite3* database = nullptr;
-  if (sqlite3_open_v2(path.c_str(), &database, kFlags, nullptr) != SQLITE_OK) {
+  if (sqlite3_open_v2(path.c_str(), &database, kFlags, Patience::FileSystem()) != SQLITE_OK) {
     error = database != nullptr ? sqlite3_errmsg(database) : "no memory";
+    busy = database != nullptr && isHeldByOthers(database);
     sqlite3_close(database);
     return nullptr;
   }
-  sqlite3_busy_timeout(database, kTaskBusyMs);
+  sqlite3_busy_timeout(database, kOwnStoreMs);  // less when Patience ends sooner
   sqlite3_limit(database, SQLITE_LIMIT_LENGTH, kLargestText);
   return database;
 }
 
 bool writeSchema(const std::string& path, std::string& error) {
-  sqlite3* database = openFile(path, error);
+  bool busy = false;
+  sqlite3* database = openFile(path, error, busy);
   if (database == nullptr) {
     return false;
   }
@@ -170,7 +173,7 @@ bool isOfAnotherVersion(sqlite3* database) {
 UniqueFd lockDirectory(const StoreDirectory& directory) {
   UniqueFd lock(open(directory.Path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   for (int tries = 0; lock && flock(lock.Get(), LOCK_EX | LOCK_NB) != 0; ++tries) {
-    if (errno != EWOULDBLOCK || tries == kLockTries) {
+    if (errno != EWOULDBLOCK || tries == kLockTries || Patience::Left() == 0) {
       return UniqueFd();
     }
     usleep(kLockPauseUs);
@@ -243,34 +246,41 @@ bool prepare(sqlite3* database, std::string& error) {
 }
 
 /// @param again  receives whether the database was set aside, and there may be another
-sqlite3* openOnce(const StoreDirectory& directory, uid_t store, bool create, bool& missing,
+sqlite3* openOnce(const StoreDirectory& directory, uid_t store, bool create, TaskResult& result,
                   std::string& error, bool& again) {
-  missing = false;
+  bool missing = false;
+  bool busy = false;
   again = false;
+  result = TaskResult::kFailed;
   if (!isSafeFile(directory, store, missing, error)) {
     if (!missing || !create || !makeDatabase(directory, error) ||
         !isSafeFile(directory, store, missing, error)) {
+      result = missing && !create ? TaskResult::kMissing : TaskResult::kFailed;
       return nullptr;
     }
   }
-  missing = false;
   const DatabaseFile file = findDatabaseFile(directory);
-  sqlite3* database = openFile(directory.Path() + "/" + kTaskDatabase, error);
+  sqlite3* database = openFile(directory.Path() + "/" + kTaskDatabase, error, busy);
   if (database != nullptr && prepare(database, error)) {
+    result = TaskResult::kDone;
     return database;
   }
-  again = makeRoom(directory, database, file, error);
+  busy = busy || (database != nullptr && isHeldByOthers(database));
+  // What is held cannot be told from another version's, and is none that was set aside meanwhile.
+  again =
+      busy ? !(findDatabaseFile(directory) == file) : makeRoom(directory, database, file, error);
+  result = busy ? TaskResult::kBusy : TaskResult::kFailed;
   sqlite3_close(database);
   return nullptr;
 }
 
 }  // namespace
 
-sqlite3* openTaskDatabase(const StoreDirectory& directory, uid_t store, bool create, bool& missing,
-                          std::string& error) {
+sqlite3* openTaskDatabase(const StoreDirectory& directory, uid_t store, bool create,
+                          TaskResult& result, std::string& error) {
   bool again = false;
-  sqlite3* database = openOnce(directory, store, create, missing, error, again);
-  return again ? openOnce(directory, store, create, missing, error, again) : database;
+  sqlite3* database = openOnce(directory, store, create, result, error, again);
+  return again ? openOnce(directory, store, create, result, error, again) : database;
 }
 
 DatabaseFile findDatabaseFile(const StoreDirectory& directory) {

@@ -2,7 +2,10 @@
 
 #include <json/json.h>
 
+#include <memory>
 #include <string>
+
+#include "webapi/APIPolling.h"
 
 namespace QELO::ExecProgram {
 
@@ -27,15 +30,13 @@ class FollowedTask {
 
   /// Keeps a record that would go with the end of the work, its last result with it, until
   /// Release(). To be called after a Look() that succeeded.
-  void Keep(const Json::Value& status);
+  void Keep();
   /// Removes the record that was kept, or lets it go with the end of the work as before.
   void Release();
 
  private:
-  Json::Value request_;
+  std::unique_ptr<APIPolling> polling_;
   std::string id_;
-  std::string owner_;
-  std::string taskId_;
   bool isKept_ = false;
 };
 

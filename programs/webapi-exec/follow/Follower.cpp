@@ -59,7 +59,7 @@ ExitCode Follower::Run() {
   }
   progress_ = readProgress(status_);
   EndSignals::keepAll();
-  task_.Keep(status_);
+  task_.Keep();
   screen_.Say("Task " + harmless(task_.Id()));
   News news = News::kLost;
   if (watcher_.Start(task_)) {

@@ -4,6 +4,7 @@ import hashlib
 import os
 import subprocess
 import time
+from concurrent.futures import ThreadPoolExecutor
 from urllib.parse import urlencode
 
 import pytest
@@ -192,6 +193,16 @@ def test_Checksum_FiveAtOnce_IsRefused(alice, home):
     again = alice.call(API, "start", path=home)
     assert again.code == 0
     alice.started.append((alice, again.data["task_id"]))
+
+
+def test_Checksum_ManyAtTheSameMoment_StartsFour(alice, home):
+    put_large(home)
+    with ThreadPoolExecutor(12) as pool:
+        answers = list(pool.map(lambda _: alice.call(API, "start", path=home), range(12)))
+    for answer in answers:
+        if answer.code == 0:
+            alice.started.append((alice, answer.data["task_id"]))
+    assert sorted(answer.code for answer in answers) == [0] * 4 + [401] * 8
 
 
 def test_Checksum_OfAUserWithoutTasks_LogsNoErrorOfTasks(alice, home, tmp_path):

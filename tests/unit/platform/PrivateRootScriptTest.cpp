@@ -38,6 +38,16 @@ TEST_F(PrivateRootScript, SecretsAreForTheirOwnerAlone) {
   EXPECT_EQ(Status("var/new root/home/alice").st_mode, S_IFDIR | 0700U);
 }
 
+TEST_F(PrivateRootScript, TaskStoresOfRootAndTheWorkingAccountHaveTheirPlaces) {
+  EXPECT_EQ(Make(), 0);
+  for (const uid_t user : {0U, 900U}) {
+    const uid_t owner = IsRoot() ? user : geteuid();
+    const std::string place = "var/new root/var/lib/webapi/tasks/" + std::to_string(owner);
+    EXPECT_EQ(Status(place).st_mode, S_IFDIR | 0700U);
+    EXPECT_EQ(Status(place).st_uid, owner);
+  }
+}
+
 TEST_F(PrivateRootScript, SecondRunKeepsSessionsAndSettings) {
   EXPECT_EQ(Make(), 0);
   Write("var/new root/run/webapi/sessions/kept", "session");

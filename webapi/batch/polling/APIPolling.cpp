@@ -1,6 +1,7 @@
 #include "webapi/APIPolling.h"
 
 #include "webapi/batch/polling/APIPollingPrivate.h"
+#include "webapi/batch/polling/Terms.h"
 
 namespace QELO {
 
@@ -10,6 +11,12 @@ APIPolling::APIPolling(APIRequest* request)
     : private_(std::make_unique<APIPollingPrivate>(request, this)) {}
 
 APIPolling::~APIPolling() = default;
+
+std::unique_ptr<APIPolling> APIPolling::ForUser(const std::string& user) {
+  auto polling = std::make_unique<APIPolling>();
+  polling->private_->SetUser(user);
+  return polling;
+}
 
 void APIPolling::SetRequest(APIRequest* request) {
   private_->SetRequest(request);
@@ -29,6 +36,10 @@ bool APIPolling::SetRemoveParam(bool remove) {
 
 bool APIPolling::SetGroupAttr(const std::string& group) {
   return private_->SetGroupAttr(group);
+}
+
+void APIPolling::SetLimit(int most) {
+  private_->SetLimit(most);
 }
 
 bool APIPolling::Start(APIResponse* response, Work work, void* arg) {
@@ -56,6 +67,14 @@ bool APIPolling::Stop(const std::string& fullId, bool remove) {
   return private_->Stop(fullId, remove);
 }
 
+bool APIPolling::Keep(const std::string& fullId) {
+  return private_->Keep(fullId);
+}
+
+bool APIPolling::Release(const std::string& fullId) {
+  return private_->Release(fullId);
+}
+
 bool APIPolling::List(const std::string& prefix, const Json::Value& groups, Json::Value& out) {
   return private_->List(prefix, groups, out);
 }
@@ -70,6 +89,30 @@ void APIPolling::SetError(int code) {
 
 int APIPolling::GetError() const {
   return private_->error();
+}
+
+const char* APIPolling::ErrorText(int code) {
+  switch (code) {
+    case POLLING_ERR_UNKNOWN:
+      return "nothing is known of an error";
+    case POLLING_ERR_NOT_STORED:
+      return "the task's record cannot be changed";
+    case POLLING_ERR_BAD_PARAMETERS:
+    case POLLING_ERR_INVALID_ID:
+      return "not a task's id, or another user's task";
+    case POLLING_ERR_BUSY:
+      return "the task's record is busy; try again later";
+    case POLLING_ERR_NOT_ADMIN:
+      return "the tasks are the administrators'";
+    case POLLING_ERR_NOT_SIGNALLED:
+      return "the task's process cannot be signalled";
+    case POLLING_ERR_TOO_MANY:
+      return "as many tasks run as may at once";
+    case POLLING_ERR_NO_SUCH_TASK:
+      return "there is no such task, or it ended and its record was removed";
+    default:
+      return nullptr;
+  }
 }
 
 }  // namespace QELO

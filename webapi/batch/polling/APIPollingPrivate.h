@@ -25,6 +25,7 @@ class APIPollingPrivate : public APIBase {
   APIPollingPrivate(APIRequest* request, APIPolling* owner);
   APIPollingPrivate(const APIPollingPrivate&) = delete;
   APIPollingPrivate& operator=(const APIPollingPrivate&) = delete;
+  ~APIPollingPrivate();
 
   bool SetGroupAttr(const std::string& group);
   bool Start(APIResponse* response, APIPolling::Work work, void* arg);
@@ -33,6 +34,8 @@ class APIPollingPrivate : public APIBase {
   bool Wait(const std::string& fullId, const std::string& state, int seconds, Json::Value& out);
   bool Stop(const std::string& fullId, bool remove);
   bool List(const std::string& prefix, const Json::Value& groups, Json::Value& out);
+  bool Keep(const std::string& fullId);
+  bool Release(const std::string& fullId);
   bool CountRunning(const std::string& prefix, int& count);
 
   /// Splits at the first "/". @return false, and nothing is set, when there is none
@@ -48,6 +51,9 @@ class APIPollingPrivate : public APIBase {
   Json::Value ConverToFullTaskId(const std::string& owner, const Json::Value& ids) const;
 
   void SetRequest(APIRequest* request) { request_ = request; }
+  /// Takes a request of its own, of a user for whom the program answers.
+  void SetUser(const std::string& user);
+  void SetLimit(int most) { limit_ = most; }
   void SetError(int code) { error_ = code; }
   int error() const { return error_; }
 
@@ -66,20 +72,32 @@ class APIPollingPrivate : public APIBase {
   /// Loads one of the caller's tasks by what a client sent. @return null with the error set
   std::unique_ptr<ARDO::Task> FindTask(const std::string& fullId);
   /// Loads a task of an owner who was checked. @return null when there is none
-  static std::unique_ptr<ARDO::Task> LoadTask(const std::string& owner, const std::string& taskId);
-  bool FailMissing(const std::string& fullId);
+  /// @param busy  receives whether there may be one all the same
+  static std::unique_ptr<ARDO::Task> LoadTask(const std::string& owner, const std::string& taskId,
+                                              bool& busy);
+  /// Sets the error of a task that was not loaded. @return false
+  bool FailUnread(const std::string& fullId, bool busy);
+  /// Counts the owner's tasks that have not ended.
+  /// @param taskId  only those that are older than this one; "": all
+  /// @return false, with the error set, when that cannot be told
+  bool CountBefore(const std::string& owner, const std::string& prefix, const std::string& taskId,
+                   int& count);
+  /// Whether the task that was just recorded may run. @return false with the error set
+  bool IsWithinLimit(const std::string& owner, const std::string& taskId);
   /// Asks the task's process, if one is recorded, to end. @return false with the error set
   bool EndProcess(const ARDO::Task& task, const std::string& fullId);
   Json::Value StatusOf(const ARDO::Task& task) const;
   static void LeaveStarter(pid_t starter) noexcept;
   [[noreturn]] void RunChild(const std::string& owner, const std::string& taskId,
                              APIResponse* response, APIPolling::Work work, void* arg) noexcept;
-  /// Ends the task whose work is over. @param returned  false: it threw
-  void FinishTask(ARDO::Task& task, APIResponse* response, bool returned) const;
+  /// Ends the task whose work is over.
+  void FinishTask(ARDO::Task& task, APIResponse* response) const;
 
-  APIRequest* request_;
   APIPolling* owner_;
+  APIRequest* request_;
   int error_;
+  int limit_ = 0;
+  std::unique_ptr<APIRequest> ownRequest_;
 };
 
 }  // namespace QELO

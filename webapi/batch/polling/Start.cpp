@@ -111,6 +111,10 @@ bool APIPollingPrivate::Start(APIResponse* response, APIPolling::Work work, void
     WEBAPI_LOG(kPollingSource, "Failed to set property.");
     return false;
   }
+  if (!IsWithinLimit(owner, taskId)) {
+    task.remove();
+    return false;
+  }
   const pid_t starter = getpid();
   const pid_t child = QLIBCProcFork();
   if (child < 0) {
@@ -129,6 +133,16 @@ bool APIPollingPrivate::Start(APIResponse* response, APIPolling::Work work, void
   answer["task_id"] = owner + "/" + taskId;
   response->SetSuccess(answer);
   return true;
+}
+
+/// Recorded first and counted then: of several who start at once each sees those before it.
+bool APIPollingPrivate::IsWithinLimit(const std::string& owner, const std::string& taskId) {
+  int running = 0;
+  if (limit_ <= 0) {
+    return true;
+  }
+  return CountBefore(owner, Attribute("task_id_prefix"), taskId, running) &&
+         (running < limit_ || Fail(POLLING_ERR_TOO_MANY));
 }
 
 /// What the process has from its starter and must not keep.
@@ -159,9 +173,9 @@ void APIPollingPrivate::RunChild(const std::string& owner, const std::string& ta
     if (!recorded) {
       WEBAPI_LOG(kPollingSource, "Failed to set property.");
     }
-    const bool returned = Fence(
+    Fence(
         "polling task", [&] { work(request_, response, arg); }, kPollingSource);
-    FinishTask(task, response, returned);
+    FinishTask(task, response);
   }  // else it was stopped before it began, and nobody could see the work or stop it
   // Not exit(): handlers that the parent registered for its end, and what it has buffered in C++
   // streams, are the parent's.
@@ -169,16 +183,19 @@ void APIPollingPrivate::RunChild(const std::string& owner, const std::string& ta
   _exit(0);
 }
 
-void APIPollingPrivate::FinishTask(ARDO::Task& task, APIResponse* response, bool returned) const {
+void APIPollingPrivate::FinishTask(ARDO::Task& task, APIResponse* response) const {
+  const std::string fullId = request_->GetPollingTaskId();
   if (!task.reload()) {
     return;  // it was removed meanwhile
   }
-  if (!returned || response->private_->TaskLacksResult() || !task.hasProperty("task_run")) {
+  if (response->private_->TaskLacksResult()) {
+    WEBAPI_LOG(kPollingSource, "cannot store a result of task id[%s]", fullId.c_str());
+  }
+  if (!task.hasProperty("task_run")) {
     response->SetError(WEBAPI_ERR_NO_ANSWER);
   }
   if (task.reload() && !task.finish(task.getBoolProperty("auto_remove", false)) && task.reload()) {
-    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail",
-               request_->GetPollingTaskId().c_str());
+    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail", fullId.c_str());
   }
 }
 

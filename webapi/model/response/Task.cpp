@@ -4,7 +4,6 @@
 
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
-#include "webapi/base/Log.h"
 #include "webapi/model/response/APIResponsePrivate.h"
 #include "webapi/platform/Task.h"
 
@@ -37,10 +36,6 @@ void APIResponsePrivate::UpdateTask() {
   task_->setProperty("task_run", true);
   // One that was removed is no failure: nobody wants its results.
   lacksResult_ = !task_->endUpdate() && task_->reload();
-  if (lacksResult_) {
-    WEBAPI_LOG("APIPolling.cpp", "cannot store a result of task id[%s]",
-               LogText(task_->getTaskId()).c_str());
-  }
 }
 
 }  // namespace QELO

@@ -199,14 +199,14 @@ void progressAndTooLargeResult(APIRequest*, APIResponse* answer, void*) {
   answer->SetSuccess(std::string(kSmall, 'x'));
 }
 
-TEST_F(PollingChild, WhoseResultCannotBeStoredAnswers117) {
+TEST_F(PollingChild, WhoseResultCannotBeStoredKeepsTheOneBefore) {
   const Json::Value record = Run(progressAndTooLargeResult);
-  EXPECT_EQ(Text(record["properties"]["body"]), R"({"error":{"code":117},"success":false})");
+  EXPECT_EQ(Text(record["properties"]["body"]), R"({"data":"progress","success":true})");
   EXPECT_EQ(record["finished"], true);
 }
 
 TEST_F(PollingChild, WhoseResultCannotBeStoredIsLogged) {
-  EXPECT_NE(LogOf(progressAndTooLargeResult).find(" cannot store a result of task id[id1]\n"),
+  EXPECT_NE(LogOf(progressAndTooLargeResult).find(" cannot store a result of task id[alice/id1]\n"),
             std::string::npos);
 }
 
@@ -283,15 +283,15 @@ TEST_F(PollingChild, RemovesByTheRecordsOwnWord) {
   EXPECT_TRUE(record.isNull());
 }
 
-TEST_F(PollingChild, ThatThrowsAnswers117) {
+TEST_F(PollingChild, ThatThrowsKeepsTheResultThatItStored) {
   const Json::Value body = BodyAfter([](APIRequest*, APIResponse* answer, void*) {
     answer->SetSuccess("half");
     throw std::runtime_error("disk on fire");
   });
-  EXPECT_EQ(Text(body), R"({"error":{"code":117},"success":false})");
+  EXPECT_EQ(Text(body), R"({"data":"half","success":true})");
 }
 
-TEST_F(PollingChild, ThatThrowsSomethingElseAnswers117) {
+TEST_F(PollingChild, ThatThrowsWithoutAResultAnswers117) {
   const Json::Value record = Run([](APIRequest*, APIResponse*, void*) { throw 7; });
   EXPECT_EQ(Text(record["properties"]["body"]), R"({"error":{"code":117},"success":false})");
   EXPECT_EQ(record["finished"], true);

@@ -68,6 +68,25 @@ TEST_F(PollingList, WithoutPrefixAsksForAll) {
   EXPECT_EQ(tasks->calls.back(), "getAllTaskId(alice, null)");
 }
 
+TEST_F(PollingList, WithANulInThePrefixHasNone) {
+  for (const std::string& prefix : {std::string(1, '\0'), std::string("b\0", 2)}) {
+    ASSERT_EQ(List(prefix, R"(["user"])"), 0);
+    EXPECT_TRUE(out["user"].isNull()) << Text(out);
+    int count = -1;
+    EXPECT_TRUE(polling->CountRunning(prefix, count));
+    EXPECT_EQ(count, 0);
+  }
+}
+
+TEST_F(PollingList, OfABusyStoreIs504) {
+  tasks->busy = true;
+  EXPECT_EQ(List("", R"(["user"])"), 504);
+  int count = -1;
+  EXPECT_FALSE(polling->CountRunning("", count));
+  EXPECT_EQ(polling->GetError(), 504);
+  EXPECT_EQ(count, -1);
+}
+
 TEST_F(PollingList, OfNoGroupsLeavesTheOutputAnObject) {
   out = 7;
   ASSERT_EQ(List("", "[]"), 0);

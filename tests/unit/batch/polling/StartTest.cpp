@@ -1,6 +1,7 @@
 // Starting a task as its caller sees it: checks, the record, the answer.
 
 #include "tests/unit/batch/polling/Fixture.h"
+#include "webapi/platform/Task.h"
 
 namespace QELO {
 namespace {
@@ -178,6 +179,40 @@ TEST_F(PollingStart, LeavesTheCallersRequestAsItWas) {
   ASSERT_TRUE(polling->Start(response.get(), succeed, nullptr));
   EXPECT_EQ(request->GetEnv("REQUEST_METHOD"), "POST");
   EXPECT_FALSE(request->IsPollingTask());
+}
+
+TEST_F(PollingStart, WithinTheLimitStarts) {
+  Record("alice", "a1", "{}", Sleeper());
+  Record("alice", "a2", "{}", Fork([] {}));  // ended
+  Record("alice", "b3", "{}", Sleeper());    // another prefix
+  Record("alice", "id9", "{}", Sleeper());   // younger
+  tasks->nextId = "3";
+  polling->SetPrefixAttr("a");
+  polling->SetLimit(2);
+  while (ARDO::Task("alice", "a2").getCreatePid() != 0) {
+    usleep(1000);
+  }
+  EXPECT_TRUE(polling->Start(response.get(), succeed, nullptr));
+}
+
+TEST_F(PollingStart, BeyondTheLimitIs507AndLeavesNoRecord) {
+  Record("alice", "a1", "{}", Sleeper());
+  Record("alice", "a2", "{}", Sleeper());
+  tasks->nextId = "3";
+  polling->SetPrefixAttr("a");
+  polling->SetLimit(2);
+  EXPECT_FALSE(polling->Start(response.get(), succeed, nullptr));
+  EXPECT_EQ(polling->GetError(), 507);
+  EXPECT_EQ(Body(), "{}");
+  EXPECT_TRUE(tasks->Record("alice", "a3").isNull());
+  EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), 0) << "the sleepers alone";
+}
+
+TEST_F(PollingStart, WithALimitThatCannotBeTalliedIs504) {
+  polling->SetLimit(2);
+  Meanwhile("endUpdate", [] { FakeTask::Get().busy = true; });
+  EXPECT_FALSE(polling->Start(response.get(), succeed, nullptr));
+  EXPECT_EQ(polling->GetError(), 504);
 }
 
 }  // namespace

@@ -90,6 +90,19 @@ TEST_F(PollingStatus, OfMissingTaskIs508) {
   EXPECT_EQ(SyslogCapture::Count("No such task id[alice/none]"), 1);
 }
 
+TEST_F(PollingStatus, OfATaskWhoseStoreIsBusyIs504) {
+  Record("alice", "1", R"({"success":true})");
+  tasks->busy = true;
+  EXPECT_EQ(Status("alice/1"), 504);
+  EXPECT_EQ(SyslogCapture::Count("task id[alice/1] cannot be read now"), 1);
+  EXPECT_EQ(Status(Parse(R"(["alice/1", "bob/1"])")), 0);
+  EXPECT_EQ(Text(out), R"({"alice/1":{"busy":true},"bob/1":{}})");
+  EXPECT_EQ(polling->Wait("alice/1", "", 0, out) ? 0 : polling->GetError(), 504);
+  EXPECT_EQ(polling->Stop("alice/1", true) ? 0 : polling->GetError(), 504);
+  tasks->busy = false;
+  EXPECT_EQ(Status("alice/1"), 0);
+}
+
 TEST_F(PollingStatus, OfATaskThatRemovesItselfMeanwhileIs508) {
   Record("alice", "1", R"({"success":true})");
   RemoveMeanwhile("checkTaskExists", "1");

@@ -53,6 +53,34 @@ TEST_F(Sessions, CreateGivesTwoSecretsOf43Characters) {
   EXPECT_STRNE(id, token);
 }
 
+TEST_F(Sessions, CreateMakesTheUsersPlaceForTasks) {
+  if (!IsRoot()) {
+    GTEST_SKIP() << "only root makes it";
+  }
+  const std::string place = "var/lib/webapi/tasks/1002";
+  Create();
+  EXPECT_EQ(Status(place).st_uid, 1002U);
+  EXPECT_EQ(Status(place).st_gid, 1002U);
+  EXPECT_EQ(Status(place).st_mode, S_IFDIR | 0700U);
+  const ino_t first = Status(place).st_ino;
+  Create();
+  EXPECT_EQ(Status(place).st_ino, first);
+  EXPECT_EQ(CountFiles("var/lib/webapi/tasks"), 3) << "root's and the working account's are there";
+}
+
+TEST_F(Sessions, CreateSetsAStrangersPlaceForTasksAside) {
+  if (!IsRoot()) {
+    GTEST_SKIP() << "only root makes it";
+  }
+  const std::string place = "var/lib/webapi/tasks/1002";
+  ASSERT_EQ(mkdir(Path(place).c_str(), 0700), 0);
+  ASSERT_EQ(chown(Path(place).c_str(), 1003, 1003), 0);
+  Create();
+  EXPECT_EQ(Status(place).st_uid, 1002U);
+  EXPECT_EQ(CountFiles("var/lib/webapi/tasks"), 4);
+  EXPECT_EQ(SyslogCapture::Count("somebody else made the task store"), 1);
+}
+
 TEST_F(Sessions, CreateNeverGivesAnIdTwice) {
   std::set<std::string> seen;
   for (int i = 0; i < 200; ++i) {

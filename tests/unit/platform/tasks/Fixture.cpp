@@ -19,6 +19,7 @@ void TaskTest::SetUp() {
   PrivateRoot::SetUp();
   fs::copy_file(fs::path(BUILT_MODULE_DIR) / "tasks.so", fs::path(Path("modules")) / "tasks.so",
                 fs::copy_options::overwrite_existing);
+  fs::remove_all(Paths::kTaskDir);  // the places that root and the working account have there
   fs::create_directories(Paths::kTaskDir);
   ASSERT_EQ(chmod(Paths::kTaskDir, 01733), 0);
 }

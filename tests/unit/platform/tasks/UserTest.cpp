@@ -213,6 +213,16 @@ TEST_F(TaskUsers, OwnersThatAUserMayHaveCount) {
   EXPECT_TRUE(SeenBy(0, "@administrators", services));
 }
 
+TEST_F(TaskUsers, OwnersOfAnAccountWithoutAShellCountAsThoseOfAnyUser) {
+  Write("etc/passwd", Read("etc/passwd") + "backup:x:910:910:A service:/:/usr/sbin/nologin\n");
+  const std::string forged = MadeBy(910, "bob");
+  EXPECT_NE(forged, "");
+  EXPECT_FALSE(SeenBy(0, "bob", forged));
+  EXPECT_EQ(ListAs(0, "bob"), "[]");
+  EXPECT_TRUE(SeenBy(0, "backup", MadeBy(910, "backup")));
+  EXPECT_EQ(ListAs(0, "bob"), "[]");
+}
+
 TEST_F(TaskUsers, StoreOfAUserWhoIsNoMoreCountsForNobody) {
   const std::string id = MadeBy(4711, "alice");
   EXPECT_TRUE(SeenBy(4711, "alice", id));
