@@ -125,6 +125,15 @@ def test_Exceptions_AreStillNeeded():
     assert set(EXCEPTIONS) - needed == set()
 
 
+def test_Architecture_HasTheSameTable():
+    text = (SOURCE / "docs/architecture.md").read_text()
+    rows = re.findall(r"^\| `([\w/]+)` \| ((?:nothing|`webapi/).*?) \|$", text, re.MULTILINE)
+    table = {folder: set(re.findall(r"`([\w/]+)`", allowed)) for folder, allowed in rows}
+    built = {folder for folder in ALLOWED if (SOURCE / folder).exists()}
+    assert table == {folder: ALLOWED[folder] & built for folder in built}
+    assert [path for path, _ in EXCEPTIONS if f"`{path}`" not in text] == []
+
+
 def test_Layers_AreTheFoldersThatThereAre():
     folders = {folder_of(path) for path in files("*.cpp", "*.h")}
     folders = {folder for folder in folders if folder.split("/")[0] not in ("tests", "bench", "fuzz")}

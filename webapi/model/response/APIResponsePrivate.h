@@ -50,9 +50,9 @@ class APIResponsePrivate : public APIBase {
   APIRequest* request_;
   APIResponse* owner_;
   std::unique_ptr<ARDO::Task> task_;  ///< null until a background task sets a result
-  pid_t taskProcess_ = 0;             ///< the one that made the handle
-  bool lacksResult_ = false;
   APIResponse::CallbackList callbacks_;
+  pid_t taskProcess_ = 0;  ///< the one that made the handle
+  bool lacksResult_ = false;
 };
 
 }  // namespace QELO
