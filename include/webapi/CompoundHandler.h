@@ -39,8 +39,9 @@ class WEBAPI_API CompoundHandler {
   virtual ~CompoundHandler();
 
   /// Runs all entries and fills the outer response: success with the combined answer, or error 110
-  /// without a list of entries and 117 for want of memory, with the last refusal's reason or "" as
-  /// its data. The entries' callbacks that are this process's to run become the outer response's.
+  /// without a list of entries or with too many of them, and 117 for want of memory, with the last
+  /// refusal's reason or "" as its data. The entries' callbacks that are this process's to run
+  /// become the outer response's.
   /// @return whether every step succeeded; an entry that fails does not count
   bool Process();
 
