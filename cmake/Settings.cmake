@@ -30,7 +30,9 @@ if(WEBAPI_SANITIZE)
                       -fno-sanitize-recover=all)
   add_link_options(-fsanitize=${WEBAPI_SANITIZE})
 else()
-  add_link_options(-Wl,--no-undefined)
+  # What crt files name in case that something is there is settled when linking: at each start it
+  # was looked for in every library in vain.
+  add_link_options(-Wl,--no-undefined -Wl,-z,nodynamic-undefined-weak)
 endif()
 
 find_package(jsoncpp REQUIRED)

@@ -66,6 +66,7 @@ class WEBAPI_API APIRequest {
   /// call from now on.
   /// @param replace  drop the parameters there are first
   void InitParam(const Json::Value& params, bool replace);
+  void InitParam(Json::Value&& params, bool replace);
   /// Replaces the API's description.
   void InitAPIInfo(const Json::Value& description);
   /// Replaces what is known of the caller, the cached user id and user classes included.
@@ -103,6 +104,8 @@ class WEBAPI_API APIRequest {
   /// A member of the API's description, defaults of lib.def filled in. An empty name gives the
   /// whole description.
   Json::Value GetAPIInfo(const std::string& name, const Json::Value& def = Json::Value()) const;
+  /// As GetAPIInfo(), without a copy; `def` must outlive the result.
+  const Json::Value& GetAPIInfoRef(const std::string& name, const Json::Value& def) const;
 
   /// The call, as the client named it.
   std::string GetAPIClass() const;   ///< the API's name, as "QELO.Host.Info"

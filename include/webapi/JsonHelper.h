@@ -46,6 +46,9 @@ WEBAPI_API const Json::Value& member(const Json::Value& value, std::string_view 
 /// Whether `value` is an object that has the member `key`, be it null.
 WEBAPI_API bool hasMember(const Json::Value& value, std::string_view key);
 
+/// Whether `value` is the string `text`.
+WEBAPI_API bool isText(const Json::Value& value, std::string_view text);
+
 /// Text form: a string as it is, numbers and booleans as JSON writes them, null as ""; an array
 /// or object gives `fallback`.
 WEBAPI_API std::string asString(const Json::Value& value, const std::string& fallback = "");

@@ -31,7 +31,7 @@ bool parseRecord(const std::string& text, Session& session) {
   }
   const auto string = [&record](const char* key) {
     const Json::Value& value = JsonHelper::member(record, key);
-    return value.isString() ? value.asString() : std::string();
+    return value.type() == Json::stringValue ? JsonHelper::asString(value) : std::string();
   };
   session.user = string("user");
   session.address = string("address");

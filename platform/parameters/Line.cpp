@@ -20,7 +20,9 @@ bool take(std::string_view text, bool decode, std::string& plain) {
 
 bool QELO::WebAPIUtil::strPairToJsonObj(const std::string& line, Json::Value& object, bool decode,
                                         bool parseJson) {
-  if (!object.isObject() && !object.isNull()) {
+  const bool isObject = object.type() == Json::objectValue;
+  const bool isEmpty = object.type() == Json::nullValue || (isObject && object.size() == 0);
+  if (!isEmpty && !isObject) {
     return false;
   }
   Json::Value pairs(Json::objectValue);
@@ -37,17 +39,20 @@ bool QELO::WebAPIUtil::strPairToJsonObj(const std::string& line, Json::Value& ob
         !take(pair.substr(std::min(equals + 1, pair.size())), decode, text)) {
       return false;
     }
-    Json::Value value;
+    Json::Value& value = *pairs.demand(name.data(), name.data() + name.size());
     if (!parseJson || !Platform::parseJsonText(text, value)) {
-      value = text;
+      value = Json::Value(text.data(), text.data() + text.size());
     }
-    pairs[name] = std::move(value);
   }
-  if (object.isNull()) {
-    object = Json::Value(Json::objectValue);
+  if (isEmpty) {
+    object.swap(pairs);
+    return true;
   }
-  for (const std::string& name : pairs.getMemberNames()) {
-    object[name].swap(pairs[name]);
+  const Json::Value& taken = pairs;
+  for (auto it = taken.begin(); it != taken.end(); ++it) {
+    const char* end = nullptr;
+    const char* name = it.memberName(&end);
+    *object.demand(name, end) = *it;
   }
   return true;
 }

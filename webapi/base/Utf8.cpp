@@ -1,5 +1,7 @@
 #include "webapi/base/Utf8.h"
 
+#include <algorithm>
+
 namespace QELO {
 namespace {
 
@@ -38,6 +40,9 @@ size_t sequenceLength(const std::string& text, size_t position) {
 }  // namespace
 
 std::string RepairUtf8(const std::string& text) {
+  if (std::all_of(text.begin(), text.end(), [](char c) { return (c & 0x80) == 0; })) {
+    return text;
+  }
   std::string repaired;
   repaired.reserve(text.size());
   size_t position = 0;

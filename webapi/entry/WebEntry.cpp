@@ -17,6 +17,7 @@
 #include "webapi/entry/output/BrokenPipe.h"
 #include "webapi/entry/output/WriteAnswer.h"
 #include "webapi/entry/permission/PermissionCheck.h"
+#include "webapi/json/Literal.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"
 #include "webapi/runner/CompoundCall.h"
@@ -102,7 +103,7 @@ void answer(const APIResponse& response, UnreadBody& body) {
 
 WebEntry::WebEntry() : spare_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
   static_assert(sizeof cgiContext_ == sizeof(QeloCgiContext));
-  permission_["permResult"] = Json::Value(Json::arrayValue);
+  permission_[Literal("permResult")] = Json::Value(Json::arrayValue);
   check_ = std::make_unique<PermissionCheck>(*this, *Request(), Context(), permission_);
 }
 
@@ -146,8 +147,8 @@ bool WebEntry::Initialize(const Json::Value&) {
   Request()->SetAttr("_collector_count_webapi", true);
   Request()->SetAttr(kAnswersOnOutput, true);
   Json::Value session(Json::objectValue);
-  session["uiLang"] = QeloCgiGetLang(Context());
-  session["tokenEnable"] = QeloCgiIsTokenEnable(Context());
+  session[Literal("uiLang")] = std::string(QeloCgiGetLang(Context()));
+  session[Literal("tokenEnable")] = Json::Int64{QeloCgiIsTokenEnable(Context())};
   Request()->InitSession(std::move(session));
   if (!GatherEnvironment()) {
     Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
@@ -160,7 +161,7 @@ bool WebEntry::Initialize(const Json::Value&) {
     }
     return false;
   }
-  Request()->InitParam(params, false);
+  Request()->InitParam(std::move(params), false);
   return RewriteCredentials();
 }
 
@@ -171,7 +172,7 @@ bool WebEntry::GatherEnvironment() {
   }
   char address[kAddressSize] = {};
   if (QeloCgiGetRemoteIP(address, kAddressSize) == 0) {
-    environment["QELO_REMOTE_IP"] = address;
+    environment[Literal("QELO_REMOTE_IP")] = std::string(address);
   }
   Request()->InitEnv(std::move(environment));
   return true;
@@ -214,8 +215,8 @@ bool WebEntry::RewriteCredentials() {
     environment[kTokenVariable] = token.value;
   }
   QeloCgiLoadInCookies(Context());
-  environment["HTTP_COOKIE"] = cookies;
-  environment[SZ_X_SHARING_HEADER] = sharingHeader;
+  environment[Literal("HTTP_COOKIE")] = cookies;
+  environment[Literal(SZ_X_SHARING_HEADER)] = sharingHeader;
   Request()->InitEnv(std::move(environment));
   return true;
 }

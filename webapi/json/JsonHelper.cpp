@@ -93,11 +93,21 @@ bool hasMember(const Json::Value& value, std::string_view key) {
   return find(value, key) != nullptr;
 }
 
+bool isText(const Json::Value& value, std::string_view text) {
+  const char* start = nullptr;
+  const char* end = nullptr;
+  return value.getString(&start, &end) &&
+         std::string_view(start, static_cast<size_t>(end - start)) == text;
+}
+
 std::string asString(const Json::Value& value, const std::string& fallback) {
   const char* start = nullptr;
   const char* end = nullptr;
   if (value.getString(&start, &end)) {
     return std::string(start, end);
+  }
+  if (value.type() == Json::nullValue) {
+    return "";
   }
   if (value.type() == Json::realValue) {
     return toString(value);  // the library's own form has digits that no one wrote

@@ -6,6 +6,8 @@
 #include <limits>
 #include <string>
 
+#include "webapi/json/Literal.h"
+
 #include "webapi/base/Text.h"
 
 namespace QELO::JsonHelper {
@@ -13,6 +15,12 @@ namespace {
 
 /// Some editors put it before a file's text.
 constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+
+/// Names in the texts that each call reads, descriptions and sessions. Those are not copied.
+constexpr std::string_view kUsualNames[] = {
+    "lib", "minVersion", "maxVersion", "methods", "authLevel", "allowUser",     "runAs",
+    "1",   "user",       "address",    "token",   "created",   "requestFormat", "priority",
+};
 
 constexpr unsigned kHighSurrogate = 0xD800;
 constexpr unsigned kLowSurrogate = 0xDC00;
@@ -110,11 +118,20 @@ class Reader {
         return false;
       }
       Blanks();
-      if (!Character(':') || !Value(*value.demand(name.data(), name.data() + name.size()))) {
+      if (!Character(':') || !Value(Member(value, name))) {
         return false;
       }
     } while (Character(','));
     return Character('}');
+  }
+
+  static Json::Value& Member(Json::Value& object, std::string_view name) {
+    for (const std::string_view usual : kUsualNames) {
+      if (usual == name) {
+        return object[Literal(usual.data())];
+      }
+    }
+    return *object.demand(name.data(), name.data() + name.size());
   }
 
   bool Array(Json::Value& value) {

@@ -54,10 +54,10 @@ bool APIBase::HasData(const std::string& section, const std::string& key) const 
 
 bool APIBase::SetData(const std::string& section, const Json::Value& members, bool stringOnly) {
   Json::Value* target = FindSection(section);
-  if (target == nullptr || members.type() != Json::objectValue || members.empty()) {
+  if (target == nullptr || members.type() != Json::objectValue || members.size() == 0) {
     return false;
   }
-  if (target->empty() && (!stringOnly || holdsStringsAlone(members))) {
+  if (target->size() == 0 && (!stringOnly || holdsStringsAlone(members))) {
     *target = members;  // as the loop below, without a look-up for each
     return true;
   }
@@ -73,8 +73,8 @@ bool APIBase::SetData(const std::string& section, const Json::Value& members, bo
 
 bool APIBase::TakeData(const std::string& section, Json::Value&& members, bool stringOnly) {
   Json::Value* target = FindSection(section);
-  if (target != nullptr && target->empty() && members.type() == Json::objectValue &&
-      !members.empty() && (!stringOnly || holdsStringsAlone(members))) {
+  if (target != nullptr && target->size() == 0 && members.type() == Json::objectValue &&
+      members.size() != 0 && (!stringOnly || holdsStringsAlone(members))) {
     target->swap(members);
     return true;
   }
@@ -83,7 +83,7 @@ bool APIBase::TakeData(const std::string& section, Json::Value&& members, bool s
 
 bool APIBase::ReplaceData(const std::string& section, Json::Value&& members) {
   Json::Value* target = FindSection(section);
-  if (target != nullptr && members.type() == Json::objectValue && !members.empty()) {
+  if (target != nullptr && members.type() == Json::objectValue && members.size() != 0) {
     target->swap(members);
     return true;
   }
@@ -97,7 +97,7 @@ bool APIBase::SetData(const std::string& section, const std::string& key, const 
   if (target == nullptr || key.empty() || (stringOnly && value.type() != Json::stringValue)) {
     return false;
   }
-  (*target)[key] = value;
+  *target->demand(key.data(), key.data() + key.size()) = value;
   return true;
 }
 

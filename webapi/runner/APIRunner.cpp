@@ -17,6 +17,7 @@
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
 #include "webapi/runner/APIRunnerPrivate.h"
+#include "webapi/runner/CallName.h"
 #include "webapi/runner/Callbacks.h"
 #include "webapi/runner/CompoundCall.h"
 #include "webapi/runner/catalogue/Catalogue.h"
@@ -95,14 +96,15 @@ bool APIRunner::Initialize(const Json::Value& param) {
 }
 
 bool APIRunner::InitEnv(Json::Value& env) {
-  if (!env.isObject()) {
+  if (env.type() != Json::objectValue) {
     response_->SetError(WEBAPI_ERR_BAD_REQUEST);
     return false;
   }
   for (char** entry = environ; entry != nullptr && *entry != nullptr; ++entry) {
     const char* equals = strchr(*entry, '=');
     if (equals != nullptr) {
-      env[std::string(static_cast<const char*>(*entry), equals)] = equals + 1;
+      const char* value = equals + 1;
+      *env.demand(*entry, equals) = Json::Value(value, value + strlen(value));
     }
   }
   return true;
@@ -155,6 +157,7 @@ bool APIRunner::Process(APIRequest* request, APIResponse* response) {
   } else {
     result = ProcessLib(request, response);
   }
+  private_->ForgetCallName();
   SetProcessName(request, response);
   return result;
 }
@@ -190,8 +193,9 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
   if (!IsPermitted(request, response)) {
     return false;
   }
-  const Json::Value attributes =
-      GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod());
+  // Copied: a method may have descriptions loaded that take the place of its own.
+  const CallName call(*request);
+  const Json::Value attributes = GetMethod(call.api, call.version, call.method);
   if (JsonHelper::asBool(request_->GetAttr("_collector_count_webapi")) &&
       !APIDescription::IsSet(attributes, "allowTimeout") &&
       JsonHelper::asBool(request->GetAPIInfo("count", true))) {

@@ -70,7 +70,7 @@ void APIRunnerPrivate::SetArgv0(const std::string& name) {
   }
   memset(argv0_, 0, argv0Length_);
   if (argv0Length_ > 0) {
-    strncpy(argv0_, name.c_str(), argv0Length_ - 1);
+    memcpy(argv0_, name.c_str(), std::min<size_t>(strlen(name.c_str()), argv0Length_ - 1));
   }
 }
 
@@ -78,17 +78,25 @@ bool APIRunnerPrivate::SetCallName(const std::string& api, int version, const st
   // Names are C text to the system: each part ends at its NUL, and none is endless.
   const std::string call =
       std::string(api.c_str()) + "_" + std::to_string(version) + "_" + method.c_str();
+  if (call == shownCall_) {
+    return true;
+  }
   std::string full = procName + "_" + call;
   full.resize(std::min(full.size(), kLongestName));
   SetLogIdentity(full);
   SetArgv0(full);
-  return prctl(PR_SET_NAME, call.substr(0, 16).c_str()) == 0;
+  const bool shown = prctl(PR_SET_NAME, call.substr(0, 16).c_str()) == 0;
+  shownCall_ = shown ? call : "";
+  return shown;
 }
 
 void APIRunnerPrivate::SetLogIdentity(const std::string& text) {
   static char identity[kLongestName + 1];  // syslog keeps the pointer
   closelog();
-  strncpy(identity, LogText(text).c_str(), sizeof identity - 1);
+  const std::string shown = LogText(text).c_str();
+  const size_t length = std::min(shown.size(), sizeof identity - 1);
+  memcpy(identity, shown.data(), length);
+  identity[length] = '\0';
   openlog(identity, LOG_PID | LOG_CONS, 0);
 }
 

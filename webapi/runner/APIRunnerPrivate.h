@@ -24,9 +24,11 @@ class APIRunnerPrivate {
   const std::string& GetProcName() const { return procName; }
   const std::string& GetOrigProcName() const { return origProcName; }
 
-  /// Names process, thread and syslog identity after a call.
+  /// Names process, thread and syslog identity after a call, unless they are so named already.
   /// @return false, with errno, when the thread cannot be named
   bool SetCallName(const std::string& api, int version, const std::string& method);
+  /// Foreign code ran, which may have named the process otherwise.
+  void ForgetCallName() { shownCall_.clear(); }
   /// Makes `text` the syslog identity, cut to kLongestName.
   static void SetLogIdentity(const std::string& text);
 
@@ -36,6 +38,7 @@ class APIRunnerPrivate {
   uint32_t argv0Length_ = 0;
   std::string procName;
   std::string origProcName;
+  std::string shownCall_;  ///< the call that the process is named after; "": not known
 };
 
 }  // namespace QELO

@@ -10,6 +10,7 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/entry/intake/RequestBody.h"
+#include "webapi/json/Literal.h"
 #include "webapi/model/request/CipherEnvelope.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -25,11 +26,11 @@ constexpr int kExceptionLine = 275;  ///< administrators' log filters know the m
 
 /// The member `name` of the parameters, an object from now on.
 Json::Value& sectionOf(Json::Value& params, const char* name) {
-  if (!params.isObject()) {
+  if (params.type() != Json::objectValue) {
     params = Json::Value(Json::objectValue);
   }
-  Json::Value& section = params[name];
-  if (!section.isObject()) {
+  Json::Value& section = params[Literal(name)];
+  if (section.type() != Json::objectValue) {
     section = Json::Value(Json::objectValue);
   }
   return section;
@@ -67,11 +68,11 @@ bool Intake::InitParam(Json::Value& params) {
 
 bool Intake::InitGetParam(Json::Value& section) {
   const Json::Value query = request_.GetEnv(kQueryString, Json::Value());
-  if (!query.isString()) {
+  if (query.type() != Json::stringValue) {
     response_.SetError(WEBAPI_ERR_BAD_REQUEST);
     return false;
   }
-  return DetectAndDecryptParamLine(query.asString(), section);
+  return DetectAndDecryptParamLine(JsonHelper::asString(query), section);
 }
 
 bool Intake::InitPostParam(Json::Value& section) {
@@ -103,7 +104,7 @@ bool Intake::DetectAndDecryptParamLine(const std::string& line, Json::Value& sec
       !CipherEnvelope::addLine(copy.c_str(), section)) {
     return false;
   }
-  if (!section.empty() && !DecryptAESParam(section)) {
+  if (section.size() != 0 && !DecryptAESParam(section)) {
     return false;
   }
   if (!JsonHelper::hasMember(JsonHelper::member(section, kEnvelope), CipherEnvelope::kCipherText)) {

@@ -33,10 +33,10 @@ bool isContentType(const std::string& name) {
 
 /// Whether a header makes a line; one that should but cannot is logged.
 bool isSendable(const std::string& name, const Json::Value& value) {
-  if (!value.isString()) {
+  if (value.type() != Json::stringValue) {
     return false;
   }
-  if (!isToken(name) || !fitsOneLine(value.asString())) {
+  if (!isToken(name) || !fitsOneLine(JsonHelper::asString(value))) {
     WEBAPI_LOG("WebEntry.cpp", "header %s is not sent", LogText(name).c_str());
     return false;
   }
@@ -51,7 +51,9 @@ std::vector<std::string> HeaderLines(const APIResponse& response) {
   std::string contentType;
   size_t contentTypeLine = 0;
   for (auto it = headers.begin(); it != headers.end(); ++it) {
-    const std::string name = it.name();
+    const char* end = nullptr;
+    const char* start = it.memberName(&end);
+    const std::string name(start, end);
     if (!isSendable(name, *it)) {
       continue;
     }
@@ -72,7 +74,8 @@ std::vector<std::string> HeaderLines(const APIResponse& response) {
 
 std::vector<std::string> CookieLines(const APIResponse& response) {
   std::vector<std::string> lines;
-  for (const Json::Value& cookie : response.GetCookies()) {
+  const Json::Value cookies = response.GetCookies();
+  for (const Json::Value& cookie : cookies) {
     if (!cookie.isString()) {
       continue;
     }

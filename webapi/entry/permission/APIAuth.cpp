@@ -62,7 +62,7 @@ int checkSession(const APIRequest& request, const char* session, bool allowTimeo
   }
   QeloCgiLoadInCookies(&context);
   char name[kUserNameSize] = {};
-  const QeloCgiAuthFlags flags{IsSessionFromParameter(request) ? 1U : 0U, 0};
+  const QeloCgiAuthFlags flags{IsSessionFromParameter(request, session) ? 1U : 0U, 0};
   const int result =
       QeloCgiIsAuthorizedEx(&context, &flags, name, kUserNameSize, allowTimeout ? 1 : 0, 1);
   user = name;

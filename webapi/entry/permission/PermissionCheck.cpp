@@ -14,11 +14,14 @@
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
+#include "webapi/base/Number.h"
 #include "webapi/entry/permission/SessionOrigin.h"
 #include "webapi/entry/permission/UserClass.h"
+#include "webapi/json/Literal.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Token.h"
+#include "webapi/runner/CallName.h"
 #include "webapi/runner/CompoundCall.h"
 
 namespace QELO {
@@ -119,7 +122,9 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
   if (request == nullptr || response == nullptr) {
     return false;
   }
-  const bool allowTimeout = runner_.GetMethodAttr(request, "allowTimeout");
+  const CallName call(*request);
+  const bool allowTimeout =
+      runner_.GetMethodAttr(call.api, call.version, call.method, "allowTimeout");
   int code = CheckPermission(allowTimeout);
   const unsigned slot = SlotOf(allowTimeout);
   int result = JsonHelper::asInt(KnownResult(slot), AUTHORIZED_UNKNOWN);
@@ -143,7 +148,7 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
     }
     return false;
   }
-  if (!IsAllowedUser(request)) {
+  if (!IsAllowedUser(*request, call)) {
     response->SetError(WEBAPI_ERR_NO_PERMISSION);
     return false;
   }
@@ -152,15 +157,16 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
     response->SetError(WEBAPI_ERR_NO_APP_PRIVILEGE);
     return false;
   }
-  Json::Value session;
   Json::Value& record = request->Serialize();
-  if (request == &caller_ && JsonHelper::member(record, "session").isObject()) {
-    session.swap(record["session"]);  // holds already what the check found
-  } else {
-    session = sessionOf(caller_);
+  const auto hasSession = [&record] {
+    return JsonHelper::member(record, "session").type() == Json::objectValue;
+  };
+  if (request != &caller_ || !hasSession()) {
+    request->InitSession(sessionOf(caller_));  // the caller's own holds already what was found
   }
-  session["appPriv"] = JsonHelper::asString(appPriv);
-  request->InitSession(std::move(session));
+  if (hasSession()) {
+    record[Literal("session")][Literal("appPriv")] = JsonHelper::asString(appPriv);
+  }
   request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
   return true;
 }
@@ -174,17 +180,17 @@ bool PermissionCheck::CoversInnerCall(const APIRequest& request, const Finding& 
   return IsTokenGranted(request, user, kUserNameSize);
 }
 
-bool PermissionCheck::IsAllowedUser(APIRequest* request) {
+bool PermissionCheck::IsAllowedUser(APIRequest& request, const CallName& call) {
   const std::string user = caller_.GetLoginUserName();
-  const Json::Value& allowUser = descriptionOf(*request).GetAllowUser(
-      runner_.GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod()));
+  const Json::Value& allowUser =
+      descriptionOf(request).GetAllowUser(runner_.GetMethod(call.api, call.version, call.method));
   return !user.empty() && ListsUserClass(allowUser, APIAuth::GetUserClass(caller_.IsAdmin(), user));
 }
 
 const Json::Value& PermissionCheck::KnownResult(unsigned slot) const {
   const Json::Value& results = JsonHelper::member(permission_, "permResult");
-  return results.isArray() && results.isValidIndex(slot) ? results[slot]
-                                                         : Json::Value::nullSingleton();
+  return results.type() == Json::arrayValue && slot < results.size() ? results[slot]
+                                                                     : Json::Value::nullSingleton();
 }
 
 int PermissionCheck::CheckPermission(bool allowTimeout) {
@@ -192,7 +198,7 @@ int PermissionCheck::CheckPermission(bool allowTimeout) {
   TurnTo(slot);
   const Json::Value& known = KnownResult(slot);
   const int result = known.isInt() ? known.asInt() : Authorise(allowTimeout);
-  permission_["permResult"][slot] = result;
+  permission_[Literal("permResult")][slot] = Json::Int64{result};
   caller_.SetAuthResult(static_cast<_tag_authorized_result_>(result));
   return errorOf(result);
 }
@@ -225,17 +231,22 @@ int PermissionCheck::Authorise(bool allowTimeout) {
   int result = AUTHORIZED_NO_SESSION;
   char user[kUserNameSize] = {};
   const std::string language = QeloCgiGetLang(context_);
-  if (!caller_.GetSessionID().empty()) {
-    const QeloCgiAuthFlags flags{IsSessionFromParameter(caller_) ? 1U : 0U, KeepsIdle() ? 1U : 0U};
+  const std::string session = caller_.GetSessionID();
+  if (!session.empty()) {
+    const CallName call(caller_);
+    const QeloCgiAuthFlags flags{IsSessionFromParameter(caller_, session) ? 1U : 0U,
+                                 KeepsIdle(call) ? 1U : 0U};
+    const bool anyAddress =
+        runner_.GetMethodAttr(call.api, call.version, call.method, "skipCheckIP");
     result = QeloCgiIsAuthorizedEx(context_, &flags, user, kUserNameSize, allowTimeout ? 1 : 0,
-                                   runner_.GetMethodAttr(&caller_, "skipCheckIP") ? 0 : 1);
+                                   anyAddress ? 0 : 1);
   }
   if (result < 0) {
     const char* token = caller_.GetQeloAccessTokenID();
     if (token == nullptr || *token == '\0') {
       return result;
     }
-    if (!caller_.GetSessionID().empty()) {
+    if (!session.empty()) {
       // Nothing of a refused session may stay: a method could act on it in the token's name.
       memset(user, 0, sizeof user);
       caller_.SetCookie("id", "");
@@ -254,11 +265,11 @@ int PermissionCheck::Authorise(bool allowTimeout) {
 
 /// Whether the request is no use of the session: its method says so, or those of all its entries
 /// do.
-bool PermissionCheck::KeepsIdle() {
+bool PermissionCheck::KeepsIdle(const CallName& call) {
   constexpr char kAttribute[] = "keepIdle";
   const Json::Value& entries = caller_.GetParamRef("compound", Json::Value::nullSingleton());
-  if (!entries.isArray() || caller_.GetAPIClass() != kCompoundAPI) {
-    return runner_.GetMethodAttr(&caller_, kAttribute);
+  if (entries.type() != Json::arrayValue || call.api != kCompoundAPI) {
+    return runner_.GetMethodAttr(call.api, call.version, call.method, kAttribute);
   }
   return std::all_of(entries.begin(), entries.end(), [&](const Json::Value& entry) {
     return runner_.GetMethodAttr(JsonHelper::asString(JsonHelper::member(entry, "api")),
@@ -272,18 +283,19 @@ void PermissionCheck::FillSession(const std::string& user, const std::string& la
                                   bool isAuthorized) {
   setenv(kUserVariable, user.c_str(), 1);
   Json::Value session(Json::objectValue);
-  session["username"] = user;
-  session["isAdmin"] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
-  session["sessFile"] = optionOf(context_, "sessfile");
-  session["isTimeout"] = optionOf(context_, "istimeout") == "1";
-  session["timeout"] =
-      static_cast<Json::Int64>(strtol(optionOf(context_, "timeout", "0").c_str(), nullptr, 10));
-  session["isSkipCheckIP"] = optionOf(context_, "skipcheckip") == "1";
-  session["uiLang"] = language;
-  session["app"] = optionOf(context_, "app");
-  session["webapi"] = optionOf(context_, "webapi");
-  session["isAuthorized"] = isAuthorized;
-  session["tokenEnable"] = QeloCgiIsTokenEnable(context_) != 0;
+  session[Literal("username")] = user;
+  session[Literal("isAdmin")] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
+  session[Literal("sessFile")] = optionOf(context_, "sessfile");
+  session[Literal("isTimeout")] = optionOf(context_, "istimeout") == "1";
+  Json::Int64 timeout = 0;
+  ParseNumber(optionOf(context_, "timeout"), timeout);
+  session[Literal("timeout")] = timeout;
+  session[Literal("isSkipCheckIP")] = optionOf(context_, "skipcheckip") == "1";
+  session[Literal("uiLang")] = language;
+  session[Literal("app")] = optionOf(context_, "app");
+  session[Literal("webapi")] = optionOf(context_, "webapi");
+  session[Literal("isAuthorized")] = isAuthorized;
+  session[Literal("tokenEnable")] = QeloCgiIsTokenEnable(context_) != 0;
   caller_.InitSession(std::move(session));
 }
 

@@ -11,6 +11,7 @@ namespace QELO {
 class APIRequest;
 class APIResponse;
 class APIRunner;
+struct CallName;
 
 /// Who calls, and whether that user may run a method. The operations are WebEntry's of the same
 /// name.
@@ -45,8 +46,8 @@ class PermissionCheck {
   int Authorise(bool allowTimeout);
   void FillSession(const std::string& user, const std::string& language, bool isAuthorized);
   bool CoversInnerCall(const APIRequest& request, const Finding& finding);
-  bool KeepsIdle();
-  bool IsAllowedUser(APIRequest* request);
+  bool KeepsIdle(const CallName& call);
+  bool IsAllowedUser(APIRequest& request, const CallName& call);
 
   APIRunner& runner_;
   APIRequest& caller_;

@@ -8,10 +8,10 @@
 namespace QELO {
 
 bool ListsUserClass(const Json::Value& allowUser, const std::string& userClass) {
-  const Json::Value wanted(userClass);
-  return allowUser.isArray() &&
-         std::any_of(allowUser.begin(), allowUser.end(),
-                     [&wanted](const Json::Value& entry) { return entry == wanted; });
+  return allowUser.type() == Json::arrayValue &&
+         std::any_of(allowUser.begin(), allowUser.end(), [&](const Json::Value& entry) {
+           return JsonHelper::isText(entry, userClass);
+         });
 }
 
 bool HoldsAppPriv(const Json::Value& appPriv, const std::string& user, const std::string& address) {

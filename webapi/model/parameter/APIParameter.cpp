@@ -53,10 +53,10 @@ bool parse(const Json::Value& value, Json::ValueType, double& target) {
 
 template <>
 bool parse(const Json::Value& value, Json::ValueType, std::string& target) {
-  if (!value.isString()) {
+  if (value.type() != Json::stringValue) {
     return false;
   }
-  target = value.asString();
+  target = JsonHelper::asString(value);
   return true;
 }
 
@@ -188,7 +188,7 @@ template <typename T>
 bool APIParameter<T>::CheckValueTypeAndGet(const Json::Value& value, Json::ValueType type,
                                            Validator validator) {
   MarkSet();
-  if (value.isNull()) {
+  if (value.type() == Json::nullValue) {
     MarkReset();
     return true;
   }

@@ -52,6 +52,10 @@ void APIRequest::InitParam(const Json::Value& params, bool replace) {
   private_->InitParam(params, replace);
 }
 
+void APIRequest::InitParam(Json::Value&& params, bool replace) {
+  private_->InitParam(std::move(params), replace);
+}
+
 void APIRequest::InitAPIInfo(const Json::Value& description) {
   private_->InitAPIInfo(description);
 }
@@ -117,6 +121,11 @@ bool APIRequest::SetAttr(const std::string& name, const Json::Value& value) {
 }
 
 Json::Value APIRequest::GetAPIInfo(const std::string& name, const Json::Value& def) const {
+  return private_->GetData("reqLib", name, def);
+}
+
+const Json::Value& APIRequest::GetAPIInfoRef(const std::string& name,
+                                             const Json::Value& def) const {
   return private_->GetData("reqLib", name, def);
 }
 

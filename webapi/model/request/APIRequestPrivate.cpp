@@ -5,9 +5,9 @@
 #include <cstdint>
 #include <cstdlib>
 #include <utility>
-#include <vector>
 
 #include "webapi/JsonHelper.h"
+#include "webapi/json/Literal.h"
 #include "webapi/platform/Cgi.h"
 
 namespace QELO {
@@ -50,21 +50,17 @@ void APIRequestPrivate::InitEnv(Json::Value env) {
   InitSharing();
 }
 
-void APIRequestPrivate::InitParam(const Json::Value& params, bool replace) {
-  // Copied before anything changes: `params` may lie in the section that is cleared and filled.
-  std::vector<Json::Value> sections;
-  for (const char* source : {"getParam", "postParam"}) {
-    if (JsonHelper::hasMember(params, source)) {
-      sections.push_back(JsonHelper::member(params, source));
-    }
-  }
+void APIRequestPrivate::InitParam(Json::Value params, bool replace) {
   if (replace) {
     ClearData("param", "");
   }
-  for (Json::Value& section : sections) {
-    DecryptParam(section);
-    SetAPIDesc(section);
-    TakeData("param", std::move(section), false);
+  for (const char* source : {"getParam", "postParam"}) {
+    if (JsonHelper::hasMember(params, source)) {
+      Json::Value& section = params[Literal(source)];
+      DecryptParam(section);
+      SetAPIDesc(section);
+      TakeData("param", std::move(section), false);
+    }
   }
 }
 
@@ -84,7 +80,7 @@ void APIRequestPrivate::Restore(Json::Value& record) {
 void APIRequestPrivate::SetAPIDesc(const Json::Value& params) {
   for (const char* key : {"api", "method"}) {
     if (const Json::Value* text = JsonHelper::find(params, key)) {
-      Put("private", key, text->isString() ? *text : JsonHelper::asString(*text));
+      Put("private", key, JsonHelper::asString(*text));
     }
   }
   if (const Json::Value* version = JsonHelper::find(params, "version")) {

@@ -24,7 +24,7 @@ class APIRequestPrivate : public APIBase {
   APIRequestPrivate(const APIRequestPrivate&) = default;
 
   void InitEnv(Json::Value env);
-  void InitParam(const Json::Value& params, bool replace);
+  void InitParam(Json::Value params, bool replace);
   void InitAPIInfo(const Json::Value& description);
   void InitSession(Json::Value session);
   /// Takes a deserialized store; what is kept beside the store is made anew from it.

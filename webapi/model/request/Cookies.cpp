@@ -14,7 +14,8 @@ void APIRequestPrivate::InitCookie() {
   if (header == nullptr || !header->getString(&begin, &end) || cookies == nullptr) {
     return;
   }
-  for (const Json::Value& piece : WebAPIUtil::ParseToArray(begin, ";")) {
+  const Json::Value pieces = WebAPIUtil::ParseToArray(begin, ";");
+  for (const Json::Value& piece : pieces) {
     piece.getString(&begin, &end);
     const std::string_view text(begin, static_cast<size_t>(end - begin));
     const size_t equals = text.find('=');

@@ -12,7 +12,7 @@ bool APIRequestPrivate::DecryptParam(Json::Value& section) {
                                   *level)) {
       return false;
     }
-    if (!level->empty() && !DecryptAESParam(*level)) {
+    if (level->size() != 0 && !DecryptAESParam(*level)) {
       return false;
     }
     if (!JsonHelper::hasMember(*level, "webapi")) {

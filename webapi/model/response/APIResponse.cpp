@@ -16,7 +16,7 @@ constexpr char kServerError[] = "x-request-error";
 
 APIResponse::APIResponse(APIRequest* request)
     : private_(std::make_unique<APIResponsePrivate>(request, this)) {
-  private_->Put("headers", "Content-type", "application/json; charset=\"UTF-8\"");
+  private_->Put("headers", "Content-type", std::string("application/json; charset=\"UTF-8\""));
 }
 
 APIResponse::~APIResponse() = default;

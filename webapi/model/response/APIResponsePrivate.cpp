@@ -26,11 +26,12 @@ void APIResponsePrivate::SetError(int code, const Json::Value& data) {
   Json::Value body(Json::objectValue);
   body[Literal("success")] = code == 0;
   Json::Value* detail = nullptr;
+  const bool isNull = data.type() == Json::nullValue;
   if (code != 0) {
     Json::Value& error = body[Literal("error")];
     error[Literal("code")] = Json::Int64{code};
-    detail = data.isNull() ? nullptr : &error[Literal("errors")];
-  } else if (!data.isNull()) {
+    detail = isNull ? nullptr : &error[Literal("errors")];
+  } else if (!isNull) {
     detail = &body[Literal("data")];
   }
   if (detail != nullptr) {

@@ -10,12 +10,15 @@
 #include "webapi/base/DescriptionFile.h"
 #include "webapi/base/Log.h"
 #include "webapi/json/Fault.h"
+#include "webapi/json/Literal.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
 #include "webapi/platform/WebAPIUtil.h"
 
 namespace QELO {
 namespace {
+
+constexpr const char* kRequestFormat = "requestFormat";
 
 /// Says, beside that a file is not valid, where it is wrong.
 void logFault(const std::string& path) {
@@ -52,10 +55,10 @@ Json::Value& Catalogue::ApplyLibDef(Json::Value& description) const {
   if (!takesMembers(description)) {
     return description;
   }
-  for (const char* key : {"authLevel", "allowUser", "requestFormat", "priority"}) {
+  for (const char* key : {"authLevel", "allowUser", kRequestFormat, "priority"}) {
     if (!JsonHelper::hasMember(description, key)) {
-      description[key] = key == std::string("requestFormat") ? Json::Value("JSON")
-                                                             : JsonHelper::member(libDef_, key);
+      description[Literal(key)] =
+          key == kRequestFormat ? Json::Value("JSON") : JsonHelper::member(libDef_, key);
     }
   }
   return description;
@@ -120,21 +123,26 @@ bool Catalogue::InitLibDesc(Json::Value& target, const std::string& api) const {
 }
 
 bool Catalogue::AddAPIInfo(APIRequest* request) const {
-  if (request == nullptr || !JsonHelper::hasMember(known_, request->GetAPIClass())) {
+  const Json::Value* description =
+      request != nullptr ? JsonHelper::find(known_, request->GetAPIClass()) : nullptr;
+  if (description == nullptr) {
     return false;
   }
-  request->InitAPIInfo(known_[request->GetAPIClass()]);
+  request->InitAPIInfo(*description);
   return true;
 }
 
 const Json::Value& Catalogue::GetMethod(const std::string& api, int version,
                                         const std::string& method) {
   const Json::Value& defaults = JsonHelper::member(libDef_, "methods");
-  if (!InitLibDesc(known_, api)) {
+  const Json::Value* description = JsonHelper::find(known_, api);
+  if (description == nullptr && InitLibDesc(known_, api)) {
+    description = JsonHelper::find(known_, api);
+  }
+  if (description == nullptr) {
     return defaults;
   }
-  const Json::Value* own =
-      APIDescription(JsonHelper::member(known_, api)).Attributes(version, method);
+  const Json::Value* own = APIDescription(*description).Attributes(version, method);
   return own != nullptr ? *own : defaults;
 }
 
@@ -152,10 +160,11 @@ int Catalogue::CheckRequestParam(APIRequest& request) {
   if (api.empty() || version < 1 || method.empty()) {
     return WEBAPI_ERR_BAD_REQUEST;
   }
-  if (!InitLibDesc(known_, api) || !JsonHelper::hasMember(known_, api)) {
+  const Json::Value* found = InitLibDesc(known_, api) ? JsonHelper::find(known_, api) : nullptr;
+  if (found == nullptr) {
     return WEBAPI_ERR_NO_SUCH_API;
   }
-  const APIDescription description(known_[api]);
+  const APIDescription description(*found);
   if (!description.HasVersion(version)) {
     return WEBAPI_ERR_NO_SUCH_VERSION;
   }

@@ -7,6 +7,7 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
+#include "webapi/runner/CallName.h"
 #include "webapi/runner/execution/Credentials.h"
 #include "webapi/runner/execution/Fence.h"
 #include "webapi/runner/execution/Priority.h"
@@ -16,25 +17,23 @@
 namespace QELO {
 namespace {
 
-/// The first entry for the request's call, or the terminating one.
+/// The first entry for the call, or the terminating one.
 template <typename Entry>
-const Entry& findEntry(const Entry* table, const APIRequest& request) {
-  const std::string api = request.GetAPIClass();
-  const int version = request.GetAPIVersion();
-  const std::string method = request.GetAPIMethod();
-  while (table->api != nullptr && (table->version != version || api != table->api ||
-                                   table->method == nullptr || method != table->method)) {
+const Entry& findEntry(const Entry* table, const CallName& call) {
+  while (table->api != nullptr && (table->version != call.version || call.api != table->api ||
+                                   table->method == nullptr || call.method != table->method)) {
     ++table;
   }
   return *table;
 }
 
 /// Asks the library's check function, where there is one for the call.
-bool passesCheck(const _tag_API_CHECK_TABLE* table, APIRequest* request, APIResponse* response) {
+bool passesCheck(const _tag_API_CHECK_TABLE* table, const CallName& call, APIRequest* request,
+                 APIResponse* response) {
   if (table == nullptr) {
     return true;
   }
-  const _tag_API_CHECK_TABLE& entry = findEntry(table, *request);
+  const _tag_API_CHECK_TABLE& entry = findEntry(table, call);
   if (entry.check == nullptr) {
     return true;
   }
@@ -129,11 +128,13 @@ bool Execution::Run(const Json::Value& attributes) {
     response_->SetError(WEBAPI_ERR_NO_LIBRARY);
     return false;
   }
-  priority.Set(JsonHelper::asInt(request_->GetAPIInfo("priority", 0)));
-  if (!passesCheck(checkTable, request_, response_)) {
+  const CallName call(*request_);
+  priority.Set(
+      JsonHelper::asInt(request_->GetAPIInfoRef("priority", Json::Value::nullSingleton())));
+  if (!passesCheck(checkTable, call, request_, response_)) {
     return false;
   }
-  const _tag_API_TABLE& entry = findEntry(table, *request_);
+  const _tag_API_TABLE& entry = findEntry(table, call);
   if (entry.api == nullptr || entry.function == nullptr) {
     response_->SetError(WEBAPI_ERR_METHOD_MISSING);
     return false;

@@ -44,7 +44,8 @@ bool LibraryCache::OpenLib(APIRequest* request, _tag_API_TABLE** table,
 }
 
 bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
-  const std::string path = JsonHelper::asString(request->GetAPIInfo("lib", ""));
+  const std::string path =
+      JsonHelper::asString(request->GetAPIInfoRef("lib", Json::Value::nullSingleton()));
   if (path.empty()) {
     WEBAPI_LOG("APIRunner.cpp", "library path empty");
     return false;
@@ -68,13 +69,15 @@ bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
 }
 
 /// Kept, since looking for what is not there walks all that the library depends on.
-void* LibraryCache::FindFunction(void* handle, const char* name) {
-  const auto [entry, isNew] = functions_.try_emplace({handle, name}, nullptr);
-  if (isNew) {
-    entry->second = dlsym(handle, name);
-    dlerror();  // its text is made when it is asked for, or at the next failure
+void* LibraryCache::FindFunction(void* handle, std::string_view name) {
+  for (const Function& known : functions_) {
+    if (known.library == handle && known.name == name) {
+      return known.address;
+    }
   }
-  return entry->second;
+  functions_.push_back({handle, name, dlsym(handle, name.data())});
+  dlerror();  // its text is made when it is asked for, or at the next failure
+  return functions_.back().address;
 }
 
 bool LibraryCache::GetTableFunc(void* handle, _tag_API_TABLE** table) {

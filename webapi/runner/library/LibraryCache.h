@@ -2,7 +2,8 @@
 
 #include <map>
 #include <string>
-#include <utility>
+#include <string_view>
+#include <vector>
 
 #include "webapi/APITable.h"
 
@@ -24,10 +25,17 @@ class LibraryCache {
   void CloseLib();
 
  private:
-  void* FindFunction(void* handle, const char* name);
+  struct Function {
+    void* library;
+    std::string_view name;
+    void* address;  ///< null: the library has none
+  };
+
+  /// @param name  lives as long as the process, with a NUL behind it
+  void* FindFunction(void* handle, std::string_view name);
 
   std::map<std::string, void*>& libraries_;
-  std::map<std::pair<void*, std::string>, void*> functions_;  ///< null: the library has none
+  std::vector<Function> functions_;
 };
 
 }  // namespace QELO
