@@ -130,9 +130,12 @@ bool WebEntry::Run(const Json::Value&) {
     guarded([this] { Response()->SetError(WEBAPI_ERR_NO_ANSWER); });
   }
   if (!guarded([&] { answer(*Response(), body); })) {
+    // Of one of its own: what there was no memory for may stand in any part of the response.
     guarded([&] {
       Response()->SetError(WEBAPI_ERR_NO_ANSWER);
-      answer(*Response(), body);
+      APIResponse refusal(nullptr);
+      refusal.SetError(WEBAPI_ERR_NO_ANSWER);
+      answer(refusal, body);
     });
   }
   if (Response()->GetHttpdRestart()) {
