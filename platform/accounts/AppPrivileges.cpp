@@ -118,7 +118,7 @@ bool readRules(const std::string& application, Json::Value& rules) {
   }
   if (!readable || !areRules(rules)) {
     WEBAPI_LOG(kSource, "%s: no rules can be read for %s", Paths::kAppPrivileges,
-               application.c_str());
+               LogText(application).c_str());
     return false;
   }
   return true;

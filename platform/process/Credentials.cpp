@@ -54,7 +54,7 @@ bool switchAsRoot(const Account& account, bool keepPrivilege) {
   if (setgroups(groups.size(), groups.data()) == 0 && setIds(account, keepPrivilege)) {
     return true;
   }
-  WEBAPI_LOG(kSource, "cannot become %s [%s]", account.name.c_str(), strerror(errno));
+  WEBAPI_LOG(kSource, "cannot become %s [%s]", LogText(account.name).c_str(), strerror(errno));
   restoreGroupIds(before);
   return false;
 }
@@ -69,11 +69,11 @@ bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
     case Lookup::kFound:
       break;
     case Lookup::kAbsent:
-      WEBAPI_LOG(kSource, "there is no account %s", name);
+      WEBAPI_LOG(kSource, "there is no account %s", QELO::LogText(name).c_str());
       errno = ENOENT;
       return false;
     default:
-      WEBAPI_LOG(kSource, "cannot look up the account %s", name);
+      WEBAPI_LOG(kSource, "cannot look up the account %s", QELO::LogText(name).c_str());
       errno = EIO;
       return false;
   }
@@ -86,7 +86,7 @@ bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
     return switchAsRoot(account, keepPrivilege);
   }
   if (account.uid != geteuid() || account.gid != getegid()) {
-    WEBAPI_LOG(kSource, "cannot become %s without root's rights", name);
+    WEBAPI_LOG(kSource, "cannot become %s without root's rights", QELO::LogText(name).c_str());
     errno = EPERM;
     return false;
   }

@@ -81,7 +81,7 @@ bool guarded(Call call) {
     call();
     return true;
   } catch (const std::exception& error) {
-    WEBAPI_LOG("WebEntry.cpp", "%s", error.what());
+    WEBAPI_LOG("WebEntry.cpp", "%s", LogText(error.what()).c_str());
   } catch (...) {
     WEBAPI_LOG("WebEntry.cpp", "an exception of no known kind");
   }

@@ -93,7 +93,7 @@ bool APIRunnerPrivate::SetCallName(const std::string& api, int version, const st
 void APIRunnerPrivate::SetLogIdentity(const std::string& text) {
   static char identity[kLongestName + 1];  // syslog keeps the pointer
   closelog();
-  const std::string shown = LogText(text).c_str();
+  const std::string shown = PrintableText(text).c_str();
   const size_t length = std::min(shown.size(), sizeof identity - 1);
   memcpy(identity, shown.data(), length);
   identity[length] = '\0';

@@ -195,7 +195,7 @@ void APIPollingPrivate::FinishTask(ARDO::Task& task, APIResponse* response) cons
     response->SetError(WEBAPI_ERR_NO_ANSWER);
   }
   if (task.reload() && !task.finish(task.getBoolProperty("auto_remove", false)) && task.reload()) {
-    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "set task id[%s] to finish fail", LogText(fullId).c_str());
   }
 }
 

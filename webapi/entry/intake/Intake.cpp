@@ -9,6 +9,7 @@
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
+#include "webapi/base/LogText.h"
 #include "webapi/entry/intake/RequestBody.h"
 #include "webapi/json/Literal.h"
 #include "webapi/model/request/CipherEnvelope.h"
@@ -87,7 +88,7 @@ bool Intake::InitPostParam(Json::Value& section) {
     RequestBody::CloseStandardInput();
     return received && !body.empty() && DetectAndDecryptParamLine(body, section);
   } catch (const std::exception& error) {
-    syslog(LOG_ERR, "%s:%d %s", "WebEntry", kExceptionLine, error.what());
+    syslog(LOG_ERR, "%s:%d %s", "WebEntry", kExceptionLine, LogText(error.what()).c_str());
     return false;
   }
 }

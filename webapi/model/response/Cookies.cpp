@@ -5,6 +5,7 @@
 
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/base/LogText.h"
 #include "webapi/base/Text.h"
 #include "webapi/model/response/APIResponsePrivate.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -41,7 +42,7 @@ bool APIResponsePrivate::AddCookie(const std::string& name, const std::string& v
   }
   if (!std::all_of(name.begin(), name.end(), isNameCharacter)) {
     syslog(LOG_ERR, "%s(%d)%s: key[%s] contains invalid character", "APIResponse.cpp", __LINE__,
-           "AddCookie", name.c_str());
+           "AddCookie", LogText(name).c_str());
     return false;
   }
   std::string line = name + "=" + WebAPIUtil::URLEncode(value) + "; path=" + path;

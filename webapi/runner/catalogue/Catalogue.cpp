@@ -71,8 +71,10 @@ void Catalogue::AddDescriptions(Json::Value& target, Json::Value& file) const {
   for (auto it = file.begin(); it != file.end(); ++it) {
     const std::string fault = APIDescription(*it).Fault();
     if (!fault.empty()) {
-      WEBAPI_LOG("APIRunner.cpp", "WebAPI description %s is not valid.", it.name().c_str());
-      WEBAPI_LOG("APIRunner.cpp", "description %s: %s", it.name().c_str(), fault.c_str());
+      WEBAPI_LOG("APIRunner.cpp", "WebAPI description %s is not valid.",
+                 LogText(it.name()).c_str());
+      WEBAPI_LOG("APIRunner.cpp", "description %s: %s", LogText(it.name()).c_str(),
+                 LogText(fault).c_str());
       continue;
     }
     ApplyLibDef(*it);
@@ -114,7 +116,7 @@ bool Catalogue::InitLibDesc(Json::Value& target, const std::string& api) const {
   errno = 0;
   Json::Value file;
   if (!WebAPIUtil::ReadJsonFile(path, file)) {
-    WEBAPI_LOG("APIRunner.cpp", "WebAPI description file %s is not valid", path.c_str());
+    WEBAPI_LOG("APIRunner.cpp", "WebAPI description file %s is not valid", LogText(path).c_str());
     logFault(path);
     return false;
   }

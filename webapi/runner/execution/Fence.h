@@ -16,7 +16,7 @@ bool Fence(const char* what, Call call, const char* source = "APIRunner.cpp") {
     call();
     return true;
   } catch (const std::exception& error) {
-    WEBAPI_LOG(source, "%s threw an exception: %s", what, error.what());
+    WEBAPI_LOG(source, "%s threw an exception: %s", what, LogText(error.what()).c_str());
   } catch (...) {
     WEBAPI_LOG(source, "%s threw an exception", what);
   }

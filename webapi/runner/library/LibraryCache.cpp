@@ -57,7 +57,8 @@ bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
   }
   void* opened = load(path);
   if (opened == nullptr) {
-    WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", path.c_str(), dlerror());
+    WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", LogText(path).c_str(),
+               LogText(dlerror()).c_str());
     return false;
   }
   libraries_[path] = opened;
@@ -88,7 +89,8 @@ bool LibraryCache::GetTableFunc(void* handle, _tag_API_TABLE** table) {
   const char* error =
       symbol == nullptr && dlsym(handle, kTableFunction) == nullptr ? dlerror() : nullptr;
   if (error != nullptr) {
-    syslog(LOG_DEBUG, "%s:%d cannot load table: %s", "APIRunner.cpp", __LINE__, error);
+    syslog(LOG_DEBUG, "%s:%d cannot load table: %s", "APIRunner.cpp", __LINE__,
+           LogText(error).c_str());
     return false;
   }
   *table = nullptr;
