@@ -2,14 +2,21 @@
 
 #include <json/json.h>
 
-#include <string>
+#include <cstddef>
+#include <string_view>
 
 namespace QELO::Platform {
 
-/// The JSON value that a text is as a whole. The text of a number is its JSON value only when no
-/// digit gets lost: integers of 64 bits, other numbers of up to 15 significant digits; that goes
-/// for the numbers within an array or object too.
-/// @return false, and `value` unchanged, when the text is no such JSON text
-bool parseJsonText(const std::string& text, Json::Value& value);
+enum class JsonText {
+  kValue,    ///< the text is one JSON value as a whole, of which no digit gets lost
+  kOther,    ///< it is not
+  kTooMany,  ///< it has more values than are left
+};
+
+/// Reads the JSON value that a text is as a whole, with the blanks around it.
+/// @param value       receives the value; unchanged when there is none
+/// @param valuesLeft  how many values there may be, nested ones counted; those that were read are
+///                    taken off
+JsonText readJsonText(std::string_view text, Json::Value& value, size_t& valuesLeft);
 
 }  // namespace QELO::Platform

@@ -27,7 +27,7 @@ ALLOWED = {
     "webapi/transfer": FLOOR | SEAM | {"webapi/model", "webapi/runner"},
     "webapi/entry": FLOOR | SEAM | {"webapi/model", "webapi/runner", "webapi/batch",
                                     "webapi/transfer"},
-    "platform": FLOOR | SEAM,
+    "platform": FLOOR | SEAM | {"webapi/json"},
     "programs": FLOOR | SEAM | {"webapi/json", "webapi/model", "webapi/runner", "webapi/batch",
                                 "webapi/entry"},
     "apis": {"webapi/model", "webapi/runner", "webapi/batch", "webapi/entry"},

@@ -7,7 +7,7 @@
 namespace QELO::JsonHelper {
 
 bool findFault(std::string_view text, Position& fault) {
-  const size_t offset = jsonTextFault(text, true, kMaxDepth);
+  const size_t offset = jsonTextFault(text, {.comments = true});
   if (offset == std::string_view::npos) {
     return false;
   }

@@ -16,7 +16,7 @@ namespace {
 bool parse(const std::string& text, bool comments, Json::Value& value) {
   try {
     Json::Value parsed;
-    const bool good = readJsonText(text, comments, kMaxDepth, parsed);
+    const bool good = readJsonText(text, {.comments = comments}, parsed) == ReadResult::kRead;
     if (good) {
       value.swap(parsed);
     }

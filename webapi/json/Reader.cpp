@@ -1,14 +1,10 @@
 #include "webapi/json/Reader.h"
 
 #include <charconv>
-#include <cmath>
-#include <cstdint>
-#include <limits>
 #include <string>
 
 #include "webapi/json/Literal.h"
-
-#include "webapi/base/Text.h"
+#include "webapi/json/Number.h"
 
 namespace QELO::JsonHelper {
 namespace {
@@ -44,26 +40,36 @@ void appendUtf8(unsigned code, std::string& text) {
 /// Recursive descent over the text; each step takes what it is named for off the front.
 class Reader {
  public:
-  Reader(std::string_view text, bool comments, int maxDepth)
+  Reader(std::string_view text, const Reading& how)
       : at_(text.data()),
         end_(text.data() + text.size()),
-        comments_(comments),
-        depthLeft_(maxDepth) {}
+        how_(how),
+        depthLeft_(how.maxDepth),
+        valuesLeft_(how.maxValues) {}
 
-  bool Text(Json::Value& value) {
-    if (comments_) {
+  ReadResult Text(Json::Value& value) {
+    if (how_.comments) {
       Word(kByteOrderMark);
     }
-    return Value(value) && at_ == end_;
+    if (Value(value) && at_ == end_) {
+      return ReadResult::kRead;
+    }
+    return hasTooMany_ ? ReadResult::kTooMany : ReadResult::kNoJson;
   }
 
   /// How many bytes were not taken.
   size_t Left() const { return Rest().size(); }
+  size_t Values() const { return how_.maxValues - valuesLeft_; }
 
  private:
   std::string_view Rest() const { return {at_, static_cast<size_t>(end_ - at_)}; }
 
   bool Value(Json::Value& value) {
+    if (valuesLeft_ == 0) {
+      hasTooMany_ = true;
+      return false;
+    }
+    --valuesLeft_;
     Blanks();
     const bool good = Bare(value);
     Blanks();
@@ -228,69 +234,14 @@ class Reader {
     return result.ec == std::errc() && result.ptr == last;
   }
 
-  bool Number(Json::Value& value) {
-    const char* start = at_;
-    Character('-');
-    if (!Character('0') && !Digits()) {
-      return false;
-    }
-    bool whole = true;
-    if (Character('.')) {
-      whole = false;
-      if (!Digits()) {
-        return false;
-      }
-    }
-    if (Character('e') || Character('E')) {
-      whole = false;
-      static_cast<void>(Character('+') || Character('-'));
-      if (!Digits()) {
-        return false;
-      }
-    }
-    return (whole && Integer(start, value)) || Real(start, value);
-  }
-
-  /// The number from `start` to here. @return false when it has more than 64 bits
-  bool Integer(const char* start, Json::Value& value) const {
-    int64_t number = 0;
-    uint64_t large = 0;
-    if (std::from_chars(start, at_, number).ec == std::errc() &&
-        number <= std::numeric_limits<int32_t>::max()) {
-      value = Json::Value(static_cast<Json::Int64>(number));
-      return true;
-    }
-    if (*start != '-' && std::from_chars(start, at_, large).ec == std::errc()) {
-      value = Json::Value(static_cast<Json::UInt64>(large));
-      return true;
-    }
-    return false;
-  }
-
-  bool Real(const char* start, Json::Value& value) const {
-    double number = 0;
-    if (std::from_chars(start, at_, number).ec != std::errc()) {
-      // Too small is as good as zero, too large is no number.
-      number = std::strtod(std::string(start, at_).c_str(), nullptr);
-    }
-    value = Json::Value(number);
-    return std::isfinite(number);
-  }
-
-  bool Digits() {
-    const char* start = at_;
-    while (at_ != end_ && IsDigit(*at_)) {
-      ++at_;
-    }
-    return at_ != start;
-  }
+  bool Number(Json::Value& value) { return readNumber(at_, end_, how_.keepDigits, value); }
 
   void Blanks() {
     do {
       while (at_ != end_ && (*at_ == ' ' || *at_ == '\t' || *at_ == '\r' || *at_ == '\n')) {
         ++at_;
       }
-    } while (comments_ && at_ != end_ && *at_ == '/' &&
+    } while (how_.comments && at_ != end_ && *at_ == '/' &&
              (Comment("//", "\n") || Comment("/*", "*/")));
   }
 
@@ -323,20 +274,29 @@ class Reader {
 
   const char* at_;
   const char* end_;
-  bool comments_;
+  const Reading& how_;
   int depthLeft_;
+  size_t valuesLeft_;
+  bool hasTooMany_ = false;
 };
 
 }  // namespace
 
-bool readJsonText(std::string_view text, bool comments, int maxDepth, Json::Value& value) {
-  return Reader(text, comments, maxDepth).Text(value);
+ReadResult readJsonText(std::string_view text, const Reading& how, Json::Value& value,
+                        size_t* values) {
+  Reader reader(text, how);
+  const ReadResult result = reader.Text(value);
+  if (values != nullptr) {
+    *values = reader.Values();
+  }
+  return result;
 }
 
-size_t jsonTextFault(std::string_view text, bool comments, int maxDepth) {
-  Reader reader(text, comments, maxDepth);
+size_t jsonTextFault(std::string_view text, const Reading& how) {
+  Reader reader(text, how);
   Json::Value value;
-  return reader.Text(value) ? std::string_view::npos : text.size() - reader.Left();
+  return reader.Text(value) == ReadResult::kRead ? std::string_view::npos
+                                                 : text.size() - reader.Left();
 }
 
 }  // namespace QELO::JsonHelper

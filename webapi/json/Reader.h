@@ -3,9 +3,28 @@
 #include <json/json.h>
 
 #include <cstddef>
+#include <cstdint>
 #include <string_view>
 
+#include "webapi/JsonHelper.h"
+
 namespace QELO::JsonHelper {
+
+/// How a text is read.
+struct Reading {
+  /// For files that people write: a byte order mark at the front and comments of both kinds are
+  /// accepted.
+  bool comments = false;
+  bool keepDigits = false;      ///< a number that would lose digits (readNumber) is none
+  int maxDepth = kMaxDepth;     ///< deepest nesting of arrays and objects that is accepted
+  size_t maxValues = SIZE_MAX;  ///< most values, nested ones counted, that are built
+};
+
+enum class ReadResult {
+  kRead,
+  kNoJson,   ///< or a number too large for a real, or half of a surrogate pair
+  kTooMany,  ///< more values than allowed; what follows them was not looked at
+};
 
 /// Reads a text that is one JSON value (RFC 8259) with nothing but blanks around it.
 ///
@@ -13,19 +32,13 @@ namespace QELO::JsonHelper {
 /// and "01" as numbers, raw control characters in strings, and anything behind a NUL; and what they
 /// cost at the first use is a thirtieth of a CGI process.
 ///
-/// Integers within 32 bits are signed, larger ones unsigned where they are not negative, as the
-/// JSON library has them; beyond 64 bits they are reals.
-///
-/// @param comments  for files that people write: a byte order mark at the front and comments
-///                  of both kinds are accepted
-/// @param maxDepth  deepest nesting of arrays and objects that is accepted
-/// @param value     receives the value; undefined when the text is refused
-/// @return false when the text is none, or holds a number too large for a real, or half of a
-///         surrogate pair
-bool readJsonText(std::string_view text, bool comments, int maxDepth, Json::Value& value);
+/// @param value   receives the value; undefined when the text is refused
+/// @param values  unless null, receives the number of values that were counted
+ReadResult readJsonText(std::string_view text, const Reading& how, Json::Value& value,
+                        size_t* values = nullptr);
 
 /// How many bytes of a text could be the beginning of one that readJsonText() takes; npos when it
 /// takes all of it.
-size_t jsonTextFault(std::string_view text, bool comments, int maxDepth);
+size_t jsonTextFault(std::string_view text, const Reading& how);
 
 }  // namespace QELO::JsonHelper

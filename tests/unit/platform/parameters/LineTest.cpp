@@ -146,40 +146,113 @@ TEST(ParameterValue, IntegerThatFitsNoTypeStaysAString) {
 }
 
 TEST(ParameterValue, WhatJsonDoesNotCallANumberStaysAString) {
-  for (const char* text : {"012", "%2B1", "1.", ".5", "-", "-a", "1e", "1e%2B", "0x10", "1 ", " 1",
-                           "1_000", "1,5", "--1", "-0", "NaN", "Infinity", "-Infinity", "00"}) {
+  for (const char* text : {"012", "%2B1", "1.", ".5", "-", "-a", "1e", "1e%2B", "0x10", "1_000",
+                           "1,5", "--1", "-0", "NaN", "Infinity", "-Infinity", "00"}) {
     EXPECT_EQ(value(text), '"' + URLDecode(text, true) + '"') << text;
   }
 }
 
-TEST(ParameterValue, RealsOfUpTo15DigitsAreNumbers) {
-  EXPECT_EQ(value("1.5"), "1.5");
-  EXPECT_EQ(value("-0.25"), "-0.25");
+TEST(ParameterValue, BlanksAroundAJsonTextArePartOfIt) {
+  for (const char* text : {" 1", "1 ", "%0a1%0d%09", "++1"}) {
+    EXPECT_EQ(value(text), "1") << text;
+  }
+  EXPECT_EQ(value(" [1, 2] "), "[1,2]");
+  EXPECT_EQ(value("%20%22a%22"), R"("a")");
+  EXPECT_EQ(value(" {}"), "{}");
+  EXPECT_EQ(value("\ttrue"), "true");
+  EXPECT_EQ(value(" "), R"(" ")");
+  EXPECT_EQ(value(" report"), R"(" report")");
+  EXPECT_EQ(value("%0b1"), R"("\u000b1")");
+}
+
+TEST(ParameterValue, RealThatKeepsItsDigitsIsANumber) {
+  for (const char* text :
+       {"1.5", "-0.25", "0.00123456789012345", "0.30000000000000004", "1763761560.123456",
+        "1763761560.1234567", "1.234567890123456", "1.7976931348623157e%2B308", "5e-324",
+        "2.2250738585072014e-308", "1e-310", "-0.0", "0.0"}) {
+    Json::Value object;
+    EXPECT_TRUE(strPairToJsonObj(std::string("v=") + text, object, true, true));
+    EXPECT_TRUE(object["v"].isDouble()) << text;
+    EXPECT_EQ(object["v"].asDouble(), std::strtod(URLDecode(text, true).c_str(), nullptr)) << text;
+  }
+}
+
+TEST(ParameterValue, RealMayBeWrittenInOtherFormsOfTheSameValue) {
   EXPECT_EQ(value("1e3"), "1000.0");
   EXPECT_EQ(value("1E%2B3"), "1000.0");
   EXPECT_EQ(value("25e-2"), "0.25");
-  EXPECT_EQ(value("0.0"), "0.0");
-  Json::Value object;
-  EXPECT_TRUE(strPairToJsonObj("v=0.00123456789012345", object, true, true));
-  EXPECT_DOUBLE_EQ(object["v"].asDouble(), 0.00123456789012345);
+  EXPECT_EQ(value("1.50"), "1.5");
+  EXPECT_EQ(value("1000000000000000000000.0"), "1e+21");
+  EXPECT_EQ(value("0.00000000000000000000000000000015e%2B30"), "0.15");
+  // All the digits that the double nearest to a tenth has.
+  EXPECT_EQ(value("0.1000000000000000055511151231257827021181583404541015625"), "0.1");
 }
 
 TEST(ParameterValue, RealThatWouldLoseDigitsStaysAString) {
-  EXPECT_EQ(value("1.234567890123456"), R"("1.234567890123456")");
-  EXPECT_EQ(value("1e400"), R"("1e400")");
-  EXPECT_EQ(value("1e-400"), R"("1e-400")");
-  EXPECT_EQ(value("1e-310"), R"("1e-310")");
+  for (const char* text :
+       {"1.23456789012345678", "0.300000000000000041", "1763761560.12345678", "1e400", "-1e400",
+        "1e-400", "4e-324", "0.10000000000000000555111512312578270211815834045410156251",
+        "9007199254740993.0", "1e99999999999999999999", "1e-99999999999999999999"}) {
+    EXPECT_EQ(value(text), '"' + std::string(text) + '"') << text;
+  }
+}
+
+TEST(ParameterValue, NumberOfEndlessDigitsStaysAString) {
+  const std::string digits = "0." + std::string(1'000'000, '1');
+  EXPECT_EQ(value(digits), '"' + digits + '"');
+  EXPECT_EQ(value("1." + std::string(1'000'000, '0')), "1.0");
 }
 
 TEST(ParameterValue, ArrayWithANumberThatWouldLoseDigitsStaysAString) {
   EXPECT_EQ(value("[18446744073709551616]"), R"("[18446744073709551616]")");
   EXPECT_EQ(value("[012]"), R"("[012]")");
-  EXPECT_EQ(value(R"({"a":1.2345678901234567})"), R"("{\"a\":1.2345678901234567}")");
+  EXPECT_EQ(value(R"({"a":1.23456789012345678})"), R"("{\"a\":1.23456789012345678}")");
+  EXPECT_EQ(value(R"({"a":[0.30000000000000004]})"), R"({"a":[0.30000000000000004]})");
 }
 
 TEST(ParameterValue, DigitsInAStringOfAnArrayAreNoNumber) {
   EXPECT_EQ(value(R"(["18446744073709551616","a\"012",-1])"),
             R"(["18446744073709551616","a\"012",-1])");
+}
+
+/// An array of so many zeros, without blanks.
+std::string zeros(size_t count) {
+  std::string text = "[0";
+  for (size_t i = 1; i < count; ++i) {
+    text += ",0";
+  }
+  return text + "]";
+}
+
+TEST(ParameterLimits, OneValueMoreRefusesTheLine) {
+  Json::Value object;
+  EXPECT_TRUE(strPairToJsonObj("v=" + zeros(kMostValues - 1), object, true, true));
+  EXPECT_EQ(object["v"].size(), kMostValues - 1);
+  object.clear();
+  EXPECT_FALSE(strPairToJsonObj("v=" + zeros(kMostValues), object, true, true));
+  EXPECT_FALSE(strPairToJsonObj("v=" + zeros(kMostValues - 1) + "&w=1", object, true, true));
+  EXPECT_FALSE(strPairToJsonObj("v=" + zeros(kMostValues - 1) + "&w=text", object, true, true));
+  EXPECT_TRUE(object.empty());
+}
+
+TEST(ParameterLimits, TextThatIsNoJsonIsOneValue) {
+  Json::Value object;
+  const std::string text = zeros(kMostValues - 10) + "x";
+  EXPECT_TRUE(strPairToJsonObj("v=" + text + "&w=" + text, object, true, true));
+  EXPECT_EQ(object["w"].asString(), text);
+  EXPECT_TRUE(strPairToJsonObj("v=" + zeros(2 * kMostValues), object, true, false));
+}
+
+TEST(ParameterLimits, OneParameterMoreRefusesTheLine) {
+  std::string line;
+  for (size_t i = 0; i < kMostParameters; ++i) {
+    line += "&p=";
+  }
+  Json::Value object;
+  EXPECT_TRUE(strPairToJsonObj(line + "&&", object, true, true));
+  object.clear();
+  EXPECT_FALSE(strPairToJsonObj(line + "&p=", object, true, true));
+  EXPECT_TRUE(object.empty());
 }
 
 }  // namespace
