@@ -78,7 +78,15 @@ bool APIBase::TakeData(const std::string& section, Json::Value&& members, bool s
     target->swap(members);
     return true;
   }
-  return SetData(section, members, stringOnly);
+  if (target == nullptr || members.empty() || !members.isObject()) {
+    return false;
+  }
+  for (auto it = members.begin(); it != members.end(); ++it) {
+    if (!stringOnly || it->isString()) {
+      (*target)[it.name()].swap(*it);
+    }
+  }
+  return true;
 }
 
 bool APIBase::ReplaceData(const std::string& section, Json::Value&& members) {

@@ -3,7 +3,9 @@
 #include <syslog.h>
 #include <unistd.h>
 
+#include <cstring>
 #include <exception>
+#include <utility>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
@@ -86,7 +88,7 @@ bool Intake::InitPostParam(Json::Value& section) {
     std::string body;
     const bool received = RequestBody::Read(STDIN_FILENO, length, RequestBody::kIdleLimit, body);
     RequestBody::CloseStandardInput();
-    return received && !body.empty() && DetectAndDecryptParamLine(body, section);
+    return received && !body.empty() && ReadLine(std::move(body), section);
   } catch (const std::exception& error) {
     syslog(LOG_ERR, "%s:%d %s", "WebEntry", kExceptionLine, LogText(error.what()).c_str());
     return false;
@@ -99,12 +101,19 @@ bool Intake::LoadUploadAPIDesc(Json::Value&) {
 }
 
 bool Intake::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {
-  std::string copy = line;
+  return ReadLine(line, section);
+}
+
+bool Intake::ReadLine(std::string line, Json::Value& section) {
   // Deciphered in place: the text ends at its first NUL, before and after.
-  if (QeloCgiDetectAndDecryptParamLine(copy.data()) == 0 ||
-      !CipherEnvelope::addLine(copy.c_str(), section)) {
+  if (QeloCgiDetectAndDecryptParamLine(line.data()) == 0) {
     return false;
   }
+  line.resize(strlen(line.c_str()));
+  if (!CipherEnvelope::addLine(line, section)) {
+    return false;
+  }
+  line = std::string();  // a body is as large as all that was made of it
   if (section.size() != 0 && !DecryptAESParam(section)) {
     return false;
   }

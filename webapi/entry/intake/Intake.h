@@ -27,6 +27,9 @@ class Intake {
   static bool DecryptAESParam(Json::Value& section);
 
  private:
+  /// DetectAndDecryptParamLine() of a line that nobody needs any longer.
+  static bool ReadLine(std::string line, Json::Value& section);
+
   APIRequest& request_;
   APIResponse& response_;
 };

@@ -3,48 +3,54 @@
 #include <poll.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
-#include <cstdlib>
-#include <memory>
+#include <exception>
+#include <utility>
 
 #include "webapi/base/NullDevice.h"
 
 namespace QELO::RequestBody {
 namespace {
 
-struct Free {
-  void operator()(char* memory) const { free(memory); }
-};
+constexpr size_t kPiece = 64 << 10;  // bytes that a pipe holds
+
+/// Reads up to `size` bytes into a text that has room for them.
+/// @return false when the input cannot be read
+bool receive(int fd, size_t size, std::chrono::milliseconds idleLimit, std::string& text) {
+  while (text.size() < size) {
+    pollfd input{fd, POLLIN, 0};
+    const int ready = TEMP_FAILURE_RETRY(poll(&input, 1, static_cast<int>(idleLimit.count())));
+    if (ready <= 0) {
+      return ready == 0;
+    }
+    const size_t received = text.size();
+    text.resize(std::min(size, received + kPiece));
+    const ssize_t count =
+        TEMP_FAILURE_RETRY(read(fd, text.data() + received, text.size() - received));
+    text.resize(received + static_cast<size_t>(std::max<ssize_t>(count, 0)));
+    if (count == 0 || (count < 0 && errno != EAGAIN)) {
+      return count == 0;
+    }
+  }
+  return true;
+}
 
 }  // namespace
 
 bool Read(int fd, int64_t length, std::chrono::milliseconds idleLimit, std::string& text) {
-  const size_t size = static_cast<size_t>(length);
-  // Zeroed by the kernel page by page as bytes arrive, so that an announced length costs nothing.
-  const std::unique_ptr<char, Free> buffer(static_cast<char*>(calloc(size + 1, 1)));
-  if (buffer == nullptr) {
+  std::string received;
+  try {
+    // The kernel gives pages as they are written to, so an announced length costs nothing.
+    received.reserve(static_cast<size_t>(length));
+  } catch (const std::exception&) {
     return false;
   }
-  size_t received = 0;
-  while (received < size) {
-    pollfd input{fd, POLLIN, 0};
-    const int ready = TEMP_FAILURE_RETRY(poll(&input, 1, static_cast<int>(idleLimit.count())));
-    if (ready < 0) {
-      return false;
-    }
-    if (ready == 0) {
-      break;
-    }
-    const ssize_t count = TEMP_FAILURE_RETRY(read(fd, buffer.get() + received, size - received));
-    if (count < 0 && errno != EAGAIN) {
-      return false;
-    }
-    if (count == 0) {
-      break;
-    }
-    received += count > 0 ? static_cast<size_t>(count) : 0;
+  if (!receive(fd, static_cast<size_t>(length), idleLimit, received)) {
+    return false;
   }
-  text = buffer.get();
+  received.resize(std::min(received.find('\0'), received.size()));
+  text = std::move(received);
   return true;
 }
 
