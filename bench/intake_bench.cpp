@@ -34,7 +34,6 @@ struct Body {
 };
 
 constexpr char kCall[] = "api=QELO.Access.Session&version=1&method=current&a=";
-constexpr char kCompound[] = "api=QELO.Entry.Request&version=1&method=request&compound=";
 constexpr size_t kAlmostTooMany = 49'900;      // values
 constexpr size_t kAlmostTooManyPairs = 9'900;  // parameters
 
@@ -77,7 +76,6 @@ const Body kBodies[] = {
     {"most-zeros", kCall, "0,", "0]", kAlmostTooMany},
     {"most-objects", kCall, "{\"abcdefghijklmnopqrstuvwxyz\":[]},", "0]", kAlmostTooMany / 2},
     {"most-parameters", "a=1", "&a=1", "", kAlmostTooManyPairs},
-    {"most-entries", kCompound, "{},", "0]", kAlmostTooMany},
 };
 
 [[noreturn]] void fail(const char* what) {

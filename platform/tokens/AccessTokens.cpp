@@ -24,7 +24,7 @@ extern "C" int QeloAccessTokenGrant(const char* token, const char* api, const ch
   const int result = grant(QELO::Paths::kTokenDatabase, token, api, method, user, size, error,
                            static_cast<int>(sizeof error));
   if (result == kTokenFailed) {
-    WEBAPI_LOG(kSource, "cannot check an access token [%s]", LogText(error).c_str());
+    WEBAPI_LOG(kSource, "cannot check an access token [%s]", QELO::LogText(error).c_str());
   }
   if (result != kTokenGranted) {
     return result;

@@ -8,6 +8,7 @@
 #include <exception>
 
 #include "webapi/WebEntry.h"
+#include "webapi/base/LogText.h"
 #include "webapi/base/NullDevice.h"
 #include "webapi/platform/Paths.h"
 
@@ -34,7 +35,7 @@ int main(int argc, char** argv) {
     return 0;
   } catch (
       const std::exception& error) {  // before or after the answer, which has a guard of its own
-    syslog(LOG_ERR, "%s:%d %s", "main.cpp", __LINE__, error.what());
+    syslog(LOG_ERR, "%s:%d %s", "main.cpp", __LINE__, QELO::LogText(error.what()).c_str());
   } catch (...) {
     syslog(LOG_ERR, "%s:%d %s", "main.cpp", __LINE__, "an exception of no known kind");
   }

@@ -11,6 +11,7 @@
 #include "webapi/APIResponse.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/MemoryBound.h"
 #include "webapi/entry/intake/Intake.h"
 #include "webapi/entry/intake/UnreadBody.h"
 #include "webapi/entry/output/AnswerText.h"
@@ -26,24 +27,37 @@ namespace QELO {
 namespace {
 
 constexpr int kAddressSize = 65;  ///< bytes of a remote address with its NUL
+/// Bytes of address space that a request may take before its method is called: three times what a
+/// body as large as it may be does.
+constexpr size_t kMostMemory = 256 << 20;
+/// Bytes of a credential that comes as a parameter: copies of it go into cookies and environment.
+constexpr long kLongestCredential = 4096;
 constexpr char kSessionCookie[] = "id=";
 constexpr char kOldSessionName[] = "abandoned";
 constexpr char kTokenVariable[] = "qeloAccessToken";
 
 /// A credential that may come as a parameter.
 struct Credential {
-  bool isSet;
+  bool isSet = false;
   std::string value;
 };
 
-Credential readCredential(const APIRequest& request, const char* name) {
+/// @return false when the parameter is longer than kLongestCredential
+bool readCredential(const APIRequest& request, const char* name, Credential& credential) {
+  const char* begin = nullptr;
+  const char* end = nullptr;
+  const Json::Value& sent = request.GetParamRef(name, Json::Value::nullSingleton());
+  if (sent.getString(&begin, &end) && end - begin > kLongestCredential) {
+    return false;
+  }
   const APIParameter<std::string> parameter =
       request.GetAndCheckString(name, APIRequest::PARAM_OPTIONAL, nullptr);
   // Environment variables end at a NUL, and a credential that something follows is another text.
   // What stands in its place is a part of none.
   std::string value = parameter.Get();
   std::replace(value.begin(), value.end(), '\0', '?');
-  return {parameter.IsSet(), value};
+  credential = {parameter.IsSet(), value};
+  return true;
 }
 
 std::string environmentText(const char* name) {
@@ -125,6 +139,7 @@ void WebEntry::Serve() {
 }
 
 bool WebEntry::Run(const Json::Value&) {
+  MemoryBound::Set(kMostMemory);
   UnreadBody body = UnreadBody::OfRequest();
   if (!guarded([this] { Serve(); })) {
     guarded([this] { Response()->SetError(WEBAPI_ERR_NO_ANSWER); });
@@ -138,6 +153,7 @@ bool WebEntry::Run(const Json::Value&) {
       answer(refusal, body);
     });
   }
+  MemoryBound::Lift();  // callbacks are methods' own
   if (Response()->GetHttpdRestart()) {
     Response()->SetCallbackFunc(RestartHttpd, nullptr);
   }
@@ -184,10 +200,16 @@ bool WebEntry::GatherEnvironment() {
 /// Credentials given as parameters take the place of those in cookies and headers, in the process
 /// environment too, where the platform's libraries look for them.
 bool WebEntry::RewriteCredentials() {
-  const Credential session = readCredential(*Request(), "_sid");
-  const Credential token = readCredential(*Request(), "tid");
-  const Credential sharing = readCredential(*Request(), "_sharing_id");
-  const Credential sharingSession = readCredential(*Request(), "_sharing_sid");
+  Credential session;
+  Credential token;
+  Credential sharing;
+  Credential sharingSession;
+  if (!readCredential(*Request(), "_sid", session) || !readCredential(*Request(), "tid", token) ||
+      !readCredential(*Request(), "_sharing_id", sharing) ||
+      !readCredential(*Request(), "_sharing_sid", sharingSession)) {
+    Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
   if (!session.isSet && !token.isSet && !sharing.isSet && !sharingSession.isSet) {
     return true;
   }

@@ -43,6 +43,11 @@ std::string firstArgument() {
   return shown.substr(0, shown.find(' '));
 }
 
+/// Names are C text to the system: each part ends at its NUL, and none is endless.
+std::string shownPart(const std::string& name) {
+  return name.substr(0, strnlen(name.c_str(), APIRunnerPrivate::kLongestName));
+}
+
 }  // namespace
 
 APIRunnerPrivate::APIRunnerPrivate(APIRunner* owner)
@@ -75,9 +80,7 @@ void APIRunnerPrivate::SetArgv0(const std::string& name) {
 }
 
 bool APIRunnerPrivate::SetCallName(const std::string& api, int version, const std::string& method) {
-  // Names are C text to the system: each part ends at its NUL, and none is endless.
-  const std::string call =
-      std::string(api.c_str()) + "_" + std::to_string(version) + "_" + method.c_str();
+  const std::string call = shownPart(api) + "_" + std::to_string(version) + "_" + shownPart(method);
   if (call == shownCall_) {
     return true;
   }

@@ -189,7 +189,7 @@ void APIPollingPrivate::FinishTask(ARDO::Task& task, APIResponse* response) cons
     return;  // it was removed meanwhile
   }
   if (response->private_->TaskLacksResult()) {
-    WEBAPI_LOG(kPollingSource, "cannot store a result of task id[%s]", fullId.c_str());
+    WEBAPI_LOG(kPollingSource, "cannot store a result of task id[%s]", LogText(fullId).c_str());
   }
   if (!task.hasProperty("task_run")) {
     response->SetError(WEBAPI_ERR_NO_ANSWER);

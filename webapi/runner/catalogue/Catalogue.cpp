@@ -24,8 +24,8 @@ constexpr const char* kRequestFormat = "requestFormat";
 void logFault(const std::string& path) {
   JsonHelper::Position fault;
   if (JsonHelper::findFileFault(path, fault)) {
-    WEBAPI_LOG("APIRunner.cpp", "%s:%zu:%zu: no JSON from here on", path.c_str(), fault.line,
-               fault.column);
+    WEBAPI_LOG("APIRunner.cpp", "%s:%zu:%zu: no JSON from here on", LogText(path).c_str(),
+               fault.line, fault.column);
   }
 }
 

@@ -7,6 +7,7 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/MemoryBound.h"
 #include "webapi/runner/CallName.h"
 #include "webapi/runner/execution/Credentials.h"
 #include "webapi/runner/execution/Fence.h"
@@ -106,6 +107,7 @@ bool callMethod(const _tag_API_TABLE& entry, const Json::Value& attributes, APIR
 }  // namespace
 
 bool Execution::Run(const Json::Value& attributes) {
+  MemoryBound::Lift();
   if (Credentials::AreLost()) {
     WEBAPI_LOG("APIRunner.cpp", "not called: the process has credentials of a call before");
     response_->SetError(WEBAPI_ERR_NO_ANSWER);

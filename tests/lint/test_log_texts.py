@@ -3,11 +3,11 @@ which cuts it and takes control characters out."""
 
 import re
 
-from sources import cpp_files, name
+from sources import name
+from test_log_table import arguments, product_files, text_of, without_comments
 
 CALL = re.compile(r"\b(WEBAPI_LOG|syslog)\s*\(")
 CONVERSION = re.compile(r"%(?:%|[-+ #0]*\d*(?:\.\d+)?(?:hh|h|ll|l|z|j|t)?([a-zA-Z]))")
-LITERAL = re.compile(r'"((?:[^"\\]|\\.)*)"')
 # What is never a client's: a literal, a constant, a file's line, what the system says of an error.
 OURS = re.compile(r'^(?:"[^"]*"|k[A-Z]\w*|Paths::k\w+|QELO::Paths::k\w+|strerror\(.*\))$', re.DOTALL)
 CUT = re.compile(r"^(?:QELO::)?LogText\(.*\)\.c_str\(\)$", re.DOTALL)
@@ -25,6 +25,8 @@ ALLOWED = {
      "opened ? use.Database().Error().c_str() : use.Error().c_str()"):
         "the database's or the system's word on a file",
     ("platform/tasks/module/TaskSchema.cpp", "directory.Path().c_str()"): "named by a user's number",
+    ("platform/tasks/StorePlace.cpp", "name.c_str()"): "a user's number",
+    ("platform/tasks/StorePlace.cpp", "aside.c_str()"): "a user's number and a secret",
     ("webapi/entry/WebEntry.cpp", "name"): "one of four variables",
     ("webapi/runner/execution/Credentials.cpp", "call"): "two literals",
     ("webapi/runner/execution/Credentials.cpp", "message"): "the system's word on an error",
@@ -32,42 +34,14 @@ ALLOWED = {
 }
 
 
-def arguments(code, start):
-    """The arguments of the call whose bracket opens before `start`, as written."""
-    found, depth, quoted, piece = [], 0, False, ""
-    position = start
-    while position < len(code):
-        char = code[position]
-        if quoted:
-            piece += char
-            if char == "\\":
-                position += 1
-                piece += code[position]
-            quoted = char != '"'
-        elif char in ")" and depth == 0:
-            break
-        elif char == "," and depth == 0:
-            found.append(piece.strip())
-            piece = ""
-        else:
-            quoted = char == '"'
-            depth += (char in "([{") - (char in ")]}")
-            piece += char
-        position += 1
-    return [*found, piece.strip()]
-
-
 def texts_of(path):
     """The arguments that log calls of a file show as text, as (line number, argument)."""
-    code = path.read_text()
+    code = without_comments(path.read_text())
     for match in CALL.finditer(code):
-        given = arguments(code, match.end())
         # syslog(priority, format, ...), WEBAPI_LOG(source, format, ...)
-        assert len(given) > 1 and given[1].startswith('"'), (name(path), given)
-        text = "".join(LITERAL.findall(given[1]))
-        kinds = [kind for kind in CONVERSION.findall(text) if kind not in ("", "m")]
-        values = given[2:]
-        assert len(kinds) == len(values), (name(path), given)
+        form, *values = arguments(code, match.end())[1:]
+        kinds = [kind for kind in CONVERSION.findall(text_of(form)) if kind not in ("", "m")]
+        assert len(kinds) == len(values), (name(path), form, values)
         line = code.count("\n", 0, match.start()) + 1
         for kind, value in zip(kinds, values):
             if kind == "s":
@@ -76,12 +50,7 @@ def texts_of(path):
 
 def checked():
     """All sources but the header that has the macro."""
-    return [
-        path
-        for path in cpp_files()
-        if name(path).startswith(("webapi/", "platform/", "apis/", "programs/"))
-        and name(path) != "webapi/base/Log.h"
-    ]
+    return [path for path in product_files() if name(path) != "webapi/base/Log.h"]
 
 
 def test_LogLines_CutWhatAClientMayHaveChosen():

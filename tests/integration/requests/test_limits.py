@@ -1,0 +1,117 @@
+"""What a request may hold, and what it may cost: far beyond what a person sends, and one beyond the
+limit."""
+
+import subprocess
+from urllib.parse import urlencode
+
+import pytest
+
+from conftest import BUILD, ENTRY, answer_of, run_entry
+
+OPEN = "api=QELO.Test.Open&version=1&method=plain"
+MOST_VALUES = 50_000
+MOST_PARAMETERS = 10_000
+LONGEST_CREDENTIAL = 4_096
+MIB = 1024  # KiB
+
+
+def code_of(answer):
+    return 0 if answer["success"] else answer["error"]["code"]
+
+
+def zeros(count):
+    return f"[{','.join(['0'] * count)}]"
+
+
+@pytest.fixture
+def logged(tmp_path):
+    """Runs entry.cgi with parameters in a body: its answer, and the lines that it logs."""
+
+    def run(**parameters):
+        log = tmp_path / "log"
+        log.unlink(missing_ok=True)
+        body = urlencode({"version": 1, "method": "get", **parameters}).encode()
+        output = run_entry(
+            body=body,
+            LD_PRELOAD=str(BUILD / "tests" / "integration" / "log_file.so"),
+            ASAN_OPTIONS="verify_asan_link_order=0",
+            LOG_FILE=str(log),
+        )
+        return answer_of(output), log.read_text().splitlines() if log.exists() else []
+
+    return run
+
+
+def test_ApiNameOfAMegabyte_LeavesAShortLogLine(logged):
+    answer, lines = logged(api="A" * (1 << 20))
+    assert code_of(answer) == 102
+    (line,) = [line for line in lines if "WebAPI AAA" in line]
+    assert line.endswith(f"{'A' * 256}... (1048576 bytes) is not valid")
+    assert max(map(len, lines)) < 512
+
+
+def test_ApiNameWithLineBreaks_StaysOneLogLine(logged):
+    answer, lines = logged(api="A\nentry.cgi: all is well\r\0\x1b[2J")
+    assert code_of(answer) == 102
+    assert [line for line in lines if "all is well" in line] == [
+        line for line in lines if "A?entry.cgi: all is well" in line
+    ]
+
+
+@pytest.mark.parametrize("name", ["api", "method", "account", "_sid", "tid", "task_id", "a"])
+def test_TextOfAMegabyte_LeavesShortLogLines(logged, root, name):
+    _, lines = logged(**{"api": "QELO.Access.Session", "method": "login", name: "x" * (1 << 20)})
+    assert max(map(len, lines), default=0) < 512
+
+
+@pytest.mark.parametrize("count", [LONGEST_CREDENTIAL, LONGEST_CREDENTIAL + 1, 1_000_000])
+def test_Credentials_AreLimited(client, count):
+    for name in ("_sid", "tid", "_sharing_id", "_sharing_sid"):
+        answer = client.post(f"{OPEN}&{name}={'x' * count}")
+        assert (answer.code == 101) == (count > LONGEST_CREDENTIAL), name
+
+
+@pytest.mark.parametrize("count, code", [(MOST_VALUES - 5, 0), (MOST_VALUES, 101), (2_000_000, 101)])
+def test_Values_AreLimited(client, count, code):
+    assert client.post(f"{OPEN}&a={zeros(count)}").code == code
+
+
+def test_Values_OfSeveralParametersCountTogether(client):
+    half = zeros(MOST_VALUES // 2)
+    assert client.post(f"{OPEN}&a={half}").code == 0
+    assert client.post(f"{OPEN}&a={half}&b={half}").code == 101
+
+
+def test_Values_OfAQueryAreLimited(client):
+    assert client.get(f"{OPEN}&a={zeros(20_000)}").code == 0
+    assert client.get(f"{OPEN}&a={zeros(MOST_VALUES)}").code == 101
+
+
+@pytest.mark.parametrize("count, code", [(MOST_PARAMETERS - 3, 0), (MOST_PARAMETERS, 101)])
+def test_Parameters_AreLimited(client, count, code):
+    assert client.post(OPEN + "&a=1" * count).code == code
+
+
+def test_Texts_AreLimitedByTheBodyAlone(client):
+    text = "[0," * 1_000_000
+    assert client.post(f"{OPEN}&a={text}").data["parameters"]["a"] == text
+    quoted = '"' + "0,[]{}" * 100_000 + '"'
+    assert client.post(f"{OPEN}&a={quoted}").data["parameters"]["a"] == quoted[1:-1]
+
+
+def test_HostileBodies_CostFourTimesTheirSizeAndTwentyMebibytes(root, tmp_path):
+    program = BUILD / "tests" / "integration" / "intake_peak"
+    output = subprocess.run(
+        [program, ENTRY, tmp_path], capture_output=True, text=True, timeout=600, check=True
+    ).stdout
+    rows = [line.split() for line in output.splitlines()]
+    assert len(rows) > 30
+    assert [
+        f"{name}: {size} KiB take {peak} KiB"
+        for name, size, peak, _ in rows
+        if int(peak) > 4 * int(size) + 20 * MIB
+    ] == []
+    codes = {name: int(code) for name, _, _, code in rows}
+    assert [name for name, code in codes.items() if code <= 0] == [], "an answer, and no success"
+    for name in ("zeros", "empty-arrays", "empty-objects", "encoded-arrays", "parameters"):
+        assert codes[name] == 101, name
