@@ -14,7 +14,6 @@
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
-#include "webapi/base/Number.h"
 #include "webapi/entry/permission/SessionOrigin.h"
 #include "webapi/entry/permission/UserClass.h"
 #include "webapi/json/Literal.h"
@@ -287,9 +286,8 @@ void PermissionCheck::FillSession(const std::string& user, const std::string& la
   session[Literal("isAdmin")] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
   session[Literal("sessFile")] = optionOf(context_, "sessfile");
   session[Literal("isTimeout")] = optionOf(context_, "istimeout") == "1";
-  Json::Int64 timeout = 0;
-  ParseNumber(optionOf(context_, "timeout"), timeout);
-  session[Literal("timeout")] = timeout;
+  session[Literal("timeout")] =
+      static_cast<Json::Int64>(strtol(optionOf(context_, "timeout", "0").c_str(), nullptr, 10));
   session[Literal("isSkipCheckIP")] = optionOf(context_, "skipcheckip") == "1";
   session[Literal("uiLang")] = language;
   session[Literal("app")] = optionOf(context_, "app");
