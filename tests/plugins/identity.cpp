@@ -41,12 +41,17 @@ static void whoami(QELO::APIRequest* request, QELO::APIResponse* response) {
   response->SetSuccess(data);
 }
 
-static QELO::_tag_API_TABLE table[] = {
-    {"QELO.Test.Identity", 1, "plain", whoami},     {"QELO.Test.Identity", 1, "patient", whoami},
-    {"QELO.Test.Identity", 1, "anywhere", whoami},  {"QELO.Test.Identity", 1, "asUser", whoami},
-    {"QELO.Test.Identity", 1, "asRoot", whoami},    {"QELO.Test.Identity", 1, "asAlice", whoami},
-    {"QELO.Test.Identity", 1, "grantable", whoami}, {"QELO.Test.Identity", 1, "adminOnly", whoami},
-    {"QELO.Test.Open", 1, "plain", whoami},         {nullptr, 0, nullptr, nullptr}};
+static QELO::_tag_API_TABLE table[] = {{"QELO.Test.Identity", 1, "plain", whoami},
+                                       {"QELO.Test.Identity", 1, "patient", whoami},
+                                       {"QELO.Test.Identity", 1, "anywhere", whoami},
+                                       {"QELO.Test.Identity", 1, "asUser", whoami},
+                                       {"QELO.Test.Identity", 1, "asRoot", whoami},
+                                       {"QELO.Test.Identity", 1, "asAlice", whoami},
+                                       {"QELO.Test.Identity", 1, "grantable", whoami},
+                                       {"QELO.Test.Identity", 1, "adminOnly", whoami},
+                                       {"QELO.Test.Identity", 1, "patientAsRoot", whoami},
+                                       {"QELO.Test.Open", 1, "plain", whoami},
+                                       {nullptr, 0, nullptr, nullptr}};
 
 PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {
   return table;
