@@ -184,7 +184,7 @@ class WEBAPI_API APIRequest {
   /// queries, and kept with the record; without the header all are false. They tell how to present
   /// something, and nothing that may be relied upon: clients call themselves what they like, an
   /// iPad of today a desktop computer.
-  bool IsMobile() const;  ///< a mobile device, unless the cookie "forceDesktop" is a number but 0
+  bool IsMobile() const;  ///< mobile, unless the cookie "forceDesktop" begins with a number but 0
   bool IsMobileDevice() const;   ///< a mobile device, whatever the cookie says
   bool IsIPhone() const;         ///< iOS: an iPhone, iPod or iPad
   bool IsAndroid() const;        ///< Android, phone or tablet

@@ -17,10 +17,10 @@ class APIValidatorPrivate;
 /// Checks of values: texts, ports and typed parameters.
 ///
 /// A check says yes or no and sets no error. Text checks and IsPort() have the form that the
-/// getters of APIRequest take as validator: `GetAndCheckString("mail", REQUIRED,
-/// APIValidator::IsEMail)`. An empty text passes none of them, nor does one that holds a NUL:
-/// checks read C texts, which end there, and what stands behind it would pass unseen. One thread
-/// uses the checks.
+/// getters of APIRequest take as validator: `GetAndCheckString("mail",
+/// APIRequest::PARAM_REQUIRED, APIValidator::IsEMail)`. An empty text passes none of them, nor does
+/// one that holds a NUL: checks read C texts, which end there, and what stands behind it would pass
+/// unseen. One thread uses the checks.
 class WEBAPI_API APIValidator {
  public:
   /// The one instance, made at its first use and never destroyed. It holds what patterns were
@@ -31,9 +31,7 @@ class WEBAPI_API APIValidator {
   APIValidator& operator=(const APIValidator&) = delete;
 
   /// Whether a POSIX extended regular expression matches somewhere in the value.
-  /// @param pattern  compiled once and known by its address from then on, so it must be a constant
-  /// of
-  ///                 the program
+  /// @param pattern  a constant of the program: compiled once, then known by its address
   /// @return false also when the pattern cannot be compiled (logged) or the value holds a NUL
   static bool CheckRegex(const std::string& value, const char* pattern);
 

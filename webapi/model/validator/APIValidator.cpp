@@ -110,8 +110,11 @@ bool APIValidator::IsPort(const int& port) {
 }
 
 bool APIValidator::IsEqual(const APIParameter<double>& parameter, double value) {
+  if (!isGiven(parameter)) {
+    return false;
+  }
   const double difference = parameter.Get() - value;
-  return isGiven(parameter) && difference >= -DBL_EPSILON && difference <= DBL_EPSILON;
+  return difference >= -DBL_EPSILON && difference <= DBL_EPSILON;
 }
 
 bool APIValidator::IsEqual(const APIParameter<std::string>& parameter, const char* value) {

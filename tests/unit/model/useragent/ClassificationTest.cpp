@@ -185,6 +185,7 @@ TEST(UserAgent, DesktopCookieTakesTheMobilePageAway) {
     const APIRequest request = requestOf("iphone", std::string("forceDesktop=") + rule.cookie);
     EXPECT_EQ(request.IsMobile(), rule.mobile) << rule.cookie;
     EXPECT_TRUE(request.IsMobileDevice()) << rule.cookie;
+    EXPECT_TRUE(request.IsIPhone()) << rule.cookie;
   }
 }
 

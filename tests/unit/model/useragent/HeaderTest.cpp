@@ -146,6 +146,6 @@ TEST(UserAgentHeaders, OfBytesThatAreNoTextNameNothing) {
 }
 
 TEST(UserAgentHeaders, EndAtANul) {
-  EXPECT_EQ(devices(std::string("curl\0iPhone AppleWebKit Opera Mini", 33)), "");
+  EXPECT_EQ(devices(std::string("curl\0iPhone AppleWebKit Opera Mini", 34)), "");
   EXPECT_EQ(devices(std::string("iPhone\0AppleWebKit", 18)), "Mobile MobileDevice IPhone");
 }
