@@ -21,10 +21,40 @@ bool isBarredFromLogin(const Account& account) {
   return account.name == kWorkingAccount || shell == "nologin" || shell == "false";
 }
 
+Standing standingOf(const Account& account) {
+  ShadowEntry entry;
+  if (findShadow(account.name, entry) == Lookup::kFailed) {
+    return Standing::kUnknown;
+  }
+  if (entry.HasExpired()) {
+    return Standing::kExpired;
+  }
+  if (isBarredFromLogin(account)) {
+    return Standing::kBarred;
+  }
+  return entry.IsLocked() ? Standing::kLocked : Standing::kGood;
+}
+
+const char* nameOf(Standing standing) {
+  switch (standing) {
+    case Standing::kGood:
+      return "good";
+    case Standing::kBarred:
+      return "not for logins";
+    case Standing::kLocked:
+      return "locked";
+    case Standing::kExpired:
+      return "expired";
+    default:
+      return "not readable";
+  }
+}
+
 }  // namespace QELO::Platform
 
 using QELO::Platform::Account;
 using QELO::Platform::Lookup;
+using QELO::Platform::Standing;
 
 extern "C" {
 
@@ -45,6 +75,18 @@ int QLIBGroupIsAdminGroupMem(const char* user, int) {
     return lookup == Lookup::kAbsent ? 0 : -1;
   }
   return QELO::Platform::isAdministrator(QELO::Platform::Settings(), account);
+}
+
+const char* QELOUserStandingGet(const char* user) {
+  Account account;
+  switch (QELO::Platform::findAccount(user, account)) {
+    case Lookup::kFound:
+      return QELO::Platform::nameOf(standingOf(account));
+    case Lookup::kAbsent:
+      return nullptr;
+    default:
+      return QELO::Platform::nameOf(Standing::kUnknown);
+  }
 }
 
 unsigned int QeloCgiUIDGet(const char*, const char* user) {

@@ -15,4 +15,18 @@ inline constexpr char kWorkingAccount[] = "system";
 /// Accounts that nobody logs in to, whatever the password: "system", and those without a shell.
 bool isBarredFromLogin(const Account& account);
 
+/// Whether what an account was given before, a session or a token, may still be used.
+enum class Standing {
+  kGood,
+  kBarred,  ///< nobody logs in to it
+  kLocked,  ///< by its administrator
+  kExpired,
+  kUnknown  ///< the account database cannot be read
+};
+
+/// What the host's own files say. A password that must be changed keeps from logging in alone.
+Standing standingOf(const Account& account);
+/// "locked" for kLocked, and so on, for messages.
+const char* nameOf(Standing standing);
+
 }  // namespace QELO::Platform

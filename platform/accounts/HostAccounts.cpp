@@ -1,10 +1,13 @@
+#include <fcntl.h>
 #include <grp.h>
 #include <pwd.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
 
 #include "platform/accounts/AccountDatabase.h"
+#include "platform/base/Paths.h"
 
 namespace QELO::Platform {
 namespace {
@@ -14,7 +17,7 @@ constexpr size_t kLargestEntry = 1 << 20;  // bytes
 constexpr int kMostGroups = 65536;         // the kernel's own limit
 
 /// Asks the name service for an entry by name.
-/// @param ask  getpwnam_r or getgrnam_r
+/// @param ask  getpwnam_r, getgrnam_r or getspnam_r
 template <typename Entry, typename Visit>
 Lookup askByName(const std::string& name, int (*ask)(const char*, Entry*, char*, size_t, Entry**),
                  Visit visit) {
@@ -43,6 +46,16 @@ Lookup findAccount(const std::string& name, Account& account) {
 
 Lookup findGroup(const std::string& name, gid_t& gid) {
   return askByName<group>(name, getgrnam_r, [&](const group& entry) { gid = entry.gr_gid; });
+}
+
+Lookup findShadow(const std::string& name, ShadowEntry& entry) {
+  const Lookup lookup =
+      askByName<spwd>(name, getspnam_r, [&](const spwd& found) { entry = ShadowEntry(found); });
+  // To a process that may not read the file, its entries are as good as absent.
+  const bool mayRead = lookup != Lookup::kAbsent ||
+                       faccessat(AT_FDCWD, Paths::kShadow, R_OK, AT_EACCESS) == 0 ||
+                       errno == ENOENT;
+  return mayRead ? lookup : Lookup::kFailed;
 }
 
 Lookup findMembership(const Account& account, const std::string& groupName) {

@@ -130,6 +130,21 @@ Lookup findGroup(const std::string& name, gid_t& gid) {
   return lookup;
 }
 
+Lookup findShadow(const std::string& name, ShadowEntry& entry) {
+  bool found = false;
+  const bool readable = readDatabaseFile<spwd>(Paths::kShadow, fgetspent_r, [&](const spwd& line) {
+    found = name == line.sp_namp;
+    if (found) {
+      entry = ShadowEntry(line);
+    }
+    return found;
+  });
+  if (!readable) {
+    return Lookup::kFailed;
+  }
+  return found ? Lookup::kFound : Lookup::kAbsent;
+}
+
 Lookup findMembership(const Account& account, const std::string& groupName) {
   const auto file = groups();
   gid_t gid = 0;

@@ -1,6 +1,3 @@
-#include <shadow.h>
-#include <time.h>
-
 #include <cstring>
 
 #include "platform/accounts/Accounts.h"
@@ -15,27 +12,18 @@ namespace QELO::Platform {
 namespace {
 
 constexpr char kSource[] = "RootPasswords.cpp";
-constexpr long kDaySeconds = 86400;
 /// Of no password; in use when the shadow file has no hash at all to take for a sample.
 constexpr char kSampleHash[] =
     "$6$eNq0Zk3vT1pYwXcB$gXkeTHPxOKcPPSuPUxxhHMFHtDoeSEiKzUIZWcAMhzoi2ObWGNCzHvHFwpmUjqIa.s4vQR6z"
     "gmiuYYmsIymyV1";
 
 struct ShadowPassword {
-  std::string hash;     ///< "" when there is none to check against
-  bool expired = true;  ///< the account, or a password that must be changed first
-  std::string sample;   ///< some account's hash
+  ShadowEntry entry;   ///< its hash is "" when there is none to check against
+  std::string sample;  ///< some account's hash
 };
 
 bool isHash(const char* text) {
   return text != nullptr && *text != '\0' && *text != '!' && *text != '*';
-}
-
-bool isExpired(const spwd& entry) {
-  const long today = time(nullptr) / kDaySeconds;
-  const bool mustChange = entry.sp_lstchg == 0 || (entry.sp_lstchg > 0 && entry.sp_max >= 0 &&
-                                                   today > entry.sp_lstchg + entry.sp_max);
-  return mustChange || (entry.sp_expire >= 0 && today >= entry.sp_expire);
 }
 
 /// Reads the file to its end also when the account is found, which takes as long for every account.
@@ -47,8 +35,8 @@ bool readShadow(const std::string& account, ShadowPassword& password) {
     }
     if (!found && account == entry.sp_namp) {
       found = true;
-      password.hash = isHash(entry.sp_pwdp) ? entry.sp_pwdp : "";
-      password.expired = isExpired(entry);
+      password.entry = ShadowEntry(entry);
+      password.entry.hash = isHash(entry.sp_pwdp) ? entry.sp_pwdp : "";
     }
     return false;
   });
@@ -71,9 +59,10 @@ int checkPassword(const std::string& account, const std::string& password, std::
   }
   // Every answer costs one hash, so that its time does not tell which accounts there are.
   const std::string sample = shadow.sample.empty() ? kSampleHash : shadow.sample;
-  const bool exists = lookup == Lookup::kFound && !shadow.hash.empty();
-  const bool matches = verify((exists ? shadow.hash : sample).c_str(), password.c_str()) == 1;
-  if (!exists || !matches || shadow.expired || isBarredFromLogin(found)) {
+  const bool exists = lookup == Lookup::kFound && !shadow.entry.hash.empty();
+  const bool matches = verify((exists ? shadow.entry.hash : sample).c_str(), password.c_str()) == 1;
+  const bool isOver = shadow.entry.HasExpired() || shadow.entry.MustChange();
+  if (!exists || !matches || isOver || isBarredFromLogin(found)) {
     return 0;
   }
   name = found.name;

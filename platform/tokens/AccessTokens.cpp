@@ -1,4 +1,4 @@
-#include "platform/accounts/AccountDatabase.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/base/ModuleLoader.h"
 #include "platform/base/Paths.h"
 #include "platform/base/Secrets.h"
@@ -6,6 +6,29 @@
 #include "platform/tokens/module/TokenModule.h"
 #include "webapi/base/Log.h"
 #include "webapi/platform/Token.h"
+
+namespace QELO::Platform {
+namespace {
+
+uid_t uidOf(const char* user) {
+  Account account;
+  return findAccount(user, account) == Lookup::kFound ? account.uid : static_cast<uid_t>(-1);
+}
+
+/// Whether the account is still the one that the token was made for, and may use it. A service's
+/// token is for an account that nobody logs in to.
+bool isUsable(const char* user, uid_t uid, bool isService) {
+  Account account;
+  if (findAccount(user, account) != Lookup::kFound || account.uid != uid) {
+    return false;
+  }
+  const Standing standing = standingOf(account);
+  return isService ? standing != Standing::kExpired && standing != Standing::kUnknown
+                   : standing == Standing::kGood;
+}
+
+}  // namespace
+}  // namespace QELO::Platform
 
 using namespace QELO::Platform;
 
@@ -21,16 +44,17 @@ extern "C" int QeloAccessTokenGrant(const char* token, const char* api, const ch
     return kTokenFailed;
   }
   char error[256] = "";
-  const int result = grant(QELO::Paths::kTokenDatabase, token, api, method, user, size, error,
-                           static_cast<int>(sizeof error));
+  uid_t uid = 0;
+  int isService = 0;
+  const int result = grant(QELO::Paths::kTokenDatabase, token, api, method, uidOf, user, size, &uid,
+                           &isService, error, static_cast<int>(sizeof error));
   if (result == kTokenFailed) {
     WEBAPI_LOG(kSource, "cannot check an access token [%s]", QELO::LogText(error).c_str());
   }
   if (result != kTokenGranted) {
     return result;
   }
-  Account account;
-  if (findAccount(user, account) != Lookup::kFound) {
+  if (!isUsable(user, uid, isService != 0)) {
     fillBuffer("", user, size);
     return kTokenUnknown;
   }

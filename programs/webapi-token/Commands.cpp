@@ -32,10 +32,13 @@ constexpr char kHelp[] =
     "tid=TOKEN,\n"
     "instead of a login. The commands need root's rights.\n"
     "\n"
-    "webapi-token create --user USER [--api API] [--method METHOD] [--days N]\n"
+    "webapi-token create --user USER [--api API] [--method METHOD] [--days N] [--service]\n"
     "    Makes a token and prints it, this once: only a hash of it is kept.\n"
     "    --api, --method  the one API or method that it is for; \"*\", the default: all\n"
     "    --days           how long it is good, 90 when not given; 0: for ever\n"
+    "    --service        for an account that nobody logs in to; such a token stays good while "
+    "the\n"
+    "                     account is locked or has no shell, until the account expires or is gone\n"
     "webapi-token list\n"
     "    Lists the tokens, below a line of headings; columns end with a tab.\n"
     "webapi-token revoke ID\n"
@@ -113,10 +116,45 @@ std::string readOptions(const std::vector<std::string>& arguments,
   return "";
 }
 
+/// Takes an option without a value out. @return whether it was there
+bool takeFlag(std::vector<std::string>& arguments, const char* flag) {
+  const auto end = std::remove(arguments.begin(), arguments.end(), flag);
+  const bool found = end != arguments.end();
+  arguments.erase(end, arguments.end());
+  return found;
+}
+
+uid_t uidOf(const char* user) {
+  uid_t uid = 0;
+  gid_t gid = 0;
+  return QELOUserGetUGID(user, &uid, &gid) == 0 ? uid : TokenStore::kNobody;
+}
+
+/// Completes the owner by the account's id. @return what speaks against a token for it, or ""
+std::string readOwner(TokenStore::Owner& owner) {
+  const char* found = QELOUserStandingGet(owner.user.c_str());
+  if (found == nullptr) {
+    return "there is no user " + owner.user;
+  }
+  owner.uid = uidOf(owner.user.c_str());
+  const std::string standing = found;
+  // An account file that cannot be read says that the caller has not the rights, as the database
+  // will.
+  if (standing == "good" || standing == "not readable") {
+    return "";
+  }
+  const std::string refusal = "the account " + owner.user + " is " + standing;
+  if (standing == "expired") {
+    return refusal;
+  }
+  return owner.isService ? "" : refusal + "; --service makes a token for such an account";
+}
+
 /// Reads what the new token is to be. @return what is wrong with the call, or ""
-std::string readEntry(const std::vector<std::string>& arguments, TokenStore::Entry& entry) {
+std::string readEntry(std::vector<std::string> arguments, TokenStore::Entry& entry) {
   std::map<std::string, std::string> options = {
       {"--user", ""}, {"--api", "*"}, {"--method", "*"}, {"--days", std::to_string(kDefaultDays)}};
+  entry.owner.isService = takeFlag(arguments, "--service");
   const std::string wrong = readOptions(arguments, options);
   int days = 0;
   if (!wrong.empty()) {
@@ -131,7 +169,7 @@ std::string readEntry(const std::vector<std::string>& arguments, TokenStore::Ent
   if (!parse(options["--days"], 0, kMostDays, days)) {
     return "--days takes a number from 0 to " + std::to_string(kMostDays);
   }
-  entry.user = options["--user"];
+  entry.owner.user = options["--user"];
   entry.api = options["--api"];
   entry.method = options["--method"];
   entry.expires = days == 0 ? 0 : time(nullptr) + days * kDaySeconds;
@@ -144,10 +182,9 @@ ExitCode create(const std::vector<std::string>& arguments, const Streams& stream
   if (!wrong.empty()) {
     return wrongUse(streams, wrong);
   }
-  uid_t uid = 0;
-  gid_t gid = 0;
-  if (QELOUserGetUGID(entry.user.c_str(), &uid, &gid) != 0) {
-    return failed(streams, "there is no user " + entry.user);
+  const std::string refusal = readOwner(entry.owner);
+  if (!refusal.empty()) {
+    return failed(streams, refusal);
   }
   if (entry.api != "*" && !isDescribed(entry.api)) {
     fprintf(streams.messages, "webapi-token: there is no API %s; the token is made all the same\n",
@@ -157,27 +194,29 @@ ExitCode create(const std::vector<std::string>& arguments, const Streams& stream
                kStateDirMode);
   TokenStore store;
   std::string token;
-  if (!store.Open(Paths::kTokenDatabase, true) || !store.Create(entry, token)) {
+  if (!store.Open(Paths::kTokenDatabase, true, uidOf) || !store.Create(entry, token)) {
     return failed(streams, databaseError(store));
   }
   fprintf(streams.output, "%s\n", token.c_str());
   fprintf(streams.messages, "Token %lld of %s, good until: %s. It is not shown again.\n",
-          static_cast<long long>(entry.id), entry.user.c_str(), timeText(entry.expires).c_str());
+          static_cast<long long>(entry.id), entry.owner.user.c_str(),
+          timeText(entry.expires).c_str());
   return kDone;
 }
 
 ExitCode list(const Streams& streams) {
   TokenStore store;
   std::vector<TokenStore::Entry> entries;
-  const bool opened = store.Open(Paths::kTokenDatabase, false);
+  const bool opened = store.Open(Paths::kTokenDatabase, false, uidOf);
   if ((!opened && !store.Missing()) || (opened && !store.List(entries))) {
     return failed(streams, databaseError(store));
   }
   fprintf(streams.output, "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\n");
   for (const TokenStore::Entry& entry : entries) {
     fprintf(streams.output, "%lld\t%s\t%s\t%s\t%s\t%s\n", static_cast<long long>(entry.id),
-            entry.user.c_str(), entry.api.c_str(), entry.method.c_str(),
-            timeText(entry.created).c_str(), timeText(entry.expires).c_str());
+            (entry.owner.user + (entry.owner.isService ? " (service)" : "")).c_str(),
+            entry.api.c_str(), entry.method.c_str(), timeText(entry.created).c_str(),
+            timeText(entry.expires).c_str());
   }
   return kDone;
 }
@@ -189,7 +228,7 @@ ExitCode revoke(const std::string& number, const Streams& streams) {
   }
   TokenStore store;
   bool found = false;
-  const bool opened = store.Open(Paths::kTokenDatabase, false);
+  const bool opened = store.Open(Paths::kTokenDatabase, false, uidOf);
   if ((!opened && !store.Missing()) || (opened && !store.Revoke(id, found))) {
     return failed(streams, databaseError(store));
   }

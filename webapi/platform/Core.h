@@ -46,6 +46,10 @@ WEBAPI_API pid_t QLIBCProcForkEx(int flags);
 
 /// The ids of a user. @return 0 on success
 WEBAPI_API int QELOUserGetUGID(const char* name, uid_t* uid, gid_t* gid);
+/// Whether what a user was given before, a session or a token, may still be used.
+/// @return "good"; else why not: "not for logins", "locked", "expired", or "not readable" when the
+///         accounts cannot be read; null when there is no such user. The text is static.
+WEBAPI_API const char* QELOUserStandingGet(const char* user);
 /// @return 1 when the user is an administrator, 0 when not, -1 when that cannot be told
 WEBAPI_API int QLIBGroupIsAdminGroupMem(const char* user, int flags);
 /// @return 1 when the user may use the application from this address, else 0

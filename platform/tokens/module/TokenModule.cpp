@@ -10,19 +10,22 @@ using QELO::Platform::fillBuffer;
 using QELO::Platform::TokenStore;
 
 extern "C" WEBAPI_API int webapiTokenGrant(const char* database, const char* token, const char* api,
-                                           const char* method, char* user, int size, char* error,
-                                           int errorSize) {
+                                           const char* method, uid_t (*findUid)(const char* user),
+                                           char* user, int size, uid_t* uid, int* isService,
+                                           char* error, int errorSize) {
   TokenStore store;
-  std::string name;
+  TokenStore::Owner owner;
   TokenStore::Grant grant = TokenStore::Grant::kFailed;
-  if (store.Open(database, false)) {
-    grant = store.Check(token, api, method, time(nullptr), name);
+  if (store.Open(database, false, findUid)) {
+    grant = store.Check(token, api, method, time(nullptr), owner);
   } else if (store.Missing()) {
     grant = TokenStore::Grant::kUnknown;  // no token was ever made
   }
   switch (grant) {
     case TokenStore::Grant::kGranted:
-      return fillBuffer(name, user, size) ? kTokenGranted : kTokenOtherCall;
+      *uid = owner.uid;
+      *isService = owner.isService ? 1 : 0;
+      return fillBuffer(owner.user, user, size) ? kTokenGranted : kTokenOtherCall;
     case TokenStore::Grant::kUnknown:
       return kTokenUnknown;
     case TokenStore::Grant::kExpired:

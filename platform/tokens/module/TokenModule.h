@@ -1,11 +1,16 @@
 #pragma once
 
+#include <sys/types.h>
+
 /// Checks an access token against the database.
-/// @param user   receives the token's user on success
+/// @param findUid  the id of an account's user, -1 when there is none: asked once, for a database
+///                 of the first version
+/// @param user, uid, isService  receive whom the token stands for on success
 /// @param error  receives the reason when the result is kTokenFailed
 /// @return one of TokenResult
 using TokenGrant = int (*)(const char* database, const char* token, const char* api,
-                           const char* method, char* user, int size, char* error, int errorSize);
+                           const char* method, uid_t (*findUid)(const char* user), char* user,
+                           int size, uid_t* uid, int* isService, char* error, int errorSize);
 
 enum TokenResult : int {
   kTokenGranted = 1,

@@ -17,11 +17,14 @@ namespace QELO::Platform {
 namespace {
 
 constexpr int kBusyMs = 2000;
-constexpr char kSchema[] =
-    "PRAGMA journal_mode=WAL;"
+constexpr int kVersion = 1;
+constexpr char kFirstTables[] =
     "CREATE TABLE IF NOT EXISTS tokens("
     "id INTEGER PRIMARY KEY AUTOINCREMENT, hash BLOB NOT NULL UNIQUE, user TEXT NOT NULL,"
     "api TEXT NOT NULL, method TEXT NOT NULL, created INTEGER NOT NULL, expires INTEGER NOT NULL)";
+constexpr char kOwnerColumns[] =
+    "ALTER TABLE tokens ADD COLUMN uid INTEGER NOT NULL DEFAULT 4294967295;"
+    "ALTER TABLE tokens ADD COLUMN service INTEGER NOT NULL DEFAULT 0";
 
 struct Finalize {
   void operator()(sqlite3_stmt* statement) const { sqlite3_finalize(statement); }
@@ -44,6 +47,12 @@ std::string columnText(const Statement& statement, int column) {
   return text != nullptr ? reinterpret_cast<const char*>(text) : "";
 }
 
+TokenStore::Owner columnOwner(const Statement& statement, int first) {
+  return {columnText(statement, first),
+          static_cast<uid_t>(sqlite3_column_int64(statement.get(), first + 1)),
+          sqlite3_column_int(statement.get(), first + 2) != 0};
+}
+
 bool fits(const std::string& pattern, const std::string& name) {
   return pattern == "*" || pattern == name;
 }
@@ -54,7 +63,7 @@ TokenStore::~TokenStore() {
   sqlite3_close(database_);
 }
 
-bool TokenStore::Open(const char* path, bool create) {
+bool TokenStore::Open(const char* path, bool create, FindUid findUid) {
   struct stat info {};
   missing_ = stat(path, &info) != 0 && errno == ENOENT;
   if (missing_ && create) {
@@ -73,7 +82,71 @@ bool TokenStore::Open(const char* path, bool create) {
   sqlite3_busy_timeout(database_, kBusyMs);
   int keep = 1;  // else every process that comes and goes makes and removes the companion files
   sqlite3_file_control(database_, "main", SQLITE_FCNTL_PERSIST_WAL, &keep);
-  return !create || Execute(kSchema);
+  int version = 0;
+  if (!ReadVersion(version)) {
+    return false;
+  }
+  if (version > kVersion) {
+    error_ = "made by a later version of this program";
+    return false;
+  }
+  return version == kVersion || Upgrade(create, findUid);
+}
+
+bool TokenStore::ReadVersion(int& version) {
+  sqlite3_stmt* prepared = nullptr;
+  if (!Prepare("PRAGMA user_version", prepared)) {
+    return false;
+  }
+  const Statement statement(prepared);
+  if (sqlite3_step(prepared) != SQLITE_ROW) {
+    return Fail();
+  }
+  version = sqlite3_column_int(prepared, 0);
+  return true;
+}
+
+bool TokenStore::Upgrade(bool create, FindUid findUid) {
+  int version = 0;
+  if ((create && !Execute("PRAGMA journal_mode=WAL")) || !Execute("BEGIN IMMEDIATE")) {
+    return false;
+  }
+  // Another process may have done it while this one waited.
+  const bool done =
+      ReadVersion(version) &&
+      (version == kVersion || ((!create || Execute(kFirstTables)) && Execute(kOwnerColumns) &&
+                               AddOwners(findUid) && Execute("PRAGMA user_version=1")));
+  if (done && Execute("COMMIT")) {
+    return true;
+  }
+  const std::string reason = error_;
+  Execute("ROLLBACK");
+  error_ = reason;
+  return false;
+}
+
+bool TokenStore::AddOwners(FindUid findUid) {
+  sqlite3_stmt* users = nullptr;
+  sqlite3_stmt* update = nullptr;
+  if (!Prepare("SELECT DISTINCT user FROM tokens", users)) {
+    return false;
+  }
+  const Statement reading(users);
+  if (!Prepare("UPDATE tokens SET uid = ?1 WHERE user = ?2", update)) {
+    return false;
+  }
+  const Statement writing(update);
+  int step = sqlite3_step(users);
+  for (; step == SQLITE_ROW; step = sqlite3_step(users)) {
+    const std::string user = columnText(reading, 0);
+    sqlite3_bind_int64(update, 1, findUid(user.c_str()));
+    bindText(writing, 2, user);
+    if (sqlite3_step(update) != SQLITE_DONE) {
+      return Fail();
+    }
+    sqlite3_reset(update);
+  }
+  return step == SQLITE_DONE || Fail();
 }
 
 bool TokenStore::Create(Entry& entry, std::string& token) {
@@ -83,19 +156,21 @@ bool TokenStore::Create(Entry& entry, std::string& token) {
     error_ = strerror(errno);
     return false;
   }
-  if (!Prepare("INSERT INTO tokens(hash, user, api, method, created, expires)"
-               " VALUES(?1, ?2, ?3, ?4, ?5, ?6)",
+  if (!Prepare("INSERT INTO tokens(hash, user, api, method, created, expires, uid, service)"
+               " VALUES(?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)",
                prepared)) {
     return false;
   }
   const Statement statement(prepared);
   entry.created = time(nullptr);
   bindHash(statement, 1, secret);
-  bindText(statement, 2, entry.user);
+  bindText(statement, 2, entry.owner.user);
   bindText(statement, 3, entry.api);
   bindText(statement, 4, entry.method);
   sqlite3_bind_int64(prepared, 5, entry.created);
   sqlite3_bind_int64(prepared, 6, entry.expires);
+  sqlite3_bind_int64(prepared, 7, entry.owner.uid);
+  sqlite3_bind_int(prepared, 8, entry.owner.isService ? 1 : 0);
   if (sqlite3_step(prepared) != SQLITE_DONE) {
     return Fail();
   }
@@ -105,9 +180,10 @@ bool TokenStore::Create(Entry& entry, std::string& token) {
 }
 
 TokenStore::Grant TokenStore::Check(const std::string& token, const std::string& api,
-                                    const std::string& method, int64_t now, std::string& user) {
+                                    const std::string& method, int64_t now, Owner& owner) {
   sqlite3_stmt* prepared = nullptr;
-  if (!Prepare("SELECT user, api, method, expires FROM tokens WHERE hash = ?1", prepared)) {
+  if (!Prepare("SELECT api, method, expires, user, uid, service FROM tokens WHERE hash = ?1",
+               prepared)) {
     return Grant::kFailed;
   }
   const Statement statement(prepared);
@@ -116,29 +192,30 @@ TokenStore::Grant TokenStore::Check(const std::string& token, const std::string&
   if (step != SQLITE_ROW) {
     return step == SQLITE_DONE || Fail() ? Grant::kUnknown : Grant::kFailed;
   }
-  const int64_t expires = sqlite3_column_int64(prepared, 3);
+  const int64_t expires = sqlite3_column_int64(prepared, 2);
   if (expires != 0 && expires <= now) {
     return Grant::kExpired;
   }
-  if (!fits(columnText(statement, 1), api) || !fits(columnText(statement, 2), method)) {
+  if (!fits(columnText(statement, 0), api) || !fits(columnText(statement, 1), method)) {
     return Grant::kOtherCall;
   }
-  user = columnText(statement, 0);
+  owner = columnOwner(statement, 3);
   return Grant::kGranted;
 }
 
 bool TokenStore::List(std::vector<Entry>& entries) {
   sqlite3_stmt* prepared = nullptr;
-  if (!Prepare("SELECT id, user, api, method, created, expires FROM tokens ORDER BY id",
-               prepared)) {
+  if (!Prepare(
+          "SELECT id, api, method, created, expires, user, uid, service FROM tokens ORDER BY id",
+          prepared)) {
     return false;
   }
   const Statement statement(prepared);
   int step = sqlite3_step(prepared);
   for (; step == SQLITE_ROW; step = sqlite3_step(prepared)) {
-    entries.push_back({sqlite3_column_int64(prepared, 0), columnText(statement, 1),
-                       columnText(statement, 2), columnText(statement, 3),
-                       sqlite3_column_int64(prepared, 4), sqlite3_column_int64(prepared, 5)});
+    entries.push_back({sqlite3_column_int64(prepared, 0), columnOwner(statement, 5),
+                       columnText(statement, 1), columnText(statement, 2),
+                       sqlite3_column_int64(prepared, 3), sqlite3_column_int64(prepared, 4)});
   }
   return step == SQLITE_DONE || Fail();
 }

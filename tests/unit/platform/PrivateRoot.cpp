@@ -86,6 +86,37 @@ void PrivateRoot::Set(const std::map<std::string, std::string>& settings) {
   fs::rename(Path("etc/qeloinfo.new"), Path("etc/qeloinfo.conf"));
 }
 
+namespace {
+
+/// The lines of a file of accounts, that of one account replaced.
+std::string withLine(const std::string& text, const std::string& account, const std::string& line) {
+  std::istringstream lines(text);
+  std::string result;
+  for (std::string each; std::getline(lines, each);) {
+    const bool isIt = each.starts_with(account + ":");
+    result += isIt ? line : each;
+    result += isIt && line.empty() ? "" : "\n";
+  }
+  return result;
+}
+
+}  // namespace
+
+void PrivateRoot::SetShadow(const std::string& account, const std::string& fields) {
+  Write("etc/shadow.new",
+        withLine(Read("etc/shadow"), account, fields.empty() ? "" : account + ":" + fields));
+  fs::rename(Path("etc/shadow.new"), Path("etc/shadow"));
+}
+
+void PrivateRoot::SetAccount(const std::string& account, const std::string& line) {
+  Write("etc/passwd.new", withLine(Read("etc/passwd"), account, line), 0644);
+  fs::rename(Path("etc/passwd.new"), Path("etc/passwd"));
+}
+
+long PrivateRoot::Today() {
+  return time(nullptr) / 86400;
+}
+
 void PrivateRoot::Age(const std::string& relative, long seconds) {
   const timespec when{time(nullptr) - seconds, 0};
   const timespec times[2] = {when, when};

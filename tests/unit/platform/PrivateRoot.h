@@ -22,6 +22,12 @@ class PrivateRoot : public testing::Test {
   static void Write(const std::string& relative, const std::string& text, mode_t mode = 0600);
   /// Replaces qeloinfo.conf.
   static void Set(const std::map<std::string, std::string>& settings);
+  /// Gives an account of the script other fields in the shadow file, from the hash on; "" takes its
+  /// line away.
+  static void SetShadow(const std::string& account, const std::string& fields);
+  /// Gives an account of the script another line in the account file; "" takes it away.
+  static void SetAccount(const std::string& account, const std::string& line);
+  static long Today();
   /// Sets a file's times so many seconds back.
   static void Age(const std::string& relative, long seconds);
   static struct stat Status(const std::string& relative);

@@ -68,6 +68,37 @@ TEST(HostAccounts, GroupsAreThePrimaryAndThoseThatNameTheUser) {
   RecordProperty("memberships", memberships);
 }
 
+TEST(HostAccounts, ShadowEntriesAreThoseOfTheHost) {
+  if (geteuid() != 0) {
+    GTEST_SKIP() << "root alone reads them";
+  }
+  int count = 0;
+  setspent();
+  while (const spwd* entry = getspent()) {
+    ShadowEntry found;
+    ASSERT_EQ(findShadow(entry->sp_namp, found), Lookup::kFound) << entry->sp_namp;
+    EXPECT_EQ(found.hash, entry->sp_pwdp);
+    EXPECT_EQ(found.expiry, entry->sp_expire);
+    ++count;
+  }
+  endspent();
+  EXPECT_GT(count, 0);
+  ShadowEntry none;
+  EXPECT_EQ(findShadow("nobody-of-this-name", none), Lookup::kAbsent);
+}
+
+TEST(HostAccounts, ShadowEntriesAreNotKnownToOrdinaryUsers) {
+  const auto ask = [] {
+    ShadowEntry entry;
+    const bool dropped = geteuid() != 0 || setresuid(65534, 65534, 65534) == 0;
+    _exit(dropped && findShadow("daemon", entry) == Lookup::kFailed &&
+                  findShadow("nobody-of-this-name", entry) == Lookup::kFailed
+              ? 0
+              : 1);
+  };
+  EXPECT_EXIT(ask(), testing::ExitedWithCode(0), "");
+}
+
 TEST(HostAccounts, AccountsWithoutShellAreBarred) {
   Account account;
   account.name = "anna";

@@ -1,4 +1,3 @@
-#include <time.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -32,8 +31,6 @@ class Passwords : public PrivateRoot {
   static void SetShadow(const std::string& fields) {
     Write("etc/shadow", "bob:" + HashOf("bob") + ":20000:0:99999:7:::\nalice:" + fields + "\n");
   }
-
-  static long Today() { return time(nullptr) / 86400; }
 
   char user_[64] = "";
 };

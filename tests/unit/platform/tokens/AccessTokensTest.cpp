@@ -1,3 +1,4 @@
+#include <sqlite3.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -16,22 +17,49 @@ class AccessTokens : public PrivateRoot {
  protected:
   static std::string Database() { return Path("var/lib/webapi/tokens.db"); }
 
+  /// The id that the script gives an account.
+  static uid_t UidOf(const std::string& user) {
+    return !IsRoot() ? geteuid() : user == "alice" ? 1002 : user == "bob" ? 1003 : 7000;
+  }
+
+  static std::string CreateForService(const std::string& user) {
+    return Create(user, "*", "*", 0, nullptr, true);
+  }
+
   static std::string Create(const std::string& user = "alice", const std::string& api = "*",
                             const std::string& method = "*", int64_t expires = 0,
-                            int64_t* id = nullptr) {
+                            int64_t* id = nullptr, bool isService = false) {
     TokenStore store;
     TokenStore::Entry entry;
-    entry.user = user;
+    entry.owner = {user, user == "system" && IsRoot() ? 900 : UidOf(user), isService};
     entry.api = api;
     entry.method = method;
     entry.expires = expires;
     std::string token;
-    EXPECT_TRUE(store.Open(Database().c_str(), true)) << store.Error();
+    EXPECT_TRUE(store.Open(Database().c_str(), true, NoUid)) << store.Error();
     EXPECT_TRUE(store.Create(entry, token)) << store.Error();
     if (id != nullptr) {
       *id = entry.id;
     }
     return token;
+  }
+
+  static uid_t NoUid(const char*) { return TokenStore::kNobody; }
+
+  /// Runs SQL in the database as another program would.
+  static void Execute(const std::string& sql) {
+    sqlite3* database = nullptr;
+    ASSERT_EQ(sqlite3_open(Database().c_str(), &database), SQLITE_OK);
+    EXPECT_EQ(sqlite3_exec(database, sql.c_str(), nullptr, nullptr, nullptr), SQLITE_OK)
+        << sqlite3_errmsg(database);
+    sqlite3_close(database);
+  }
+
+  /// Takes the database back to its first version, which kept no ids of users.
+  static void MakeOld() {
+    Execute(
+        "ALTER TABLE tokens DROP COLUMN uid; ALTER TABLE tokens DROP COLUMN service;"
+        "PRAGMA user_version=0");
   }
 
   int Grant(const std::string& token, const char* api = "QELO.X", const char* method = "get",
@@ -100,6 +128,82 @@ TEST_F(AccessTokens, TokenOfAUserWhoIsGoneIsRefused) {
   EXPECT_EQ(Grant(token), -1);
 }
 
+TEST_F(AccessTokens, TokenOfALockedOrExpiredAccountIsRefused) {
+  const std::string token = Create();
+  for (const std::string& fields :
+       {std::string("!:20000:0:99999:7:::"), std::string("!$6$x$y:20000:0:99999:7:::"),
+        "$6$x$y:20000:0:99999:7::" + std::to_string(Today()) + ":"}) {
+    SetShadow("alice", fields);
+    EXPECT_EQ(Grant(token), -1) << fields;
+  }
+  SetShadow("alice", "$6$x$y:20000:0:99999:7:::");
+  EXPECT_EQ(Grant(token), 1);
+  ASSERT_EQ(remove(Path("etc/shadow").c_str()), 0);
+  EXPECT_EQ(Grant(token), -1);
+}
+
+TEST_F(AccessTokens, TokenOfAnAccountThatNobodyLogsInToIsRefused) {
+  EXPECT_EQ(Grant(Create("system")), -1);
+}
+
+TEST_F(AccessTokens, ServicesTokenIsGoodUntilTheAccountExpires) {
+  const std::string token = CreateForService("system");
+  EXPECT_EQ(Grant(token), 1);
+  EXPECT_STREQ(user_, "system");
+  SetShadow("system", "!:20000:0:99999:7:::");
+  EXPECT_EQ(Grant(token), 1);
+  SetShadow("system", "!:20000:0:99999:7::" + std::to_string(Today()) + ":");
+  EXPECT_EQ(Grant(token), -1);
+  SetAccount("system", "");
+  EXPECT_EQ(Grant(token), -1);
+}
+
+TEST_F(AccessTokens, AccountMadeAnewHasNotTheFormerOnesTokens) {
+  const std::string token = Create();
+  const std::string service = CreateForService("alice");
+  SetAccount("alice", "alice:x:2002:2002:Another Alice:/home/alice:/bin/sh");
+  EXPECT_EQ(Grant(token), -1);
+  EXPECT_EQ(Grant(service), -1);
+}
+
+TEST_F(AccessTokens, DatabaseOfTheFirstVersionIsGivenTheIdsOfToday) {
+  const std::string token = Create();
+  const std::string other = Create("bob");
+  const std::string gone = Create("zoe");
+  MakeOld();
+  EXPECT_EQ(Grant(token), 1);
+  EXPECT_STREQ(user_, "alice");
+  EXPECT_EQ(Grant(other), 1);
+  EXPECT_EQ(Grant(gone), -1);
+  SetAccount("alice", "alice:x:2002:2002:Another Alice:/home/alice:/bin/sh");
+  EXPECT_EQ(Grant(token), -1);
+}
+
+TEST_F(AccessTokens, ProcessesBringADatabaseUpToDateAtTheSameTime) {
+  const std::string token = Create();
+  MakeOld();
+  std::vector<pid_t> children;
+  for (int i = 0; i < 8; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      _exit(Grant(token) == 1 ? 0 : 1);
+    }
+    children.push_back(child);
+  }
+  for (const pid_t child : children) {
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(status, 0);
+  }
+}
+
+TEST_F(AccessTokens, DatabaseOfALaterVersionCannotBeAsked) {
+  const std::string token = Create();
+  Execute("PRAGMA user_version=2");
+  EXPECT_EQ(Grant(token), -4);
+  EXPECT_EQ(SyslogCapture::Count("made by a later version"), 1);
+}
+
 TEST_F(AccessTokens, NameThatDoesNotFitIsRefused) {
   EXPECT_EQ(Grant(Create(), "a", "m", 5), -3);
   EXPECT_EQ(Grant(Create(), "a", "m", 6), 1);
@@ -109,7 +213,7 @@ TEST_F(AccessTokens, RevokedTokenIsRefused) {
   int64_t id = 0;
   const std::string token = Create("alice", "*", "*", 0, &id);
   TokenStore store;
-  ASSERT_TRUE(store.Open(Database().c_str(), false));
+  ASSERT_TRUE(store.Open(Database().c_str(), false, NoUid));
   bool found = false;
   EXPECT_TRUE(store.Revoke(id, found));
   EXPECT_TRUE(found);

@@ -107,6 +107,33 @@ TEST_F(TokenProgram, CreateForAnUnknownUserFails) {
   EXPECT_FALSE(HasDatabase());
 }
 
+TEST_F(TokenProgram, CreateForAnAccountThatNobodyLogsInToAsksForService) {
+  EXPECT_EQ(Run({"create", "--user", "system"}), 1);
+  EXPECT_EQ(messages_,
+            "webapi-token: the account system is not for logins; --service makes a token for such "
+            "an account\n");
+  SetShadow("alice", "!$6$x$y:20000:0:99999:7:::");
+  EXPECT_EQ(Run({"create", "--user", "alice"}), 1);
+  EXPECT_NE(messages_.find("the account alice is locked; --service"), std::string::npos);
+  EXPECT_FALSE(HasDatabase());
+  EXPECT_EQ(Run({"create", "--service", "--user", "system"}), 0);
+  const std::string token = output_.substr(0, 43);
+  char user[64];
+  EXPECT_EQ(QeloAccessTokenGrant(token.c_str(), "QELO.X", "get", user, 64), 1);
+  EXPECT_EQ(Run({"list"}), 0);
+  EXPECT_NE(output_.find("\n1\tsystem (service)\t*\t*\t2"), std::string::npos) << output_;
+}
+
+TEST_F(TokenProgram, CreateForAnExpiredAccountFails) {
+  SetShadow("alice", "$6$x$y:20000:0:99999:7::" + std::to_string(Today()) + ":");
+  for (const std::vector<std::string>& options :
+       {std::vector<std::string>{"create", "--user", "alice"},
+        {"create", "--user", "alice", "--service"}}) {
+    EXPECT_EQ(Run(options), 1);
+    EXPECT_EQ(messages_, "webapi-token: the account alice is expired\n");
+  }
+}
+
 TEST_F(TokenProgram, CreateForAnApiWithoutDescriptionWarns) {
   Write("usr/qelo/qeloman/webapi/QELO.X.lib", R"({"QELO.X": {}, "QELO.X.Y": {}})");
   for (const char* api : {"QELO.X", "QELO.X.Y", "*"}) {
