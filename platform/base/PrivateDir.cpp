@@ -65,14 +65,14 @@ UniqueFd openPrivateDir(const char* path, bool create) {
   return dir;
 }
 
-void purgeFiles(int dir, long age, long pause) {
+bool purgeFiles(int dir, long age, long pause) {
   if (!mayPurge(dir, pause)) {
-    return;
+    return false;
   }
   UniqueFd readable(openat(dir, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   DIR* stream = readable ? fdopendir(readable.Get()) : nullptr;
   if (stream == nullptr) {
-    return;
+    return false;
   }
   readable.Release();  // closedir closes it
   while (const dirent* entry = readdir(stream)) {
@@ -83,6 +83,7 @@ void purgeFiles(int dir, long age, long pause) {
     }
   }
   closedir(stream);
+  return true;
 }
 
 }  // namespace QELO::Platform

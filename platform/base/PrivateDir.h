@@ -14,6 +14,7 @@ UniqueFd openPrivateDir(const char* path, bool create);
 /// Removes the regular files that were last written more than `age` seconds ago, but those whose
 /// name starts with a dot.
 /// @param pause  nothing is done when this was called less than so many seconds ago
-void purgeFiles(int dir, long age, long pause);
+/// @return whether it was done
+bool purgeFiles(int dir, long age, long pause);
 
 }  // namespace QELO::Platform

@@ -1,7 +1,7 @@
 #include <cstdlib>
 #include <string>
 
-#include "platform/accounts/AccountDatabase.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/base/Paths.h"
 #include "platform/base/TextBuffer.h"
 #include "platform/cgi/Context.h"
@@ -27,7 +27,20 @@ enum Authorization : int {
   kAuthorizedTimedOut = 2
 };
 
-/// @return 0 when the session exists and so does its user
+/// Whether the session's user is there and may still use it. @return 0, or the refusal
+int checkUser(const Session& session) {
+  Account account;
+  const Lookup lookup = findAccount(session.user, account);
+  if (lookup == Lookup::kFailed) {
+    return kRefused;
+  }
+  if (lookup == Lookup::kAbsent || account.uid != session.uid) {
+    return kNoSuchSession;
+  }
+  return standingOf(account) == Standing::kGood ? 0 : kRefused;
+}
+
+/// @return 0 when the session exists and its user may use it
 int findSession(const ContextArea& area, Session& session) {
   if (area.state == ContextArea::kNoId) {
     return kNoId;
@@ -45,15 +58,7 @@ int findSession(const ContextArea& area, Session& session) {
     default:
       return kNoSuchSession;
   }
-  Account account;
-  switch (findAccount(session.user, account)) {
-    case Lookup::kFound:
-      return 0;
-    case Lookup::kAbsent:
-      return kNoSuchSession;
-    default:
-      return kRefused;
-  }
+  return checkUser(session);
 }
 
 bool isFromItsAddress(const Session& session, const Settings& settings) {

@@ -11,6 +11,7 @@
 #include "platform/base/Paths.h"
 #include "platform/base/PrivateDir.h"
 #include "platform/base/Secrets.h"
+#include "platform/login/SessionIndex.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
 #include "webapi/base/ReplaceFile.h"
@@ -34,6 +35,8 @@ bool parseRecord(const std::string& text, Session& session) {
     return value.type() == Json::stringValue ? JsonHelper::asString(value) : std::string();
   };
   session.user = string("user");
+  const Json::Value& uid = JsonHelper::member(record, "uid");
+  session.uid = uid.isUInt() ? uid.asUInt() : Session::kNobody;
   session.address = string("address");
   session.token = string("token");
   session.skipCheckIp = JsonHelper::asBool(JsonHelper::member(record, "skipCheckIP"));
@@ -45,6 +48,7 @@ bool parseRecord(const std::string& text, Session& session) {
 std::string recordText(const Session& session, const std::string& token) {
   Json::Value record(Json::objectValue);
   record["user"] = session.user;
+  record["uid"] = session.uid;
   record["address"] = session.address;
   record["token"] = token;
   record["created"] = static_cast<Json::Int64>(time(nullptr));
@@ -52,6 +56,20 @@ std::string recordText(const Session& session, const std::string& token) {
     record["skipCheckIP"] = true;
   }
   return JsonHelper::toString(record);
+}
+
+/// Readers see the whole record or none.
+bool writeRecord(int dir, const std::string& id, const std::string& text, SessionIndex& index) {
+  if (!ReplaceFile(id, text, {.directory = dir})) {
+    return false;
+  }
+  if (!index.Add(id)) {
+    const int error = errno;
+    unlinkat(dir, id.c_str(), 0);
+    errno = error;
+    return false;
+  }
+  return true;
 }
 
 }  // namespace
@@ -110,7 +128,8 @@ SessionStore::Result SessionStore::ReadLastUse(const std::string& id, timespec& 
   return Result::kGood;
 }
 
-bool SessionStore::Create(const Session& session, std::string& id, std::string& token) const {
+bool SessionStore::Create(const Session& session, size_t limit, std::string& id,
+                          std::string& token) const {
   if (!dir_) {
     WEBAPI_LOG(kSource, "cannot use %s [%s]", Paths::kSessionDir, strerror(dirError_));
     return false;
@@ -121,20 +140,29 @@ bool SessionStore::Create(const Session& session, std::string& id, std::string& 
     WEBAPI_LOG(kSource, "no random bytes [%s]", strerror(errno));
     return false;
   }
-  if (!ReplaceFile(id, recordText(session, token), {.directory = dir_.Get()})) {
+  SessionIndex index(dir_.Get(), session.user, session.uid);
+  if (!writeRecord(dir_.Get(), id, recordText(session, token), index)) {
     WEBAPI_LOG(kSource, "cannot write a session [%s]", strerror(errno));
     return false;
   }
+  index.Cap(limit, id);
   return true;
 }
 
 bool SessionStore::Remove(const std::string& id) const {
-  return isSecretText(id) && dir_ && unlinkat(dir_.Get(), id.c_str(), 0) == 0;
+  if (!isSecretText(id) || !dir_) {
+    return false;
+  }
+  Session session;
+  if (Read(id, session) == Result::kGood) {
+    SessionIndex(dir_.Get(), session.user, session.uid).Remove(id);
+  }
+  return unlinkat(dir_.Get(), id.c_str(), 0) == 0;
 }
 
-void SessionStore::Purge(int timeout) const {
-  if (dir_) {
-    purgeFiles(dir_.Get(), kPurgeFactor * timeout, 0);
+void SessionStore::Purge(int timeout, int pause) const {
+  if (dir_ && purgeFiles(dir_.Get(), kPurgeFactor * timeout, pause)) {
+    SessionIndex::Purge(dir_.Get());
   }
 }
 

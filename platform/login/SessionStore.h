@@ -1,6 +1,7 @@
 #pragma once
 
 #include <sys/stat.h>
+#include <sys/types.h>
 
 #include <string>
 
@@ -13,7 +14,11 @@ long secondsLeft(const timespec& lastUse, int timeout);
 
 /// A login session, as read from its file.
 struct Session {
+  /// Of a record without an id, which stands for no account.
+  static constexpr uid_t kNobody = static_cast<uid_t>(-1);
+
   std::string user;
+  uid_t uid = kNobody;       ///< the user's at login; an account made anew has another
   std::string address;       ///< the client's at login, in the short form; "" when it was not known
   std::string token;         ///< anti-forgery token
   bool skipCheckIp = false;  ///< not bound to the address
@@ -46,11 +51,13 @@ class SessionStore {
   Result Read(const std::string& id, Session& session) const;
   /// When the session was last used; all else of it is not looked at.
   static Result ReadLastUse(const std::string& id, timespec& lastUse);
+  /// Ends the user's session that was used longest ago when there would be more than `limit`.
   /// @param id, token  receive the new secrets
-  bool Create(const Session& session, std::string& id, std::string& token) const;
+  bool Create(const Session& session, size_t limit, std::string& id, std::string& token) const;
   bool Remove(const std::string& id) const;
   /// Removes the files of sessions that timed out long ago.
-  void Purge(int timeout) const;
+  /// @param pause  nothing is done when this was called less than so many seconds ago
+  void Purge(int timeout, int pause) const;
 
  private:
   UniqueFd dir_;

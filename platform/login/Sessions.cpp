@@ -8,6 +8,13 @@
 
 using namespace QELO::Platform;
 
+namespace {
+
+constexpr int kMostSessions = 1'000'000;
+constexpr int kLongestPause = 366 * 86400;  // seconds
+
+}  // namespace
+
 extern "C" {
 
 int QeloSessionCreate(const char* user, const char* address, char* id, char* token) {
@@ -21,6 +28,7 @@ int QeloSessionCreate(const char* user, const char* address, char* id, char* tok
   const Settings settings;
   Session session;
   session.user = account.name;
+  session.uid = account.uid;
   session.skipCheckIp = settings.GetSwitch("skip_check_ip", false);
   IpAddress client;
   if (IpAddress::Parse(address, client)) {
@@ -29,10 +37,12 @@ int QeloSessionCreate(const char* user, const char* address, char* id, char* tok
     return -1;  // nobody could use a session that is bound to no address
   }
   const SessionStore store(true);
-  store.Purge(settings.SessionTimeout());
+  store.Purge(settings.SessionTimeout(),
+              settings.GetNumber("session_purge_pause", 600, 0, kLongestPause));
+  const int limit = settings.GetNumber("session_limit", 64, 1, kMostSessions);
   std::string newId;
   std::string newToken;
-  if (!store.Create(session, newId, newToken)) {
+  if (!store.Create(session, static_cast<size_t>(limit), newId, newToken)) {
     return -1;
   }
   reserveTaskStore(account.uid, account.gid);

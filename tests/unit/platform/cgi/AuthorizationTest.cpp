@@ -125,6 +125,80 @@ TEST_F(Authorization, UserWhoIsGoneIsMinusFive) {
   EXPECT_STREQ(user_, "");
 }
 
+TEST_F(Authorization, LockedAccountIsMinusSixUntilItIsUnlocked) {
+  const Ticket ticket = Create();
+  for (const std::string& lock : {std::string("!"), std::string("!!"), std::string("!$6$x$y")}) {
+    SetShadow("alice", lock + ":20000:0:99999:7:::");
+    EXPECT_EQ(Check(ticket.id), -6) << lock;
+    EXPECT_STREQ(user_, "");
+  }
+  SetShadow("alice", "$6$x$y:20000:0:99999:7:::");
+  EXPECT_EQ(Check(ticket.id), 1);
+}
+
+TEST_F(Authorization, AccountWithoutPasswordOfItsOwnIsNotLocked) {
+  const Ticket ticket = Create();
+  SetShadow("alice", "*:20000:0:99999:7:::");
+  EXPECT_EQ(Check(ticket.id), 1);
+  SetShadow("alice", "");
+  EXPECT_EQ(Check(ticket.id), 1);
+}
+
+TEST_F(Authorization, ExpiredAccountIsMinusSix) {
+  const Ticket ticket = Create();
+  SetShadow("alice", "$6$x$y:20000:0:99999:7::" + std::to_string(Today() + 1) + ":");
+  EXPECT_EQ(Check(ticket.id), 1);
+  SetShadow("alice", "$6$x$y:20000:0:99999:7::" + std::to_string(Today()) + ":");
+  EXPECT_EQ(Check(ticket.id), -6);
+  SetShadow("alice", "$6$x$y:" + std::to_string(Today() - 31) + ":0:20:7:11::");
+  EXPECT_EQ(Check(ticket.id), 1);
+  SetShadow("alice", "$6$x$y:" + std::to_string(Today() - 31) + ":0:20:7:10::");
+  EXPECT_EQ(Check(ticket.id), -6);
+}
+
+TEST_F(Authorization, PasswordThatMustBeChangedEndsNoSession) {
+  const Ticket ticket = Create();
+  for (const std::string& changed : {std::string("0"), std::to_string(Today() - 31)}) {
+    SetShadow("alice", "$6$x$y:" + changed + ":0:30:7:::");
+    EXPECT_EQ(Check(ticket.id), 1) << changed;
+  }
+}
+
+TEST_F(Authorization, AccountWhoseShellWasTakenIsMinusSix) {
+  const Ticket ticket = Create();
+  const std::string ids = std::to_string(IsRoot() ? 1002 : geteuid()) + ":" +
+                          std::to_string(IsRoot() ? 1002 : getegid());
+  SetAccount("alice", "alice:x:" + ids + ":Alice:/home/alice:/usr/sbin/nologin");
+  EXPECT_EQ(Check(ticket.id), -6);
+  SetAccount("alice", "alice:x:" + ids + ":Alice:/home/alice:/bin/bash");
+  EXPECT_EQ(Check(ticket.id), 1);
+}
+
+TEST_F(Authorization, AccountMadeAnewHasNotTheFormerOnesSessions) {
+  const Ticket ticket = Create();
+  SetAccount("alice", "alice:x:2002:2002:Another Alice:/home/alice:/bin/sh");
+  EXPECT_EQ(Check(ticket.id), -5);
+  EXPECT_STREQ(user_, "");
+  EXPECT_EQ(Check(Create().id), 1);
+}
+
+TEST_F(Authorization, RecordWithoutTheUsersIdIsMinusFive) {
+  const std::string token = R"("token":")" + std::string(43, 't') + "\"";
+  for (const char* uid : {"", R"("uid":"1002",)", R"("uid":-1,)", R"("uid":1002.5,)",
+                          R"("uid":4294967295,)", R"("uid":null,)"}) {
+    EXPECT_EQ(Check(WriteSession(R"({"user":"alice",)" + std::string(uid) + token + "}"),
+                    {.checkAddress = 0}),
+              -5)
+        << uid;
+  }
+}
+
+TEST_F(Authorization, UnreadableShadowFileIsMinusSix) {
+  const Ticket ticket = Create();
+  ASSERT_EQ(remove(Path("etc/shadow").c_str()), 0);
+  EXPECT_EQ(Check(ticket.id), -6);
+}
+
 TEST_F(Authorization, UnreadableAccountsAreMinusSix) {
   const Ticket ticket = Create();
   ASSERT_EQ(remove(Path("etc/passwd").c_str()), 0);

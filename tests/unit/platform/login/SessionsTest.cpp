@@ -82,6 +82,7 @@ TEST_F(Sessions, CreateSetsAStrangersPlaceForTasksAside) {
 }
 
 TEST_F(Sessions, CreateNeverGivesAnIdTwice) {
+  Set({{"session_limit", "1000"}});
   std::set<std::string> seen;
   for (int i = 0; i < 200; ++i) {
     const Ticket ticket = Create();
@@ -95,6 +96,7 @@ TEST_F(Sessions, FileHoldsTheRecordForRootAlone) {
   Json::Value record;
   ASSERT_TRUE(QELO::JsonHelper::fromString(Read(File(ticket)), record));
   EXPECT_EQ(record["user"], Json::Value("alice"));
+  EXPECT_EQ(QELO::JsonHelper::asInt64(record["uid"]), IsRoot() ? 1002 : geteuid());
   EXPECT_EQ(record["address"], Json::Value(kAddress));
   EXPECT_EQ(record["token"], Json::Value(ticket.token));
   EXPECT_NEAR(static_cast<double>(QELO::JsonHelper::asInt64(record["created"])),
@@ -165,7 +167,108 @@ TEST_F(Sessions, CreateFailsAndLogsWhenTheRecordCannotBeWritten) {
   EXPECT_EQ(CountFiles("run/webapi/sessions"), 0);
 }
 
+TEST_F(Sessions, CreateBeyondTheLimitEndsTheSessionUsedLongestAgo) {
+  Set({{"session_limit", "3"}});
+  const Ticket first = Create();
+  const Ticket second = Create();
+  const Ticket third = Create();
+  const Ticket other = Create("bob");
+  Age(File(first), 10);
+  Age(File(second), 30);
+  Age(File(third), 20);
+  Age(File(other), 40);
+  const Ticket fourth = Create();
+  EXPECT_LT(SecondsLeft(second), 0);
+  for (const Ticket& kept : {first, third, fourth, other}) {
+    EXPECT_GE(SecondsLeft(kept), 0);
+  }
+  EXPECT_EQ(CountFiles("run/webapi/sessions"), 4);
+  Set({{"session_limit", "1"}});
+  EXPECT_GE(SecondsLeft(Create()), 0);
+  EXPECT_EQ(CountFiles("run/webapi/sessions"), 2);
+}
+
+TEST_F(Sessions, NewSessionStaysThoughOthersSeemToBeUsedLater) {
+  Set({{"session_limit", "2"}});
+  Age(File(Create()), -100);
+  Age(File(Create()), -100);
+  EXPECT_GE(SecondsLeft(Create()), 0);
+  EXPECT_EQ(CountFiles("run/webapi/sessions"), 2);
+}
+
+TEST_F(Sessions, LimitIs64UnlessItIsSet) {
+  for (int i = 0; i < 70; ++i) {
+    Create();
+  }
+  EXPECT_EQ(CountFiles("run/webapi/sessions"), 64);
+}
+
+TEST_F(Sessions, SessionsThatEndedDoNotCountForTheLimit) {
+  Set({{"session_limit", "2"}});
+  const Ticket first = Create();
+  const Ticket second = Create();
+  const Ticket third = Create("bob");
+  EXPECT_EQ(QeloSessionRemove(second.id.c_str()), 0);
+  ASSERT_EQ(remove(Path(File(third)).c_str()), 0);  // as the purge does
+  Create();
+  Create("bob");
+  Create("bob");
+  EXPECT_GE(SecondsLeft(first), 0);
+  EXPECT_EQ(CountFiles("run/webapi/sessions"), 4);
+}
+
+TEST_F(Sessions, LimitHoldsWhenProcessesLogInAtOnce) {
+  Set({{"session_limit", "5"}});
+  std::vector<pid_t> children;
+  for (int i = 0; i < 8; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      int failures = 0;
+      for (int n = 0; n < 10; ++n) {
+        failures += TryCreate("alice", kAddress) == 0 ? 0 : 1;
+      }
+      _exit(failures);
+    }
+    children.push_back(child);
+  }
+  for (const pid_t child : children) {
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(status, 0);
+  }
+  EXPECT_LE(CountFiles("run/webapi/sessions"), 5);
+  EXPECT_GE(CountFiles("run/webapi/sessions"), 1);
+}
+
+TEST_F(Sessions, LogoutAndPurgeLeaveNothingOfASession) {
+  const std::string index =
+      "run/webapi/sessions/.users/" + std::to_string(IsRoot() ? 1002 : geteuid()) + "-616c696365";
+  const Ticket first = Create();
+  const Ticket second = Create();
+  EXPECT_EQ(CountFiles(index), 2);
+  QeloSessionRemove(first.id.c_str());
+  EXPECT_EQ(CountFiles(index), 1);
+  Age(File(second), 9000 + 10);
+  Set({{"session_purge_pause", "0"}});
+  Create("bob");
+  EXPECT_EQ(CountFiles(index), 0);
+}
+
+TEST_F(Sessions, PurgeWaitsForItsPause) {
+  const Ticket old = Create();
+  Age(File(old), 9000 + 10);
+  Create();
+  EXPECT_TRUE(std::filesystem::exists(Path(File(old))));
+  Age("run/webapi/sessions/.purged", 590);
+  Create();
+  EXPECT_TRUE(std::filesystem::exists(Path(File(old))));
+  Age("run/webapi/sessions/.purged", 602);
+  Create();
+  EXPECT_FALSE(std::filesystem::exists(Path(File(old))));
+}
+
 TEST_F(Sessions, CreatePurgesSessionsThatTimedOutLongAgo) {
+  Set({{"session_purge_pause", "0"}});
   const Ticket recent = Create();
   const Ticket old = Create();
   Age(File(recent), 9000 - 10);
