@@ -64,4 +64,5 @@ install(FILES README.md DEVELOPING.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_I
 install(FILES packaging/lighttpd.conf.in packaging/lighttpd.service.conf packaging/nginx.conf.in
               packaging/apache2.conf.in
         DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
+install(DIRECTORY packaging/fail2ban DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)

@@ -20,7 +20,13 @@ namespace JsonHelper = QELO::JsonHelper;
 constexpr char kApi[] = "QELO.Access.Session";
 constexpr char kCookie[] = "id";
 
-enum Error : int { kWrong = 400, kUnavailable = 401, kTooMany = 407 };
+enum Error : int {
+  kWrong = 400,
+  kUnavailable = 401,
+  kOtherSite = 403,
+  kNotPost = 405,
+  kTooMany = 407
+};
 
 /// A parameter as it was typed: one that looks like JSON, as a password of digits does, has been
 /// read as JSON.
@@ -82,6 +88,12 @@ void Login(APIRequest* request, APIResponse* response) {
       return;
     case LoginSession::LOGIN_TOO_MANY:
       AnswerTooMany(response, ticket.retryAfter);
+      return;
+    case LoginSession::LOGIN_NOT_POST:
+      response->SetError(kNotPost);
+      return;
+    case LoginSession::LOGIN_OTHER_SITE:
+      response->SetError(kOtherSite);
       return;
     case LoginSession::LOGIN_FAILED:
       response->SetError(kUnavailable);

@@ -14,9 +14,11 @@ class WEBAPI_API LoginSession {
  public:
   enum Result {
     LOGIN_OK,
-    LOGIN_WRONG,     ///< no such account, or the password is wrong
-    LOGIN_TOO_MANY,  ///< refused without looking; see retryAfter
-    LOGIN_FAILED     ///< the account database or the session store cannot be used
+    LOGIN_WRONG,      ///< no such account, one that may not log in, or the password is wrong
+    LOGIN_TOO_MANY,   ///< refused without looking; see retryAfter
+    LOGIN_FAILED,     ///< the account database or the session store cannot be used
+    LOGIN_NOT_POST,   ///< refused without looking: a password in an address ends in logs
+    LOGIN_OTHER_SITE  ///< likewise: the page that a browser sent it for is another site's
   };
 
   struct Ticket {
@@ -28,7 +30,8 @@ class WEBAPI_API LoginSession {
 
   /// Checks the password and creates a session bound to the request's remote address. Failed
   /// attempts are counted per address and account and per address; beyond the limit they are
-  /// rejected at once.
+  /// rejected at once. Each attempt is one line to the authorisation facility, with the client's
+  /// address and the reason (docs/platform.md).
   static Result Login(const APIRequest& request, const std::string& account,
                       const std::string& password, Ticket& ticket);
   /// Ends a session. @return false when there is none

@@ -3,6 +3,7 @@
 #include "platform/login/Passwords.h"
 #include "platform/login/module/PasswordPam.h"
 #include "webapi/base/Log.h"
+#include "webapi/platform/Session.h"
 
 namespace QELO::Platform {
 namespace {
@@ -12,25 +13,32 @@ constexpr int kLongestName = 256;  // characters of an account's name, with the 
 
 }  // namespace
 
-int checkPassword(const std::string& account, const std::string& password, std::string& name) {
+int checkPassword(const std::string& account, const std::string& password,
+                  const std::string& address, std::string& name) {
   const auto check =
       reinterpret_cast<PasswordPamCheck>(findInModule(kPasswordPamModule, kPasswordPamCheck));
   if (check == nullptr) {
-    return -1;
+    return QELO_PASSWORD_UNCHECKED;
   }
   char spelled[kLongestName] = "";
-  const int result =
-      check(nullptr, account.c_str(), password.c_str(), spelled, static_cast<int>(sizeof spelled));
+  const int result = check(nullptr, account.c_str(), password.c_str(), address.c_str(), spelled,
+                           static_cast<int>(sizeof spelled));
   if (result < 0) {
     WEBAPI_LOG(kSource, "PAM cannot check a password [%d]", result);
-    return -1;
+    return QELO_PASSWORD_UNCHECKED;
+  }
+  if (result != QELO_PASSWORD_RIGHT) {
+    return result;
   }
   Account found;
-  if (result == 0 || findAccount(spelled, found) != Lookup::kFound || isBarredFromLogin(found)) {
-    return 0;
+  if (findAccount(spelled, found) != Lookup::kFound) {
+    return QELO_PASSWORD_WRONG;
+  }
+  if (isBarredFromLogin(found)) {
+    return QELO_PASSWORD_BARRED;
   }
   name = found.name;
-  return 1;
+  return QELO_PASSWORD_RIGHT;
 }
 
 }  // namespace QELO::Platform

@@ -7,6 +7,7 @@
 #include "platform/login/Passwords.h"
 #include "platform/login/module/PasswordCrypt.h"
 #include "webapi/base/Log.h"
+#include "webapi/platform/Session.h"
 
 namespace QELO::Platform {
 namespace {
@@ -44,29 +45,32 @@ bool readShadow(const std::string& account, ShadowPassword& password) {
 
 }  // namespace
 
-int checkPassword(const std::string& account, const std::string& password, std::string& name) {
+int checkPassword(const std::string& account, const std::string& password, const std::string&,
+                  std::string& name) {
   const auto verify = reinterpret_cast<PasswordCryptVerify>(
       findInModule(kPasswordCryptModule, kPasswordCryptVerify));
   ShadowPassword shadow;
   Account found;
   const Lookup lookup = findAccount(account, found);
   if (verify == nullptr) {
-    return -1;
+    return QELO_PASSWORD_UNCHECKED;
   }
   if (lookup == Lookup::kFailed || !readShadow(account, shadow)) {
     WEBAPI_LOG(kSource, "cannot read the accounts [%s]", strerror(errno));
-    return -1;
+    return QELO_PASSWORD_UNCHECKED;
   }
   // Every answer costs one hash, so that its time does not tell which accounts there are.
   const std::string sample = shadow.sample.empty() ? kSampleHash : shadow.sample;
   const bool exists = lookup == Lookup::kFound && !shadow.entry.hash.empty();
   const bool matches = verify((exists ? shadow.entry.hash : sample).c_str(), password.c_str()) == 1;
-  const bool isOver = shadow.entry.HasExpired() || shadow.entry.MustChange();
-  if (!exists || !matches || isOver || isBarredFromLogin(found)) {
-    return 0;
+  if (!exists || !matches) {
+    return QELO_PASSWORD_WRONG;
+  }
+  if (shadow.entry.HasExpired() || shadow.entry.MustChange() || isBarredFromLogin(found)) {
+    return QELO_PASSWORD_BARRED;
   }
   name = found.name;
-  return 1;
+  return QELO_PASSWORD_RIGHT;
 }
 
 }  // namespace QELO::Platform

@@ -259,8 +259,9 @@ void QeloLoginSucceeded(const char* address, const char* account) {
   note("QeloLoginSucceeded", address, account);
 }
 
-int QeloLoginPasswordCheck(const char* account, const char*, char* user, int size) {
-  note("QeloLoginPasswordCheck", account);
+int QeloLoginPasswordCheck(const char* account, const char*, const char* address, char* user,
+                           int size) {
+  note("QeloLoginPasswordCheck", account, address);
   fill(account, user, size);
   return fake().passwordCheck;
 }

@@ -11,11 +11,18 @@ extern "C" {
 WEBAPI_API int QeloLoginAttempt(const char* address, const char* account);
 /// Forgets the failed attempts of an account from an address.
 WEBAPI_API void QeloLoginSucceeded(const char* address, const char* account);
+/// Answers of QeloLoginPasswordCheck.
+enum {
+  QELO_PASSWORD_UNCHECKED = -1,
+  QELO_PASSWORD_WRONG = 0,  ///< or there is no such account
+  QELO_PASSWORD_RIGHT = 1,
+  QELO_PASSWORD_BARRED = 2  ///< right, but the account is locked, expired or not for logins
+};
 /// Checks a password; takes as long for an unknown account as for a wrong password.
-/// @param user  receives the account's own spelling
-/// @return 1 right; 0 wrong, unknown or barred account; -1 cannot be checked
-WEBAPI_API int QeloLoginPasswordCheck(const char* account, const char* password, char* user,
-                                      int size);
+/// @param address  the client's, for the host's own records; "" when it is not known
+/// @param user     receives the account's own spelling when the password is right, else ""
+WEBAPI_API int QeloLoginPasswordCheck(const char* account, const char* password,
+                                      const char* address, char* user, int size);
 
 /// Length of a session id and of a token, without the NUL.
 enum { QELO_SESSION_ID_LENGTH = 43 };

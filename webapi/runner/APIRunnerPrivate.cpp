@@ -96,7 +96,11 @@ bool APIRunnerPrivate::SetCallName(const std::string& api, int version, const st
 void APIRunnerPrivate::SetLogIdentity(const std::string& text) {
   static char identity[kLongestName + 1];  // syslog keeps the pointer
   closelog();
-  const std::string shown = PrintableText(text).c_str();
+  std::string shown = PrintableText(text).c_str();
+  // A log's reader takes these for the identity's end, and what follows for the message.
+  std::replace_if(
+      shown.begin(), shown.end(),
+      [](char c) { return c == ' ' || c == ':' || c == '[' || c == ']'; }, '?');
   const size_t length = std::min(shown.size(), sizeof identity - 1);
   memcpy(identity, shown.data(), length);
   identity[length] = '\0';

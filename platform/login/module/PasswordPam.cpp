@@ -64,9 +64,13 @@ bool isRefusal(int error) {
   }
 }
 
-int check(pam_handle_t* pam, char* user, int size) {
-  int error = pam_authenticate(pam, PAM_SILENT | PAM_DISALLOW_NULL_AUTHTOK);
+int check(pam_handle_t* pam, const char* address, char* user, int size) {
+  int error = *address != '\0' ? pam_set_item(pam, PAM_RHOST, address) : PAM_SUCCESS;
   if (error == PAM_SUCCESS) {
+    error = pam_authenticate(pam, PAM_SILENT | PAM_DISALLOW_NULL_AUTHTOK);
+  }
+  const bool isRight = error == PAM_SUCCESS;
+  if (isRight) {
     error = pam_acct_mgmt(pam, PAM_SILENT | PAM_DISALLOW_NULL_AUTHTOK);
   }
   const void* name = nullptr;
@@ -81,17 +85,21 @@ int check(pam_handle_t* pam, char* user, int size) {
   if (error == PAM_SUCCESS && name != nullptr) {
     return 1;
   }
-  return isRefusal(error) ? 0 : -1 - error;
+  if (!isRefusal(error)) {
+    return -1 - error;
+  }
+  return isRight ? 2 : 0;
 }
 
 }  // namespace
 
 extern "C" WEBAPI_API int webapiPamCheck(const char* configuration, const char* account,
-                                         const char* password, char* user, int size) {
+                                         const char* password, const char* address, char* user,
+                                         int size) {
   const pam_conv conversation{converse, const_cast<char*>(password)};
   pam_handle_t* pam = nullptr;
   const int error = configuration != nullptr
                         ? pam_start_confdir(kService, account, &conversation, configuration, &pam)
                         : pam_start(kService, account, &conversation, &pam);
-  return error == PAM_SUCCESS ? check(pam, user, size) : -1 - error;
+  return error == PAM_SUCCESS ? check(pam, address, user, size) : -1 - error;
 }

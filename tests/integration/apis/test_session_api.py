@@ -1,7 +1,9 @@
 """QELO.Access.Session: logging in and out, and who the caller is."""
 
 import itertools
+import json
 import subprocess
+from urllib.parse import quote
 
 import pytest
 
@@ -40,6 +42,35 @@ def test_Login_Right_AnswersTicketAndCookie(client):
     assert cookie_of(answer) == f"id={data['sid']}; path=/; httponly; samesite=strict"
     assert answer.word is None
     assert answer.status == 200
+
+
+def login_of(account):
+    return f"api={API}&version=1&method=login&account={account}&password={PASSWORDS[account]}"
+
+
+def test_Login_ByGet_IsRefused(client):
+    """The password would stand in the server's log."""
+    answer = client.get(login_of("alice"))
+    assert answer.refusal == (405, None)
+    assert answer.headers.get_all("Set-Cookie") is None
+    entry = {"api": API, "version": 1, "method": "login", "account": "alice",
+             "password": PASSWORDS["alice"]}
+    whole = client.get("api=QELO.Entry.Request&version=1&method=request&compound="
+                       + quote(json.dumps([entry])))
+    assert whole.data["result"][0]["error"]["code"] == 405
+
+
+@pytest.mark.parametrize("headers, code", [
+    ({"Sec-Fetch-Site": "cross-site", "Content-Type": "text/plain"}, 403),
+    ({"Origin": "http://evil.example"}, 403),
+    ({"Origin": "null"}, 403),
+    ({"Sec-Fetch-Site": "same-origin", "Origin": "http://127.0.0.1"}, 0),
+    ({"Origin": "http://127.0.0.1:8080"}, 0),
+])
+def test_Login_FromAPage_IsForOwnPagesAlone(client, headers, code):
+    answer = client.post(login_of("alice"), headers)
+    assert answer.code == code
+    assert (answer.headers.get_all("Set-Cookie") is None) == (code != 0)
 
 
 def test_Login_WhileLoggedIn_MakesAnotherSession(client, alice):

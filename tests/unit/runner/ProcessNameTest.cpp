@@ -64,6 +64,14 @@ TEST_F(ProcessName, EmptyApiIs101) {
   EXPECT_EQ(response->GetError(), 101);
 }
 
+TEST_F(ProcessName, IdentityHoldsNothingThatALogTakesForItsEnd) {
+  TestRunner tested;
+  MakeRequest("x[1]: LoginSession.cpp:1 login failed from 192.0.2.7: y\n", 2, "run");
+  EXPECT_TRUE(tested.SetProcessName(request.get(), response.get()));
+  EXPECT_EQ(SyslogCapture::Identity(),
+            "unit_runner_x?1???LoginSession.cpp?1?login?failed?from?192.0.2.7??y?_2_run");
+}
+
 TEST_F(ProcessName, IdentityIsCutTo1023Bytes) {
   TestRunner tested;
   MakeRequest("Q." + std::string(2000, 'a'), 1, "run");

@@ -1,8 +1,14 @@
 #include "webapi/LoginSession.h"
 
+#include <syslog.h>
+
 #include <algorithm>
+#include <cstdlib>
+#include <cstring>
 
 #include "webapi/APIRequest.h"
+#include "webapi/base/Log.h"
+#include "webapi/entry/permission/LoginOrigin.h"
 #include "webapi/entry/permission/UserClass.h"
 #include "webapi/platform/Session.h"
 
@@ -18,6 +24,85 @@ bool isAccountName(const std::string& account) {
                       [](unsigned char c) { return c < 0x20 || c == 0x7F; });
 }
 
+struct Outcome {
+  LoginSession::Result result;
+  std::string reason;
+};
+
+/// One line in the form that packaging/fail2ban reads. What the client chose stands last.
+void tell(const Outcome& outcome, const std::string& address, const std::string& account) {
+  const char* word = "refused";
+  int priority = LOG_NOTICE;
+  if (outcome.result == LoginSession::LOGIN_OK) {
+    word = "accepted";
+    priority = LOG_INFO;
+  } else if (outcome.result == LoginSession::LOGIN_WRONG) {
+    word = "failed";
+  } else if (outcome.result == LoginSession::LOGIN_FAILED) {
+    word = "not possible";
+    priority = LOG_ERR;
+  }
+  syslog(LOG_AUTH | priority, "%s:%d login %s from %s: %s; account \"%s\"", "LoginSession.cpp",
+         __LINE__, word, address.empty() ? "unknown" : LogText(address).c_str(),
+         outcome.reason.c_str(), LogText(account).c_str());
+}
+
+/// An entry of a compound request counts as a POST, whatever brought the whole request.
+bool isPost(const APIRequest& request) {
+  const char* whole = getenv("REQUEST_METHOD");
+  return request.GetRequestMethod() == APIRequest::METHOD_POST &&
+         (whole == nullptr || strcmp(whole, "POST") == 0);
+}
+
+/// What speaks against the attempt before its password is looked at; counts it.
+Outcome refusalOf(const APIRequest& request, const std::string& address, const std::string& account,
+                  LoginSession::Ticket& ticket) {
+  if (!isPost(request)) {
+    return {LoginSession::LOGIN_NOT_POST, "not sent by POST"};
+  }
+  if (comesFromAnotherSite(request)) {
+    return {LoginSession::LOGIN_OTHER_SITE, "sent for another site's page"};
+  }
+  const int wait = QeloLoginAttempt(address.c_str(), account.c_str());
+  ticket.retryAfter = std::max(wait, 0);
+  if (wait > 0) {
+    return {LoginSession::LOGIN_TOO_MANY,
+            "too many attempts, " + std::to_string(wait) + " seconds left"};
+  }
+  return wait == 0 ? Outcome{LoginSession::LOGIN_OK, ""}
+                   : Outcome{LoginSession::LOGIN_FAILED, "attempts cannot be counted"};
+}
+
+/// @param ticket  receives the new session
+Outcome tryPassword(const std::string& address, const std::string& account,
+                    const std::string& password, LoginSession::Ticket& ticket) {
+  const Outcome wrong{LoginSession::LOGIN_WRONG, "wrong account or password"};
+  if (!isAccountName(account) || password.find('\0') != std::string::npos) {
+    return wrong;
+  }
+  char user[kUserNameSize] = {};
+  switch (QeloLoginPasswordCheck(account.c_str(), password.c_str(), address.c_str(), user,
+                                 kUserNameSize)) {
+    case QELO_PASSWORD_RIGHT:
+      break;
+    case QELO_PASSWORD_WRONG:
+      return wrong;
+    case QELO_PASSWORD_BARRED:
+      return {LoginSession::LOGIN_WRONG, "the account is locked, expired or not for logins"};
+    default:
+      return {LoginSession::LOGIN_FAILED, "passwords cannot be checked"};
+  }
+  char id[QELO_SESSION_ID_LENGTH + 1] = {};
+  char token[QELO_SESSION_ID_LENGTH + 1] = {};
+  if (QeloSessionCreate(user, address.c_str(), id, token) != 0) {
+    return {LoginSession::LOGIN_FAILED, "no session can be made"};
+  }
+  ticket.id = id;
+  ticket.token = token;
+  ticket.user = user;
+  return {LoginSession::LOGIN_OK, "password"};
+}
+
 }  // namespace
 
 LoginSession::Result LoginSession::Login(const APIRequest& request, const std::string& account,
@@ -27,31 +112,17 @@ LoginSession::Result LoginSession::Login(const APIRequest& request, const std::s
     return LOGIN_WRONG;
   }
   const std::string address = request.GetRemoteIP();
-  // Counted under a bounded name, however long the one that was sent.
+  // Counted and logged under a bounded name, however long the one that was sent.
   const std::string counted = account.substr(0, kMaxAccountBytes);
-  const int wait = QeloLoginAttempt(address.c_str(), counted.c_str());
-  if (wait != 0) {
-    ticket.retryAfter = std::max(wait, 0);
-    return wait > 0 ? LOGIN_TOO_MANY : LOGIN_FAILED;
+  Outcome outcome = refusalOf(request, address, counted, ticket);
+  if (outcome.result == LOGIN_OK) {
+    outcome = tryPassword(address, account, password, ticket);
   }
-  if (!isAccountName(account) || password.find('\0') != std::string::npos) {
-    return LOGIN_WRONG;
+  if (outcome.result == LOGIN_OK) {
+    QeloLoginSucceeded(address.c_str(), counted.c_str());
   }
-  char user[kUserNameSize] = {};
-  const int check = QeloLoginPasswordCheck(account.c_str(), password.c_str(), user, kUserNameSize);
-  if (check != 1) {
-    return check == 0 ? LOGIN_WRONG : LOGIN_FAILED;
-  }
-  char id[QELO_SESSION_ID_LENGTH + 1] = {};
-  char token[QELO_SESSION_ID_LENGTH + 1] = {};
-  if (QeloSessionCreate(user, address.c_str(), id, token) != 0) {
-    return LOGIN_FAILED;
-  }
-  QeloLoginSucceeded(address.c_str(), counted.c_str());
-  ticket.id = id;
-  ticket.token = token;
-  ticket.user = user;
-  return LOGIN_OK;
+  tell(outcome, address, counted);
+  return outcome.result;
 }
 
 bool LoginSession::Logout(const std::string& id) {

@@ -27,8 +27,9 @@ class HostPasswords : public testing::Test {
   int Check(int result, const char* user) {
     setenv("FAKE_PAM_RESULT", std::to_string(result).c_str(), 1);
     setenv("FAKE_PAM_USER", user, 1);
+    setenv("FAKE_PAM_ADDRESS", "192.0.2.7", 1);
     name_ = "before";
-    return QELO::Platform::checkPassword("any", "password", name_);
+    return QELO::Platform::checkPassword("any", "password", "192.0.2.7", name_);
   }
 
   /// An account of the host that may log in, or "".
@@ -59,6 +60,11 @@ TEST_F(HostPasswords, RefusalIsARefusal) {
   EXPECT_EQ(SyslogCapture::Count(""), 0);
 }
 
+TEST_F(HostPasswords, AccountThatPamRefusesIsBarred) {
+  EXPECT_EQ(Check(2, ""), 2);
+  EXPECT_EQ(name_, "before");
+}
+
 TEST_F(HostPasswords, NameThatTheHostDoesNotKnowIsRefused) {
   EXPECT_EQ(Check(1, "nobody-of-this-name"), 0);
   EXPECT_EQ(Check(1, ""), 0);
@@ -68,7 +74,7 @@ TEST_F(HostPasswords, AccountWithoutShellIsRefusedThoughPamLetsItIn) {
   if (getpwnam("daemon") == nullptr) {
     GTEST_SKIP() << "the host has no account without a shell that is known here";
   }
-  EXPECT_EQ(Check(1, "daemon"), 0);
+  EXPECT_EQ(Check(1, "daemon"), 2);
   EXPECT_EQ(name_, "before");
 }
 
@@ -120,10 +126,11 @@ class PamModule : public testing::Test {
 
   int Check(const char* account, const char* password, int size = 64) {
     user_[0] = '\0';
-    return check_(dir_.c_str(), account, password, user_, size);
+    return check_(dir_.c_str(), account, password, address_, user_, size);
   }
 
   PasswordPamCheck check_ = nullptr;
+  const char* address_ = "192.0.2.7";
   std::string dir_;
   char user_[64] = "";
 };
@@ -142,9 +149,28 @@ TEST_F(PamModule, AccountThatIsRefusedIsRefused) {
   ServiceByScript("account required pam_deny.so\n");
   EXPECT_NE(Check("anna", "secret"), 1);
   ServiceByScript("account required pam_debug.so acct=acct_expired\n");
-  EXPECT_EQ(Check("anna", "secret"), 0);
+  EXPECT_EQ(Check("anna", "secret"), 2);
+  EXPECT_EQ(Check("anna", "wrong"), 0);
   ServiceByScript("account required pam_debug.so acct=new_authtok_reqd\n");
-  EXPECT_EQ(Check("anna", "secret"), 0);
+  EXPECT_EQ(Check("anna", "secret"), 2);
+}
+
+TEST_F(PamModule, ClientsAddressIsTheRemoteHost) {
+  const std::string script = dir_ + "/account";
+  std::ofstream(script) << "#!/bin/sh\nprintf %s \"$PAM_RHOST\" > " << dir_ << "/host\n";
+  ASSERT_EQ(chmod(script.c_str(), 0700), 0);
+  const auto host = [this] {
+    std::ifstream file(dir_ + "/host");
+    std::string text;
+    std::getline(file, text);
+    return text;
+  };
+  ServiceByScript("account required pam_exec.so quiet " + script + "\n");
+  EXPECT_EQ(Check("anna", "secret"), 1);
+  EXPECT_EQ(host(), "192.0.2.7");
+  address_ = "";
+  EXPECT_EQ(Check("anna", "secret"), 1);
+  EXPECT_EQ(host(), "");
 }
 
 TEST_F(PamModule, ServiceThatFailsCannotCheck) {

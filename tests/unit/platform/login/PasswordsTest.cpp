@@ -15,7 +15,7 @@ class Passwords : public PrivateRoot {
   int Check(const char* account, const char* password, int size = 64) {
     user_[0] = 'x';
     user_[1] = '\0';
-    const int result = QeloLoginPasswordCheck(account, password, user_, size);
+    const int result = QeloLoginPasswordCheck(account, password, "192.0.2.7", user_, size);
     EXPECT_EQ(result == 1, user_[0] != '\0') << user_;
     return result;
   }
@@ -65,9 +65,9 @@ TEST_F(Passwords, AccountsWithoutLoginAreRefused) {
     shadow += std::string(account) + ":" + hash + ":20000:0:99999:7:::\n";
   }
   Write("etc/shadow", shadow);
-  EXPECT_EQ(Check("alice", "alice-pw"), 0);
-  EXPECT_EQ(Check("bob", "alice-pw"), 0);
-  EXPECT_EQ(Check("system", "alice-pw"), 0);
+  EXPECT_EQ(Check("alice", "alice-pw"), 2);
+  EXPECT_EQ(Check("bob", "alice-pw"), 2);
+  EXPECT_EQ(Check("system", "alice-pw"), 2);
   EXPECT_EQ(Check("carol", "alice-pw"), 1);
   EXPECT_EQ(Check("dave", "alice-pw"), 1);
 }
@@ -105,15 +105,15 @@ TEST_F(Passwords, AccountIsRefusedFromItsExpiryOn) {
   SetShadow(hash + ":20000:0:99999:7::" + std::to_string(Today() + 1) + ":");
   EXPECT_EQ(Check("alice", "alice-pw"), 1);
   SetShadow(hash + ":20000:0:99999:7::" + std::to_string(Today()) + ":");
-  EXPECT_EQ(Check("alice", "alice-pw"), 0);
+  EXPECT_EQ(Check("alice", "alice-pw"), 2);
 }
 
 TEST_F(Passwords, PasswordThatMustBeChangedIsRefused) {
   const std::string hash = HashOf("alice");
   SetShadow(hash + ":0:0:99999:7:::");
-  EXPECT_EQ(Check("alice", "alice-pw"), 0);
+  EXPECT_EQ(Check("alice", "alice-pw"), 2);
   SetShadow(hash + ":" + std::to_string(Today() - 31) + ":0:30:7:::");
-  EXPECT_EQ(Check("alice", "alice-pw"), 0);
+  EXPECT_EQ(Check("alice", "alice-pw"), 2);
   SetShadow(hash + ":" + std::to_string(Today() - 30) + ":0:30:7:::");
   EXPECT_EQ(Check("alice", "alice-pw"), 1);
   SetShadow(hash + ":::::::");
@@ -143,8 +143,8 @@ TEST_F(Passwords, NameThatDoesNotFitIsNotRight) {
 }
 
 TEST_F(Passwords, MissingArgumentsCannotBeChecked) {
-  EXPECT_EQ(QeloLoginPasswordCheck(nullptr, "x", user_, sizeof user_), -1);
-  EXPECT_EQ(QeloLoginPasswordCheck("alice", nullptr, user_, sizeof user_), -1);
+  EXPECT_EQ(QeloLoginPasswordCheck(nullptr, "x", "", user_, sizeof user_), -1);
+  EXPECT_EQ(QeloLoginPasswordCheck("alice", nullptr, "", user_, sizeof user_), -1);
 }
 
 TEST_F(Passwords, MissingFilesCannotBeChecked) {

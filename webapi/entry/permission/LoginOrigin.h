@@ -1,0 +1,12 @@
+#pragma once
+
+namespace QELO {
+
+class APIRequest;
+
+/// Whether a browser sent the request for a page of another site: such a page could log its visitor
+/// in to an account of its own. Browsers say so in Sec-Fetch-Site, though on https alone; without
+/// it the page's host, in Origin, must be the one that is called. Programs send neither.
+bool comesFromAnotherSite(const APIRequest& request);
+
+}  // namespace QELO
