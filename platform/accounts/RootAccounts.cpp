@@ -131,18 +131,23 @@ Lookup findGroup(const std::string& name, gid_t& gid) {
 }
 
 Lookup findShadow(const std::string& name, ShadowEntry& entry) {
-  bool found = false;
-  const bool readable = readDatabaseFile<spwd>(Paths::kShadow, fgetspent_r, [&](const spwd& line) {
-    found = name == line.sp_namp;
-    if (found) {
-      entry = ShadowEntry(line);
-    }
+  const EntryFile file(Paths::kShadow);
+  std::string line;
+  anyLine(file, [&](std::string_view account, std::string_view rest) {
+    const bool found = account == name;
+    line = found ? name + ":" + std::string(rest) : "";
     return found;
   });
-  if (!readable) {
-    return Lookup::kFailed;
+  std::vector<char> buffer(line.size() + 1);
+  spwd found{};
+  spwd* parsed = nullptr;
+  if (!line.empty() &&
+      sgetspent_r(line.c_str(), &found, buffer.data(), buffer.size(), &parsed) == 0) {
+    entry = ShadowEntry(found);
+    return Lookup::kFound;
   }
-  return found ? Lookup::kFound : Lookup::kAbsent;
+  // A line that cannot be read might have said that the account is locked.
+  return file.readable && line.empty() ? Lookup::kAbsent : Lookup::kFailed;
 }
 
 Lookup findMembership(const Account& account, const std::string& groupName) {

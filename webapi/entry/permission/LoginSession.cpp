@@ -15,6 +15,7 @@
 namespace QELO {
 namespace {
 
+constexpr char kSource[] = "LoginSession.cpp";
 constexpr size_t kMaxAccountBytes = 256;
 
 /// Whether an account can have this name: not too long, and nothing that logs or files choke on.
@@ -30,21 +31,28 @@ struct Outcome {
 };
 
 /// One line in the form that packaging/fail2ban reads. What the client chose stands last.
-void tell(const Outcome& outcome, const std::string& address, const std::string& account) {
-  const char* word = "refused";
-  int priority = LOG_NOTICE;
-  if (outcome.result == LoginSession::LOGIN_OK) {
-    word = "accepted";
-    priority = LOG_INFO;
-  } else if (outcome.result == LoginSession::LOGIN_WRONG) {
-    word = "failed";
-  } else if (outcome.result == LoginSession::LOGIN_FAILED) {
-    word = "not possible";
-    priority = LOG_ERR;
+void tell(const Outcome& outcome, const std::string& client, const std::string& account) {
+  const std::string from = client.empty() ? "unknown" : LogText(client);
+  const char* address = from.c_str();
+  const char* reason = outcome.reason.c_str();
+  const std::string name = LogText(account);
+  switch (outcome.result) {
+    case LoginSession::LOGIN_OK:
+      syslog(LOG_AUTH | LOG_INFO, "%s:%d login accepted from %s: %s; account [%s]", kSource,
+             __LINE__, address, reason, name.c_str());
+      return;
+    case LoginSession::LOGIN_WRONG:
+      syslog(LOG_AUTH | LOG_NOTICE, "%s:%d login failed from %s: %s; account [%s]", kSource,
+             __LINE__, address, reason, name.c_str());
+      return;
+    case LoginSession::LOGIN_FAILED:
+      syslog(LOG_AUTH | LOG_ERR, "%s:%d login not possible from %s: %s; account [%s]", kSource,
+             __LINE__, address, reason, name.c_str());
+      return;
+    default:
+      syslog(LOG_AUTH | LOG_NOTICE, "%s:%d login refused from %s: %s; account [%s]", kSource,
+             __LINE__, address, reason, name.c_str());
   }
-  syslog(LOG_AUTH | priority, "%s:%d login %s from %s: %s; account \"%s\"", "LoginSession.cpp",
-         __LINE__, word, address.empty() ? "unknown" : LogText(address).c_str(),
-         outcome.reason.c_str(), LogText(account).c_str());
 }
 
 /// An entry of a compound request counts as a POST, whatever brought the whole request.

@@ -141,39 +141,38 @@ TEST_F(LoginSessionTest, PasswordWithANulIsCountedAndWrong) {
 
 TEST_F(LoginSessionTest, EachAttemptIsOneLineWithAddressReasonAndAccount) {
   Login();
-  ExpectLine(LOG_INFO, "login accepted from 192.0.2.7: password; account \"ann\"");
+  ExpectLine(LOG_INFO, "login accepted from 192.0.2.7: password; account [ann]");
   platform->passwordCheck = 0;
   Login();
-  ExpectLine(LOG_NOTICE, "login failed from 192.0.2.7: wrong account or password; account \"ann\"");
+  ExpectLine(LOG_NOTICE, "login failed from 192.0.2.7: wrong account or password; account [ann]");
   platform->passwordCheck = 2;
   EXPECT_EQ(Login(), LoginSession::LOGIN_WRONG);
   ExpectNoTicket();
   ExpectLine(LOG_NOTICE,
              "login failed from 192.0.2.7: the account is locked, expired or not for logins; "
-             "account \"ann\"");
+             "account [ann]");
   platform->passwordCheck = -1;
   Login();
   ExpectLine(LOG_ERR,
-             "login not possible from 192.0.2.7: passwords cannot be checked; account \"ann\"");
+             "login not possible from 192.0.2.7: passwords cannot be checked; account [ann]");
   platform->passwordCheck = 1;
   platform->sessionCreate = -1;
   Login();
-  ExpectLine(LOG_ERR, "login not possible from 192.0.2.7: no session can be made; account \"ann\"");
+  ExpectLine(LOG_ERR, "login not possible from 192.0.2.7: no session can be made; account [ann]");
   platform->loginAttempt = 17;
   Login();
   ExpectLine(LOG_NOTICE,
-             "login refused from 192.0.2.7: too many attempts, 17 seconds left; account \"ann\"");
+             "login refused from 192.0.2.7: too many attempts, 17 seconds left; account [ann]");
   platform->loginAttempt = -1;
   Login();
   ExpectLine(LOG_ERR,
-             "login not possible from 192.0.2.7: attempts cannot be counted; account \"ann\"");
+             "login not possible from 192.0.2.7: attempts cannot be counted; account [ann]");
 }
 
 TEST_F(LoginSessionTest, LineShowsNoControlCharactersAndNoEndlessName) {
   Login("an\nn\x1B[0m");
   ExpectLine(LOG_NOTICE,
-             "login failed from 192.0.2.7: wrong account or password; account "
-             "\"an?n?[0m\"");
+             "login failed from 192.0.2.7: wrong account or password; account [an?n?[0m]");
   Login(std::string(100000, 'a'));
   ASSERT_EQ(SyslogCapture::Messages().size(), 1U);
   EXPECT_LT(SyslogCapture::Messages()[0].text.size(), 400U);
@@ -182,7 +181,7 @@ TEST_F(LoginSessionTest, LineShowsNoControlCharactersAndNoEndlessName) {
 TEST_F(LoginSessionTest, UnknownAddressIsSaidToBe) {
   SetEnv("QELO_REMOTE_IP", "");
   Login();
-  ExpectLine(LOG_INFO, "login accepted from unknown: password; account \"ann\"");
+  ExpectLine(LOG_INFO, "login accepted from unknown: password; account [ann]");
 }
 
 TEST_F(LoginSessionTest, WhatIsNoPostIsRefusedUncounted) {
@@ -192,7 +191,7 @@ TEST_F(LoginSessionTest, WhatIsNoPostIsRefusedUncounted) {
     SetEnv("QELO_REMOTE_IP", "192.0.2.7");
     EXPECT_EQ(Login(), LoginSession::LOGIN_NOT_POST) << method;
     ExpectNoTicket();
-    ExpectLine(LOG_NOTICE, "login refused from 192.0.2.7: not sent by POST; account \"ann\"");
+    ExpectLine(LOG_NOTICE, "login refused from 192.0.2.7: not sent by POST; account [ann]");
   }
   EXPECT_TRUE(platform->calls.empty());
 }
@@ -210,7 +209,7 @@ TEST_F(LoginSessionTest, AnotherSitesPageIsRefusedUncounted) {
   EXPECT_EQ(Login(), LoginSession::LOGIN_OTHER_SITE);
   ExpectNoTicket();
   ExpectLine(LOG_NOTICE,
-             "login refused from 192.0.2.7: sent for another site's page; account \"ann\"");
+             "login refused from 192.0.2.7: sent for another site's page; account [ann]");
   EXPECT_TRUE(platform->calls.empty());
 }
 
