@@ -18,6 +18,7 @@ class PermissionCheck;
 /// input, checks the caller, runs the API and prints headers and body to standard output.
 ///
 ///     int main(int argc, char** argv) {
+///       QELO::WebEntry::GuardProcess();
 ///       QELO::WebEntry entry;
 ///       entry.SetArgs(argc, argv);
 ///       entry.Run(Json::Value());
@@ -29,6 +30,11 @@ class WEBAPI_API WebEntry : public APIRunner {
  public:
   WebEntry();
   ~WebEntry() override;
+
+  /// Takes nothing on trust from who started the process, for a program that may be set-user-id:
+  /// closes all descriptors but the standard ones, fixes PATH, and drops of the environment what no
+  /// CGI program needs (docs/architecture.md). Call it first.
+  static void GuardProcess();
 
   /// Serves the request: intake, call, output, callbacks. The argument is not consulted. An
   /// exception on the way to the answer is logged and answered with 117.

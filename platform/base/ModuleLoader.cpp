@@ -7,6 +7,7 @@
 #include <string>
 
 #include "webapi/base/Log.h"
+#include "webapi/base/OwnFile.h"
 
 namespace QELO::Platform {
 namespace {
@@ -16,9 +17,7 @@ constexpr char kModuleDir[] = WEBAPI_MODULE_DIR;
 
 bool isSafe(const std::string& path, mode_t type) {
   struct stat info {};
-  return lstat(path.c_str(), &info) == 0 && (info.st_mode & S_IFMT) == type &&
-         (info.st_uid == 0 || info.st_uid == geteuid()) &&
-         (info.st_mode & (S_IWGRP | S_IWOTH)) == 0;
+  return lstat(path.c_str(), &info) == 0 && (info.st_mode & S_IFMT) == type && IsOwnFile(info);
 }
 
 }  // namespace

@@ -94,6 +94,18 @@ const char* QeloCgiGetLang(QeloCgiContext* context) {
   return kLanguages[number == 0 ? 0 : number - 1];
 }
 
+int QeloCgiKeepsVariable(const char* name) {
+  const std::string names = Settings().Get("keep_environment", "");
+  for (std::string_view rest = names; !rest.empty();) {
+    const size_t end = rest.find_first_of(", \t");
+    if (rest.substr(0, end) == name) {
+      return 1;
+    }
+    rest.remove_prefix(end == std::string_view::npos ? rest.size() : end + 1);
+  }
+  return 0;
+}
+
 int QeloCgiIsTokenEnable(QeloCgiContext*) {
   return Settings().TokenEnabled() ? 1 : 0;
 }

@@ -26,6 +26,7 @@ static void serve(int argc, char** argv) {
 }
 
 int main(int argc, char** argv) {
+  QELO::WebEntry::GuardProcess();
   if (chdir(QELO::Paths::kDescriptionDir) != 0) {
     std::perror(QELO::Paths::kDescriptionDir);
     return 1;

@@ -11,6 +11,8 @@ import pytest
 
 sys.path.insert(0, str(Path(__file__).with_name("support")))
 
+os.umask(0o022)  # what others may write is not loaded
+
 from client import Client
 from webserver import SOURCE, WebServer
 

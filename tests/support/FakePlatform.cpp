@@ -240,6 +240,10 @@ unsigned int QeloCgiUIDGet(const char* sessionId, const char* user) {
   return fake().uid;
 }
 
+int QeloCgiKeepsVariable(const char* name) {
+  return fake().keptVariable == name ? 1 : 0;
+}
+
 int QeloCgiDetectAndDecryptParamLine(char* line) {
   note("QeloCgiDetectAndDecryptParamLine", line);
   return fake().detectResult;

@@ -60,6 +60,8 @@ struct FakePlatform {
   int aesKeyResult = -1;
   std::function<bool(const std::string&, const std::string&, std::string&)> decryptAES;
 
+  std::string keptVariable;  ///< the one that a setting adds to the environment
+
   // Login service
   int loginAttempt = 0;
   int passwordCheck = 0;

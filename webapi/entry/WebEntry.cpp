@@ -12,6 +12,7 @@
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
 #include "webapi/base/MemoryBound.h"
+#include "webapi/entry/ProcessGuard.h"
 #include "webapi/entry/intake/Intake.h"
 #include "webapi/entry/intake/UnreadBody.h"
 #include "webapi/entry/output/AnswerText.h"
@@ -136,6 +137,11 @@ void WebEntry::Serve() {
   } else {
     Process(Request(), Response());
   }
+}
+
+void WebEntry::GuardProcess() {
+  CloseInheritedDescriptors();
+  CleanEnvironment();
 }
 
 bool WebEntry::Run(const Json::Value&) {

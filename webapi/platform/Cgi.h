@@ -30,6 +30,9 @@ WEBAPI_API int QeloCgiLoadInCookies(QeloCgiContext* context);
 WEBAPI_API const char* QeloCgiGetLang(QeloCgiContext* context);
 /// 1 when sessions that come by cookie need the anti-forgery token, else 0.
 WEBAPI_API int QeloCgiIsTokenEnable(QeloCgiContext* context);
+/// Whether the host's settings let a CGI program keep this variable of its environment, beyond
+/// those that it needs. @return 1 yes, 0 no
+WEBAPI_API int QeloCgiKeepsVariable(const char* name);
 /// The client's address. @return 0 on success
 WEBAPI_API int QeloCgiGetRemoteIP(char* address, int size);
 /// Checks the login session of the context's cookie "id" and counts the use, unless it is to be

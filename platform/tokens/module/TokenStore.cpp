@@ -11,6 +11,7 @@
 #include <memory>
 
 #include "platform/base/Secrets.h"
+#include "webapi/base/OwnFile.h"
 #include "webapi/base/UniqueFd.h"
 
 namespace QELO::Platform {
@@ -73,6 +74,10 @@ bool TokenStore::Open(const char* path, bool create, FindUid findUid) {
   }
   if (missing_) {
     error_ = strerror(errno);
+    return false;
+  }
+  if (OthersMayChange(path)) {
+    error_ = "others may write it or its directory";
     return false;
   }
   if (sqlite3_open_v2(path, &database_, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, nullptr) !=

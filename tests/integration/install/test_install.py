@@ -163,6 +163,20 @@ def test_InstalledPrograms_NameTheirLibrariesByAbsolutePaths(prefix):
         assert all(path.startswith("/") for paths in runpath for path in paths.split(":"))
 
 
+def test_Install_IsHardened(prefix):
+    """On the host, where the program has root's rights, without being asked to."""
+    libraries = library_dir(prefix)
+    files = [prefix / "libexec/webapi/entry.cgi", libraries / "libwebapi-ARDO5.so",
+             *libraries.glob("webapi/*/*.so")]
+    assert len(files) > 5
+    for file in files:
+        assert re.search(r"\bNOW\b", run("readelf", "-d", file)), file
+        assert "GNU_RELRO" in run("readelf", "-l", file), file
+    assert "__stack_chk_fail" in run("nm", "-D", libraries / "libwebapi-ARDO5.so")
+    flags = (BUILD / "host" / "CMakeCache.txt").read_text()
+    assert "WEBAPI_HARDENED:BOOL=ON" in flags
+
+
 @pytest.mark.parametrize("build", [build_with_cmake, build_with_pkg_config])
 def test_ApiLibrary_BuiltOutside_HasItsTable(prefix, outside, build):
     library = build(prefix, outside)

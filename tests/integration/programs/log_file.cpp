@@ -5,8 +5,10 @@
 #include <cstdio>
 #include <cstdlib>
 
+/// Read at once, since a program may drop the variable.
+static const char* const path = getenv("LOG_FILE");
+
 static void add(const char* format, va_list args) {
-  const char* path = getenv("LOG_FILE");
   FILE* file = path != nullptr ? fopen(path, "ae") : nullptr;
   if (file != nullptr) {
     vfprintf(file, format, args);

@@ -9,6 +9,7 @@
 #include "webapi/WebAPIError.h"
 #include "webapi/base/DescriptionFile.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/OwnFile.h"
 #include "webapi/json/Fault.h"
 #include "webapi/json/Literal.h"
 #include "webapi/platform/Core.h"
@@ -38,13 +39,22 @@ bool takesMembers(const Json::Value& value) {
 
 void Catalogue::ReadLibDef(Json::Value& libDef) {
   Json::Value defaults;
-  if (!WebAPIUtil::ReadJsonFile(Paths::kLibDef, defaults)) {
+  if (!ReadFile(Paths::kLibDef, defaults)) {
     logFault(Paths::kLibDef);
   } else if (!defaults.isObject()) {
     WEBAPI_LOG("APIRunner.cpp", "%s: it is no object", Paths::kLibDef);
   } else {
     libDef.swap(defaults);
   }
+}
+
+bool Catalogue::ReadFile(const std::string& path, Json::Value& content) {
+  if (OthersMayChange(path)) {
+    WEBAPI_LOG("APIRunner.cpp", "refused to read %s: others may write it or its directory",
+               LogText(path).c_str());
+    return false;
+  }
+  return WebAPIUtil::ReadJsonFile(path, content);
 }
 
 bool Catalogue::CheckLibDescription(const Json::Value& description) {
@@ -90,7 +100,7 @@ bool Catalogue::InitLibDesc(Json::Value& target) const {
   }
   for (size_t i = 0; i < files.gl_pathc; ++i) {
     Json::Value file;
-    if (WebAPIUtil::ReadJsonFile(files.gl_pathv[i], file)) {
+    if (ReadFile(files.gl_pathv[i], file)) {
       AddDescriptions(target, file);
     } else {
       logFault(files.gl_pathv[i]);
@@ -115,7 +125,7 @@ bool Catalogue::InitLibDesc(Json::Value& target, const std::string& api) const {
   }
   errno = 0;
   Json::Value file;
-  if (!WebAPIUtil::ReadJsonFile(path, file)) {
+  if (!ReadFile(path, file)) {
     WEBAPI_LOG("APIRunner.cpp", "WebAPI description file %s is not valid", LogText(path).c_str());
     logFault(path);
     return false;

@@ -22,6 +22,9 @@ class Catalogue {
   /// be used, which is logged.
   static void ReadLibDef(Json::Value& libDef);
 
+  /// Reads a file of descriptions or defaults. One that others may change is refused, which is
+  /// logged: it says with whose rights methods run.
+  static bool ReadFile(const std::string& path, Json::Value& content);
   static bool CheckLibDescription(const Json::Value& description);
   Json::Value& ApplyLibDef(Json::Value& description) const;
   bool InitLibDesc(Json::Value& target) const;

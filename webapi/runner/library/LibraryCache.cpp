@@ -5,6 +5,7 @@
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/OwnFile.h"
 #include "webapi/runner/execution/Fence.h"
 
 namespace QELO {
@@ -54,6 +55,12 @@ bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
   if (cached != libraries_.end()) {
     *handle = cached->second;
     return true;
+  }
+  // A name without a directory is looked for where the system keeps its own.
+  if (path.find('/') != std::string::npos && OthersMayChange(path)) {
+    WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", path.c_str(),
+               "others may write it or its directory");
+    return false;
   }
   void* opened = load(path);
   if (opened == nullptr) {

@@ -244,6 +244,15 @@ TEST_F(AccessTokens, BrokenDatabaseCannotBeAsked) {
   EXPECT_EQ(SyslogCapture::Count("cannot check an access token [file is not a database]"), 1);
 }
 
+TEST_F(AccessTokens, DatabaseThatOthersMayWriteCannotBeAsked) {
+  const std::string token = Create();
+  ASSERT_EQ(chmod(Database().c_str(), 0620), 0);
+  EXPECT_EQ(Grant(token), -4);
+  EXPECT_EQ(
+      SyslogCapture::Count("cannot check an access token [others may write it or its directory]"),
+      1);
+}
+
 TEST_F(AccessTokens, EmptyDatabaseCannotBeAsked) {
   Write("var/lib/webapi/tokens.db", "");
   EXPECT_EQ(Grant(std::string(43, 'a')), -4);

@@ -95,6 +95,22 @@ TEST_F(LibraryLoading, MissingFileIsLoggedWithItsPath) {
   EXPECT_EQ(SyslogCapture::Count("cannot open library: /no/such.so. error = "), 1);
 }
 
+TEST_F(LibraryLoading, LibraryThatOthersMayWriteIsRefused) {
+  namespace fs = std::filesystem;
+  const fs::path copy = directory / "copy.so";
+  fs::copy_file(Plugin("state"), copy);
+  fs::permissions(copy, fs::perms::group_write, fs::perm_options::add);
+  EXPECT_FALSE(Open(copy.string()));
+  EXPECT_EQ(SyslogCapture::Count("cannot open library: " + copy.string() +
+                                 ". error = others may write it or its directory"),
+            1);
+  fs::permissions(copy, fs::perms::group_write, fs::perm_options::remove);
+  fs::permissions(directory, fs::perms::others_write, fs::perm_options::add);
+  EXPECT_FALSE(Open(copy.string()));
+  fs::permissions(directory, fs::perms::others_write, fs::perm_options::remove);
+  EXPECT_TRUE(Open(copy.string()));
+}
+
 TEST_F(LibraryLoading, OnePathIsOpenedOnce) {
   const std::string copy = (directory / "copy.so").string();
   std::filesystem::copy_file(Plugin("state"), copy);
