@@ -3,6 +3,10 @@
 
 include(CMakePackageConfigHelpers)
 
+# Files in a directory that others may write are not believed, whatever the umask is.
+set(CMAKE_INSTALL_DEFAULT_DIRECTORY_PERMISSIONS OWNER_READ OWNER_WRITE OWNER_EXECUTE
+    GROUP_READ GROUP_EXECUTE WORLD_READ WORLD_EXECUTE)
+
 set(webapi_package_dir ${CMAKE_INSTALL_LIBDIR}/cmake/webapi)
 
 # Programs and libraries find each other by an absolute path, which a set-user-id program may use,
@@ -14,7 +18,26 @@ if(NOT CMAKE_INSTALL_FULL_LIBDIR IN_LIST CMAKE_PLATFORM_IMPLICIT_LINK_DIRECTORIE
 endif()
 
 install(TARGETS webapi EXPORT webapi-targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
+# Who may start the CGI program, and that it takes root's rights. Where no group was configured, a
+# program that is replaced hands on what it had, so that an upgrade locks nobody out.
+set(webapi_entry "\$ENV{DESTDIR}${CMAKE_INSTALL_FULL_LIBEXECDIR}/webapi/entry.cgi")
+install(CODE "
+  set(webapi_group [[${WEBAPI_CGI_GROUP}]])
+  execute_process(COMMAND stat -c %a:%g \"${webapi_entry}\"
+                  OUTPUT_VARIABLE webapi_before ERROR_QUIET OUTPUT_STRIP_TRAILING_WHITESPACE)
+  if(NOT webapi_group AND webapi_before MATCHES \"^4750:([0-9]+)\$\")
+    set(webapi_group \${CMAKE_MATCH_1})
+  endif()")
 install(TARGETS entry.cgi RUNTIME DESTINATION ${CMAKE_INSTALL_LIBEXECDIR}/webapi)
+install(CODE "
+  if(webapi_group)
+    message(STATUS \"Set-user-id for the group \${webapi_group}: ${webapi_entry}\")
+    execute_process(COMMAND chgrp \${webapi_group} \"${webapi_entry}\"
+                    COMMAND_ERROR_IS_FATAL ANY)
+    execute_process(COMMAND chmod 4750 \"${webapi_entry}\" COMMAND_ERROR_IS_FATAL ANY)
+  else()
+    message(STATUS \"No web server may use it yet (-DWEBAPI_CGI_GROUP): ${webapi_entry}\")
+  endif()")
 install(DIRECTORY include/webapi DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}
         FILES_MATCHING PATTERN *.h)
 
@@ -33,9 +56,11 @@ install(FILES ${CMAKE_BINARY_DIR}/webapi-ARDO5.pc
         DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
 
 # Descriptions stand where entry.cgi looks, whatever the installation prefix is.
-install(DIRECTORY ${WEBAPI_DESCRIPTION_DIR}/
-        DESTINATION ${WEBAPI_ROOT_PREFIX}/usr/qelo/qeloman/webapi
-        FILES_MATCHING PATTERN *.lib PATTERN lib.def)
+set(webapi_installed_descriptions ${WEBAPI_ROOT_PREFIX}/usr/qelo/qeloman/webapi)
+set(webapi_shipped_descriptions ${CMAKE_INSTALL_FULL_LIBDIR}/webapi/descriptions)
+configure_file(cmake/InstallDescriptions.cmake.in ${CMAKE_BINARY_DIR}/InstallDescriptions.cmake
+               @ONLY)
+install(SCRIPT ${CMAKE_BINARY_DIR}/InstallDescriptions.cmake)
 # Users' processes add their records of background tasks here, and none of them could make it.
 set(webapi_task_dir ${WEBAPI_ROOT_PREFIX}/var/lib/webapi/tasks)
 install(DIRECTORY DESTINATION ${webapi_task_dir})

@@ -95,8 +95,12 @@ SessionStore::Result SessionStore::Read(const std::string& id, Session& session)
   if (!isSecretText(id)) {
     return Result::kMalformed;
   }
+  if (!dir_ && dirError_ == ENOENT) {
+    return Result::kAbsent;  // nobody has ever logged in
+  }
   if (!dir_) {
-    return dirError_ == ENOENT ? Result::kAbsent : Result::kBroken;
+    WEBAPI_LOG(kSource, "cannot use %s [%s]", Paths::kSessionDir, strerror(dirError_));
+    return Result::kBroken;
   }
   UniqueFd file;
   struct stat info {};

@@ -1,6 +1,7 @@
 """What is installed on a host serves, and API libraries are built against it outside of this tree."""
 
 import ctypes
+import grp
 import json
 import os
 import re
@@ -140,6 +141,55 @@ def test_Install_BelowAnotherPrefix_IsRefusedAndWritesNothing(stage, tmp_path):
 def test_Install_MakesTheDirectoryOfTaskRecords(stage):
     """Everybody may add to it, nobody take away another's."""
     assert (stage / "var/lib/webapi/tasks").stat().st_mode & 0o7777 == 0o1733
+
+
+def install_below(stage):
+    return run("cmake", "--install", BUILD / "host", env={**os.environ, "DESTDIR": str(stage)})
+
+
+def test_Install_Again_KeepsWhatAnAdministratorChanged(stage, tmp_path):
+    install_below(tmp_path)
+    descriptions = tmp_path / "usr/qelo/qeloman/webapi"
+    shipped = library_dir(tmp_path / "usr/local") / "webapi" / "descriptions"
+    names = {file.name for file in descriptions.iterdir()}
+    assert {file.name for file in shipped.iterdir()} == names
+    new = (descriptions / "lib.def").read_text()
+    (descriptions / "lib.def").write_text("{}")
+    removed = descriptions / "QELO.Work.Checksum.lib"
+    removed.unlink()
+    # As an older version shipped it, and nobody changed it.
+    for folder in (descriptions, shipped):
+        (folder / "QELO.Host.Info.lib").write_text('{"old": {}}')
+    told = install_below(tmp_path)
+    assert (descriptions / "lib.def").read_text() == "{}"
+    assert (descriptions / "lib.def.new").read_text() == new
+    assert str(descriptions / "lib.def.new") in told
+    assert not removed.exists()
+    assert "old" not in (descriptions / "QELO.Host.Info.lib").read_text()
+    assert {file.name for file in descriptions.iterdir()} == names - {removed.name} | {"lib.def.new"}
+
+
+@needs_root
+def test_Install_SetsTheRightsOfTheCgiProgram(stage, tmp_path):
+    """By the configured group; without one, what the program had stays."""
+    program = tmp_path / "usr/local/libexec/webapi/entry.cgi"
+    rights = lambda: (program.stat().st_gid, program.stat().st_mode & 0o7777)
+    assert "-DWEBAPI_CGI_GROUP" in install_below(tmp_path)
+    assert rights()[1] == 0o755
+    try:
+        run("cmake", "-S", SOURCE, "-B", BUILD / "host", "-DWEBAPI_CGI_GROUP=www-data")
+        install_below(tmp_path)
+    finally:
+        run("cmake", "-S", SOURCE, "-B", BUILD / "host", "-DWEBAPI_CGI_GROUP=")
+    group = grp.getgrnam("www-data").gr_gid
+    assert rights() == (group, 0o4750)
+    program.unlink()
+    install_below(tmp_path)
+    os.chown(program, 0, group)
+    program.chmod(0o4750)
+    os.utime(program, (0, 0))  # another one than is to be installed
+    install_below(tmp_path)
+    assert rights() == (group, 0o4750)
 
 
 def test_Install_NamesNoPathOfTheBuild(stage):

@@ -3,6 +3,7 @@
 #include <cstring>
 #include <filesystem>
 
+#include "tests/support/SyslogCapture.h"
 #include "tests/unit/platform/login/SessionFixture.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/platform/Cgi.h"
@@ -116,6 +117,9 @@ TEST_F(Authorization, DirectoryThatOthersMayUseIsMinusThree) {
   const Ticket ticket = Create();
   ASSERT_EQ(chmod(Path("run/webapi/sessions").c_str(), 0770), 0);
   EXPECT_EQ(Check(ticket.id), -3);
+  EXPECT_EQ(SyslogCapture::Count("cannot use " + Path("run/webapi/sessions") +
+                                 " [Operation not permitted]"),
+            1);
 }
 
 TEST_F(Authorization, UserWhoIsGoneIsMinusFive) {
