@@ -1,4 +1,6 @@
-// A well-behaved library that answers which descriptors and variables of the environment it sees.
+// Answers which descriptors and variables of the environment it sees.
+//
+// Tests: test_surroundings.py
 
 #include <dirent.h>
 #include <unistd.h>
