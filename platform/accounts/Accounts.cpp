@@ -21,29 +21,29 @@ bool isBarredFromLogin(const Account& account) {
   return account.name == kWorkingAccount || shell == "nologin" || shell == "false";
 }
 
-Standing standingOf(const Account& account) {
+Usability usabilityOf(const Account& account) {
   ShadowEntry entry;
   if (findShadow(account.name, entry) == Lookup::kFailed) {
-    return Standing::kUnknown;
+    return Usability::kUnknown;
   }
   if (entry.HasExpired()) {
-    return Standing::kExpired;
+    return Usability::kExpired;
   }
   if (isBarredFromLogin(account)) {
-    return Standing::kBarred;
+    return Usability::kBarred;
   }
-  return entry.IsLocked() ? Standing::kLocked : Standing::kGood;
+  return entry.IsLocked() ? Usability::kLocked : Usability::kGood;
 }
 
-const char* nameOf(Standing standing) {
-  switch (standing) {
-    case Standing::kGood:
+const char* usabilityName(Usability usability) {
+  switch (usability) {
+    case Usability::kGood:
       return "good";
-    case Standing::kBarred:
+    case Usability::kBarred:
       return "not for logins";
-    case Standing::kLocked:
+    case Usability::kLocked:
       return "locked";
-    case Standing::kExpired:
+    case Usability::kExpired:
       return "expired";
     default:
       return "not readable";
@@ -54,7 +54,7 @@ const char* nameOf(Standing standing) {
 
 using QELO::Platform::Account;
 using QELO::Platform::Lookup;
-using QELO::Platform::Standing;
+using QELO::Platform::Usability;
 
 extern "C" {
 
@@ -81,11 +81,11 @@ const char* QELOUserStandingGet(const char* user) {
   Account account;
   switch (QELO::Platform::findAccount(user, account)) {
     case Lookup::kFound:
-      return QELO::Platform::nameOf(standingOf(account));
+      return QELO::Platform::usabilityName(usabilityOf(account));
     case Lookup::kAbsent:
       return nullptr;
     default:
-      return QELO::Platform::nameOf(Standing::kUnknown);
+      return QELO::Platform::usabilityName(Usability::kUnknown);
   }
 }
 

@@ -16,7 +16,7 @@ inline constexpr char kWorkingAccount[] = "system";
 bool isBarredFromLogin(const Account& account);
 
 /// Whether what an account was given before, a session or a token, may still be used.
-enum class Standing {
+enum class Usability {
   kGood,
   kBarred,  ///< nobody logs in to it
   kLocked,  ///< by its administrator
@@ -25,8 +25,8 @@ enum class Standing {
 };
 
 /// What the host's own files say. A password that must be changed keeps from logging in alone.
-Standing standingOf(const Account& account);
+Usability usabilityOf(const Account& account);
 /// "locked" for kLocked, and so on, for messages.
-const char* nameOf(Standing standing);
+const char* usabilityName(Usability usability);
 
 }  // namespace QELO::Platform

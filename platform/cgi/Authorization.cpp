@@ -37,7 +37,7 @@ int checkUser(const Session& session) {
   if (lookup == Lookup::kAbsent || account.uid != session.uid) {
     return kNoSuchSession;
   }
-  return standingOf(account) == Standing::kGood ? 0 : kRefused;
+  return usabilityOf(account) == Usability::kGood ? 0 : kRefused;
 }
 
 /// @return 0 when the session exists and its user may use it

@@ -22,9 +22,9 @@ bool isUsable(const char* user, uid_t uid, bool isService) {
   if (findAccount(user, account) != Lookup::kFound || account.uid != uid) {
     return false;
   }
-  const Standing standing = standingOf(account);
-  return isService ? standing != Standing::kExpired && standing != Standing::kUnknown
-                   : standing == Standing::kGood;
+  const Usability usability = usabilityOf(account);
+  return isService ? usability != Usability::kExpired && usability != Usability::kUnknown
+                   : usability == Usability::kGood;
 }
 
 }  // namespace
