@@ -32,26 +32,24 @@ struct Outcome {
 
 /// One line in the form that packaging/fail2ban reads. What the client chose stands last.
 void tell(const Outcome& outcome, const std::string& client, const std::string& account) {
-  const std::string from = client.empty() ? "unknown" : LogText(client);
-  const char* address = from.c_str();
-  const char* reason = outcome.reason.c_str();
-  const std::string name = LogText(account);
+  const std::string address = client.empty() ? "unknown" : client;
+  const std::string& reason = outcome.reason;
   switch (outcome.result) {
     case LoginSession::LOGIN_OK:
       syslog(LOG_AUTH | LOG_INFO, "%s:%d login accepted from %s: %s; account [%s]", kSource,
-             __LINE__, address, reason, name.c_str());
+             __LINE__, LogText(address).c_str(), LogText(reason).c_str(), LogText(account).c_str());
       return;
     case LoginSession::LOGIN_WRONG:
       syslog(LOG_AUTH | LOG_NOTICE, "%s:%d login failed from %s: %s; account [%s]", kSource,
-             __LINE__, address, reason, name.c_str());
+             __LINE__, LogText(address).c_str(), LogText(reason).c_str(), LogText(account).c_str());
       return;
     case LoginSession::LOGIN_FAILED:
       syslog(LOG_AUTH | LOG_ERR, "%s:%d login not possible from %s: %s; account [%s]", kSource,
-             __LINE__, address, reason, name.c_str());
+             __LINE__, LogText(address).c_str(), LogText(reason).c_str(), LogText(account).c_str());
       return;
     default:
       syslog(LOG_AUTH | LOG_NOTICE, "%s:%d login refused from %s: %s; account [%s]", kSource,
-             __LINE__, address, reason, name.c_str());
+             __LINE__, LogText(address).c_str(), LogText(reason).c_str(), LogText(account).c_str());
   }
 }
 

@@ -58,7 +58,7 @@ bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
   }
   // A name without a directory is looked for where the system keeps its own.
   if (path.find('/') != std::string::npos && OthersMayChange(path)) {
-    WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", path.c_str(),
+    WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", LogText(path).c_str(),
                "others may write it or its directory");
     return false;
   }
