@@ -7,6 +7,7 @@
 #include "tests/support/SyslogCapture.h"
 #include "tests/unit/model/request/Fixture.h"
 #include "webapi/APIResponse.h"
+#include "webapi/base/LogText.h"
 
 using namespace QELO;
 
@@ -75,9 +76,8 @@ TEST_F(CookieAdding, RefusesOtherCharactersInNamesWithALogLine) {
     EXPECT_FALSE(response_.AddCookie(name, "x", "/")) << name;
     ASSERT_EQ(SyslogCapture::Messages().size(), 1u);
     EXPECT_EQ(SyslogCapture::Messages()[0].priority, 3);
-    EXPECT_EQ(
-        lineAsN(SyslogCapture::Messages()[0].text),
-        std::string("APIResponse.cpp(N)AddCookie: key[") + name + "] contains invalid character");
+    EXPECT_EQ(lineAsN(SyslogCapture::Messages()[0].text),
+              "APIResponse.cpp(N)AddCookie: key[" + LogText(name) + "] contains invalid character");
   }
   EXPECT_EQ(response_.GetCookies(), json("[]"));
 }
