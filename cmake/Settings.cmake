@@ -28,15 +28,9 @@ else()
   add_link_options(-Wl,-z,lazy -Wl,-z,norelro)
 endif()
 
-if(WEBAPI_SANITIZE)
-  add_compile_options(-fsanitize=${WEBAPI_SANITIZE} -fno-omit-frame-pointer
-                      -fno-sanitize-recover=all)
-  add_link_options(-fsanitize=${WEBAPI_SANITIZE})
-else()
-  # What crt files name in case that something is there is settled when linking: at each start it
-  # was looked for in every library in vain.
-  add_link_options(-Wl,--no-undefined -Wl,-z,nodynamic-undefined-weak)
-endif()
+# What crt files name in case that something is there is settled when linking: at each start it was
+# looked for in every library in vain.
+add_link_options(-Wl,--no-undefined -Wl,-z,nodynamic-undefined-weak)
 
 find_package(jsoncpp REQUIRED)
 find_package(Threads REQUIRED)
@@ -69,6 +63,16 @@ function(webapi_shared_library target)
   endif()
 endfunction()
 
+# webapi_sanitize(TARGET): built for the address and undefined-behaviour sanitizers, and only when it
+# is asked for. What the tests run under them has a twin, NAME_sanitized, in the same tree.
+function(webapi_sanitize target)
+  set(sanitizers -fsanitize=address,undefined)
+  target_compile_options(${target} PRIVATE ${sanitizers} -fno-omit-frame-pointer
+                         -fno-sanitize-recover=all -O1 -g1)
+  target_link_options(${target} PRIVATE ${sanitizers} -Wl,-z,undefs)
+  set_target_properties(${target} PROPERTIES EXCLUDE_FROM_ALL ON)
+endfunction()
+
 # webapi_folder(NAME FOLDER): the folder's sources, those below it too, as one OBJECT library, from which both the
 # shared library and the unit tests are linked.
 function(webapi_folder name folder)
@@ -77,7 +81,15 @@ function(webapi_folder name folder)
     file(WRITE ${CMAKE_BINARY_DIR}/empty.cpp "")
     set(sources ${CMAKE_BINARY_DIR}/empty.cpp)
   endif()
-  add_library(${name} OBJECT ${sources})
+  webapi_objects(${name} ${sources})
+  if(WEBAPI_TESTS)
+    webapi_objects(${name}_sanitized ${sources})
+    webapi_sanitize(${name}_sanitized)
+  endif()
+endfunction()
+
+function(webapi_objects name)
+  add_library(${name} OBJECT ${ARGN})
   target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR})
   target_compile_definitions(${name} PUBLIC WEBAPI_ROOT_PREFIX="${WEBAPI_ROOT_PREFIX}")
   target_link_libraries(${name} PUBLIC JsonCpp::JsonCpp)

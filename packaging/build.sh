@@ -14,8 +14,8 @@ show_progress() {
   [[ -z $shown ]] || printf '\r\033[K' >&2
 }
 
-# build_tree DIR [CMAKE-OPTION...]: builds into DIR with DIR/root as the private root. Quiet unless
-# it fails, but for the progress on a terminal.
+# build_tree DIR [CMAKE-OPTION...]: builds BUILD_TARGET, or all, into DIR with DIR/root as the
+# private root. Quiet unless it fails, but for the progress on a terminal.
 build_tree() {
   local dir=$1
   shift
@@ -29,7 +29,7 @@ build_tree() {
   fi
   # Not in the background, where Ctrl-C would not reach it.
   if ! (set -o pipefail
-        cmake --build "$dir" -j "$(nproc)" 2>&1 | tee "$dir/build.log" | show_progress); then
+        cmake --build "$dir" --target "${BUILD_TARGET:-all}" -j "$(nproc)" 2>&1 | tee "$dir/build.log" | show_progress); then
     grep -E 'error|Error|undefined' -A 3 "$dir/build.log" | head -n 60 >&2
     echo "The build failed; the whole log is $dir/build.log" >&2
     return 1

@@ -1,16 +1,26 @@
 # The platform's loadable modules: what needs a large library stands outside the common road.
 
-# webapi_platform_module(NAME SOURCES...): the module NAME.so in the module directory. The platform
-# loads no file that others may write, whatever the umask of the build was.
+# webapi_platform_module(NAME SOURCES... LIBRARIES...): the module NAME.so in the module directory.
+# The platform loads no file that others may write, whatever the umask of the build was.
 function(webapi_platform_module name)
-  add_library(module_${name} MODULE ${ARGN})
-  set_target_properties(module_${name} PROPERTIES PREFIX "" OUTPUT_NAME ${name}
-                        LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/modules)
-  target_include_directories(module_${name} PRIVATE ${PROJECT_SOURCE_DIR}/include
-                                                    ${PROJECT_SOURCE_DIR})
-  add_custom_command(TARGET module_${name} POST_BUILD
-    COMMAND chmod go-w ${CMAKE_BINARY_DIR}/modules $<TARGET_FILE:module_${name}>)
+  cmake_parse_arguments(PARSE_ARGV 1 module "" "" "SOURCES;LIBRARIES")
+  list(TRANSFORM module_SOURCES PREPEND ${PROJECT_SOURCE_DIR}/platform/)
+  webapi_module_library(module_${name} ${name} modules)
   add_dependencies(webapi_platform module_${name})
+  if(WEBAPI_TESTS)
+    webapi_module_library(module_${name}_sanitized ${name} modules-sanitized)
+    webapi_sanitize(module_${name}_sanitized)
+  endif()
+endfunction()
+
+function(webapi_module_library target file directory)
+  add_library(${target} MODULE ${module_SOURCES})
+  set_target_properties(${target} PROPERTIES PREFIX "" OUTPUT_NAME ${file}
+                        LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/${directory})
+  target_include_directories(${target} PRIVATE ${PROJECT_SOURCE_DIR}/include ${PROJECT_SOURCE_DIR})
+  target_link_libraries(${target} PRIVATE ${module_LIBRARIES})
+  add_custom_command(TARGET ${target} POST_BUILD
+    COMMAND chmod go-w ${CMAKE_BINARY_DIR}/${directory} $<TARGET_FILE:${target}>)
 endfunction()
 
 find_library(CRYPT_LIBRARY crypt REQUIRED)
@@ -21,28 +31,40 @@ endif()
 find_package(SQLite3 REQUIRED)
 find_package(OpenSSL REQUIRED COMPONENTS Crypto)
 
-webapi_platform_module(password_crypt login/module/PasswordCrypt.cpp base/Secrets.cpp)
-target_link_libraries(module_password_crypt PRIVATE ${CRYPT_LIBRARY})
+webapi_platform_module(password_crypt SOURCES login/module/PasswordCrypt.cpp base/Secrets.cpp
+                       LIBRARIES ${CRYPT_LIBRARY})
 
 if(PAM_LIBRARY)
-  webapi_platform_module(password_pam login/module/PasswordPam.cpp)
-  target_link_libraries(module_password_pam PRIVATE ${PAM_LIBRARY})
+  webapi_platform_module(password_pam SOURCES login/module/PasswordPam.cpp LIBRARIES ${PAM_LIBRARY})
 endif()
 
 # The token database is the administrators' program's too.
-add_library(webapi_token_store STATIC tokens/module/TokenStore.cpp base/Secrets.cpp)
-target_include_directories(webapi_token_store PUBLIC ${PROJECT_SOURCE_DIR}/include
-                                                     ${PROJECT_SOURCE_DIR})
-target_link_libraries(webapi_token_store PUBLIC SQLite::SQLite3 OpenSSL::Crypto)
+function(webapi_token_store twin)
+  add_library(webapi_token_store${twin} STATIC tokens/module/TokenStore.cpp base/Secrets.cpp)
+  target_include_directories(webapi_token_store${twin} PUBLIC ${PROJECT_SOURCE_DIR}/include
+                                                              ${PROJECT_SOURCE_DIR})
+  target_link_libraries(webapi_token_store${twin} PUBLIC SQLite::SQLite3 OpenSSL::Crypto)
+endfunction()
+webapi_token_store("")
+if(WEBAPI_TESTS)
+  webapi_token_store(_sanitized)
+  webapi_sanitize(webapi_token_store_sanitized)
+endif()
 
-webapi_platform_module(tokens tokens/module/TokenModule.cpp)
-target_link_libraries(module_tokens PRIVATE webapi_token_store)
+webapi_platform_module(tokens
+  SOURCES tokens/module/TokenModule.cpp tokens/module/TokenStore.cpp base/Secrets.cpp
+  LIBRARIES SQLite::SQLite3 OpenSSL::Crypto)
+webapi_platform_module(tasks
+  SOURCES tasks/module/TaskModule.cpp tasks/module/StoreConnection.cpp
+          tasks/module/StoreDirectory.cpp tasks/module/TaskClearing.cpp
+          tasks/module/TaskDatabase.cpp tasks/module/TaskSchema.cpp tasks/module/Patience.cpp
+          base/Secrets.cpp tasks/Id.cpp tasks/ProcessIdentity.cpp
+  LIBRARIES SQLite::SQLite3)
 
 if(WEBAPI_ROOT_PREFIX)
   set(password_module module_password_crypt)
 else()
   set(password_module module_password_pam)
 endif()
-install(TARGETS ${password_module} module_tokens
+install(TARGETS ${password_module} module_tokens module_tasks
         LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/modules)
-add_subdirectory(tasks/module)

@@ -7,6 +7,8 @@
 
 #include <cstdlib>
 
+#include "tests/support/Sanitizer.h"
+
 namespace QELO {
 namespace {
 
@@ -39,9 +41,9 @@ int inChild(Piece piece) {
 class MemoryBoundTest : public testing::Test {
  protected:
   void SetUp() override {
-#ifdef __SANITIZE_ADDRESS__
-    GTEST_SKIP() << "the sanitizer uses more than any bound";
-#endif
+    if (IsSanitized()) {
+      GTEST_SKIP() << "the sanitizer uses more than any bound";
+    }
   }
 };
 

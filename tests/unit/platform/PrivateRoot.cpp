@@ -12,6 +12,7 @@
 
 #include "platform/base/Paths.h"
 #include "tests/support/SyslogCapture.h"
+#include "tests/unit/platform/BuiltModules.h"
 
 namespace fs = std::filesystem;
 
@@ -40,7 +41,7 @@ const std::string& pristineRoot() {
     EXPECT_EQ(run(std::string(PRIVATE_ROOT_SCRIPT) + " '" + root + "' > /dev/null"), 0);
     fs::create_directory(root + "/modules");
     for (const char* module : {"password_crypt.so", "tokens.so"}) {
-      fs::copy_file(fs::path(BUILT_MODULE_DIR) / module, fs::path(root) / "modules" / module);
+      fs::copy_file(fs::path(kBuiltModuleDir) / module, fs::path(root) / "modules" / module);
     }
     return root;
   }();

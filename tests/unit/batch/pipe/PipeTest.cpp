@@ -18,6 +18,7 @@
 #include <utility>
 #include <vector>
 
+#include "tests/support/Sanitizer.h"
 #include "tests/support/SyslogCapture.h"
 #include "tests/unit/batch/ChildProcess.h"
 #include "webapi/JsonHelper.h"
@@ -153,9 +154,9 @@ TEST_F(PipeMessage, TextThatIsNoJsonIsRefused) {
 }
 
 TEST_F(PipeMessage, LengthBeyondMemoryIsLogged) {
-#ifdef __SANITIZE_ADDRESS__
-  GTEST_SKIP() << "the sanitizer needs the address space that this test takes away";
-#endif
+  if (IsSanitized()) {
+    GTEST_SKIP() << "the sanitizer needs the address space that this test takes away";
+  }
   const int status = inChild([&] {
     const rlimit limit{1UL << 30, 1UL << 30};
     ASSERT_EQ(setrlimit(RLIMIT_AS, &limit), 0);

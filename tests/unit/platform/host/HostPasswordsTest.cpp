@@ -11,6 +11,7 @@
 #include "platform/login/Passwords.h"
 #include "platform/login/module/PasswordPam.h"
 #include "tests/support/SyslogCapture.h"
+#include "tests/unit/platform/BuiltModules.h"
 
 namespace {
 
@@ -94,7 +95,7 @@ TEST_F(HostPasswords, ModuleThatOthersMayWriteCannotCheck) {
 class PamModule : public testing::Test {
  protected:
   void SetUp() override {
-    const std::string path = std::string(BUILT_MODULE_DIR) + "/" + kPasswordPamModule;
+    const std::string path = std::string(kBuiltModuleDir) + "/" + kPasswordPamModule;
     if (!std::filesystem::exists(path)) {
       GTEST_SKIP() << "built without PAM";
     }

@@ -10,6 +10,7 @@
 #include <filesystem>
 
 #include "platform/base/Paths.h"
+#include "tests/unit/platform/BuiltModules.h"
 #include "webapi/JsonHelper.h"
 
 namespace fs = std::filesystem;
@@ -17,7 +18,7 @@ using namespace QELO;
 
 void TaskTest::SetUp() {
   PrivateRoot::SetUp();
-  fs::copy_file(fs::path(BUILT_MODULE_DIR) / "tasks.so", fs::path(Path("modules")) / "tasks.so",
+  fs::copy_file(fs::path(kBuiltModuleDir) / "tasks.so", fs::path(Path("modules")) / "tasks.so",
                 fs::copy_options::overwrite_existing);
   fs::remove_all(Paths::kTaskDir);  // the places that root and the working account have there
   fs::create_directories(Paths::kTaskDir);
