@@ -33,6 +33,8 @@ constexpr int kAddressSize = 65;  ///< bytes of a remote address with its NUL
 constexpr size_t kMostMemory = 256 << 20;
 /// Bytes of a credential that comes as a parameter: copies of it go into cookies and environment.
 constexpr long kLongestCredential = 4096;
+/// Bytes of the name of an API or method, which each step takes copies of.
+constexpr long kLongestName = 1 << 20;
 constexpr char kSessionCookie[] = "id=";
 constexpr char kOldSessionName[] = "abandoned";
 constexpr char kTokenVariable[] = "qeloAccessToken";
@@ -43,12 +45,16 @@ struct Credential {
   std::string value;
 };
 
-/// @return false when the parameter is longer than kLongestCredential
-bool readCredential(const APIRequest& request, const char* name, Credential& credential) {
+bool isLonger(const APIRequest& request, const char* name, long limit) {
   const char* begin = nullptr;
   const char* end = nullptr;
   const Json::Value& sent = request.GetParamRef(name, Json::Value::nullSingleton());
-  if (sent.getString(&begin, &end) && end - begin > kLongestCredential) {
+  return sent.getString(&begin, &end) && end - begin > limit;
+}
+
+/// @return false when the parameter is longer than kLongestCredential
+bool readCredential(const APIRequest& request, const char* name, Credential& credential) {
+  if (isLonger(request, name, kLongestCredential)) {
     return false;
   }
   const APIParameter<std::string> parameter =
@@ -160,10 +166,14 @@ bool WebEntry::Run(const Json::Value&) {
     });
   }
   MemoryBound::Lift();  // callbacks are methods' own
-  if (Response()->GetHttpdRestart()) {
-    Response()->SetCallbackFunc(RestartHttpd, nullptr);
-  }
-  return HandleCallback(Response());
+  bool isHandled = false;
+  guarded([&] {
+    if (Response()->GetHttpdRestart()) {
+      Response()->SetCallbackFunc(RestartHttpd, nullptr);
+    }
+    isHandled = HandleCallback(Response());
+  });
+  return isHandled;
 }
 
 bool WebEntry::Initialize(const Json::Value&) {
@@ -187,6 +197,10 @@ bool WebEntry::Initialize(const Json::Value&) {
     return false;
   }
   Request()->InitParam(std::move(params), false);
+  if (isLonger(*Request(), "api", kLongestName) || isLonger(*Request(), "method", kLongestName)) {
+    Response()->SetError(WEBAPI_ERR_BAD_REQUEST);
+    return false;
+  }
   return RewriteCredentials();
 }
 

@@ -62,6 +62,7 @@ void APIRunnerPrivate::SetArgs(int argc, char** argv) {
   if (argc < 1) {
     return;
   }
+  ForgetCallName();
   argv0_ = argv[0];
   argv0Length_ = static_cast<uint32_t>(strlen(argv[0]));
   if (origProcName.find("__") != std::string::npos) {

@@ -12,6 +12,7 @@ OPEN = "api=QELO.Test.Open&version=1&method=plain"
 MOST_VALUES = 50_000
 MOST_PARAMETERS = 10_000
 LONGEST_CREDENTIAL = 4_096
+LONGEST_NAME = 1 << 20
 MIB = 1024  # KiB
 
 
@@ -48,6 +49,13 @@ def test_ApiNameOfAMegabyte_LeavesAShortLogLine(logged):
     (line,) = [line for line in lines if "WebAPI AAA" in line]
     assert line.endswith(f"{'A' * 256}... (1048576 bytes) is not valid")
     assert max(map(len, lines)) < 512
+
+
+@pytest.mark.parametrize("name", ["api", "method"])
+def test_NameBeyondAMebibyte_IsRefusedUnread(logged, name):
+    names = {"api": "QELO.Test.Open", "method": "plain", name: "A" * (LONGEST_NAME + 1)}
+    answer, lines = logged(**names)
+    assert (code_of(answer), lines) == (101, [])
 
 
 def test_ApiNameWithLineBreaks_StaysOneLogLine(logged):

@@ -133,7 +133,7 @@ void CompoundHandler::PreloadLibs() {
   // A library's constructors are foreign code.
   const WorkingDirectory directory;
   const StandardStreams shut(true, true);
-  if (shut.IsShut()) {
+  if (directory.IsSaved() && shut.IsShut()) {
     PreloadLibs(*entries_, true);
   }
 }

@@ -99,6 +99,13 @@ Json::Value sessionOf(const APIRequest& caller) {
   return session;
 }
 
+/// Tells other programs of the system whom the process works for; nobody rather than somebody else.
+void setUserVariable(const std::string& user) {
+  if (setenv(kUserVariable, user.c_str(), 1) != 0) {
+    unsetenv(kUserVariable);
+  }
+}
+
 /// A session with nobody in it.
 Json::Value emptySessionOf(const APIRequest& caller) {
   Json::Value session(Json::objectValue);
@@ -220,7 +227,7 @@ void PermissionCheck::TurnTo(unsigned slot) {
     const Finding& shown = isKnown ? *next : unchecked_;
     caller_.InitSession(shown.session);
     caller_.SetCookie("id", shown.sessionId);
-    setenv(kUserVariable, caller_.GetLoginUserName().c_str(), 1);
+    setUserVariable(caller_.GetLoginUserName());
   }
   now_ = next;
 }
@@ -280,7 +287,7 @@ bool PermissionCheck::KeepsIdle(const CallName& call) {
 
 void PermissionCheck::FillSession(const std::string& user, const std::string& language,
                                   bool isAuthorized) {
-  setenv(kUserVariable, user.c_str(), 1);
+  setUserVariable(user);
   Json::Value session(Json::objectValue);
   session[Literal("username")] = user;
   session[Literal("isAdmin")] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;

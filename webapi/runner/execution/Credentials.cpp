@@ -85,7 +85,13 @@ bool Credentials::Save() {
 }
 
 bool Credentials::HaveChanged() const {
-  return geteuid() != user_.effective || getegid() != group_.effective;
+  Credentials now;
+  const auto differ = [](const Ids& left, const Ids& right) {
+    return left.real != right.real || left.effective != right.effective ||
+           left.saved != right.saved;
+  };
+  return !now.Save() || differ(now.user_, user_) || differ(now.group_, group_) ||
+         now.supplementary_ != supplementary_;
 }
 
 bool Credentials::GiveBack() const {

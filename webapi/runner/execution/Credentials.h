@@ -13,7 +13,7 @@ class Credentials {
  public:
   /// @return false when the ids cannot be read
   bool Save();
-  /// Whether the effective ids are no longer the saved ones.
+  /// Whether the ids or the supplementary groups are no longer the saved ones.
   bool HaveChanged() const;
   /// Sets the saved ids again, and the supplementary groups where they have changed; failures are
   /// logged. For the groups a process that is not root becomes root first: a call that runs later

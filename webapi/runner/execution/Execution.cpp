@@ -116,6 +116,11 @@ bool Execution::Run(const Json::Value& attributes) {
   // Loading is within the guards: a library's constructors are foreign code too. They end in
   // reverse order, streams before priority before directory.
   const WorkingDirectory directory;
+  if (!directory.IsSaved()) {
+    WEBAPI_LOG("APIRunner.cpp", "cannot keep the working directory. [%m]");
+    response_->SetError(WEBAPI_ERR_NO_ANSWER);
+    return false;
+  }
   Priority priority;
   const StandardStreams streams(!APIDescription::IsSet(attributes, "allowUpload"),
                                 !APIDescription::IsSet(attributes, "allowDownload"));

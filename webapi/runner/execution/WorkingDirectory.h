@@ -13,6 +13,10 @@ class WorkingDirectory {
   WorkingDirectory& operator=(const WorkingDirectory&) = delete;
   ~WorkingDirectory();
 
+  /// Whether there is a way back. Otherwise no foreign code may run: descriptions are looked up in
+  /// the working directory.
+  bool IsSaved() const { return directory_ >= 0; }
+
  private:
   int directory_;
   FileIdentity identity_;

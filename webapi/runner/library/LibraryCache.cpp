@@ -5,6 +5,7 @@
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/MemoryBound.h"
 #include "webapi/base/OwnFile.h"
 #include "webapi/runner/execution/Fence.h"
 
@@ -62,6 +63,7 @@ bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
                "others may write it or its directory");
     return false;
   }
+  MemoryBound::Lift();  // a library takes the memory that it needs
   void* opened = load(path);
   if (opened == nullptr) {
     WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", LogText(path).c_str(),

@@ -21,7 +21,7 @@ class CompoundTest : public RunnerTest {
  protected:
   void SetUp() override {
     RunnerTest::SetUp();
-    std::filesystem::permissions(directory, std::filesystem::perms::all);
+    std::filesystem::permissions(directory, static_cast<std::filesystem::perms>(0755));
     WriteLibDef("{}");
     DescribeEntries();
     WriteDescription(Listing("losing",

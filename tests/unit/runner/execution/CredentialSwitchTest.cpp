@@ -39,7 +39,7 @@ class CredentialSwitch : public RunnerTest {
 
   void SetUp() override {
     RunnerTest::SetUp();
-    std::filesystem::permissions(directory, std::filesystem::perms::all);
+    std::filesystem::permissions(directory, static_cast<std::filesystem::perms>(0755));
     platform->resetCredentials = [](const std::string&, bool keepPrivilege) {
       const uid_t other = static_cast<uid_t>(keepPrivilege ? -1 : kUser);
       return setgroups(0, nullptr) == 0 && setresgid(other, kUser, other) == 0 &&
@@ -66,7 +66,9 @@ class CredentialSwitch : public RunnerTest {
     const pid_t child = fork();
     if (child == 0) {
       const gid_t groups[] = {7, 8};
-      const bool good = setgroups(2, groups) == 0 && setresgid(ids[3], ids[4], ids[5]) == 0 &&
+      // Descriptions are written by the process, and taken from nobody else.
+      const bool good = chown(".", ids[1], ids[4]) == 0 && setgroups(2, groups) == 0 &&
+                        setresgid(ids[3], ids[4], ids[5]) == 0 &&
                         setresuid(ids[0], ids[1], ids[2]) == 0;
       _exit(good && body() ? 0 : 1);
     }

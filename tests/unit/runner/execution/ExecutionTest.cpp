@@ -301,7 +301,7 @@ class Unprivileged : public Execution {
   }
   void SetUp() override {
     Execution::SetUp();
-    std::filesystem::permissions(directory, std::filesystem::perms::all);
+    std::filesystem::permissions(directory, static_cast<std::filesystem::perms>(0755));
     WriteDescription(Description("state"));
     MakeRequest("QELO.Test.Call", 1, "run");
   }

@@ -145,18 +145,23 @@ TEST_F(Hardening, PriorityThatNobodyDescribesIsZero) {
 }
 
 TEST_F(Hardening, NoDescriptorLeftStopsTheCallAndKeepsTheStreams) {
-  EXPECT_TRUE(InChild([&] {
-    ProcessPlugin("state");  // everything is loaded
-    rlimit limit{};
-    getrlimit(RLIMIT_NOFILE, &limit);
-    limit.rlim_cur = static_cast<rlim_t>(open("/dev/null", O_RDONLY));
-    setrlimit(RLIMIT_NOFILE, &limit);
-    response->SetSuccess();
-    const bool called = runner->ProcessLib(request.get(), response.get());
-    return !called && response->GetError() == 117 && fcntl(0, F_GETFD) >= 0 &&
-           fcntl(1, F_GETFD) >= 0 &&
-           SyslogCapture::Count("cannot shut the standard streams. [") == 1;
-  }));
+  const std::pair<rlim_t, const char*> lacks[] = {{0, "cannot keep the working directory. ["},
+                                                  {1, "cannot shut the standard streams. ["}};
+  for (const auto& [left, message] : lacks) {
+    EXPECT_TRUE(InChild([&, free = left, said = message] {
+      ProcessPlugin("state");  // everything is loaded
+      rlimit limit{};
+      getrlimit(RLIMIT_NOFILE, &limit);
+      const int next = open("/dev/null", O_RDONLY);
+      limit.rlim_cur = static_cast<rlim_t>(next) + free;
+      close(next);
+      setrlimit(RLIMIT_NOFILE, &limit);
+      response->SetSuccess();
+      const bool called = runner->ProcessLib(request.get(), response.get());
+      return !called && response->GetError() == 117 && fcntl(0, F_GETFD) >= 0 &&
+             fcntl(1, F_GETFD) >= 0 && SyslogCapture::Count(said) == 1;
+    }));
+  }
 }
 
 TEST_F(Hardening, ClosedStandardDescriptorsStayClosed) {
