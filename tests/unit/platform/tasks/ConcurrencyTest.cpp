@@ -10,6 +10,7 @@
 #include <thread>
 #include <vector>
 
+#include "tests/support/Sanitizer.h"
 #include "tests/support/SyslogCapture.h"
 #include "tests/unit/platform/tasks/Fixture.h"
 #include "webapi/JsonHelper.h"
@@ -247,6 +248,9 @@ TEST_F(TaskConcurrency, ChildMadeBehindTheLibrarysBackIsRefusedTheConnection) {
 }
 
 TEST_F(TaskConcurrency, ThreadsMayUpdateWhileAnotherForks) {
+  if (IsSanitized()) {
+    GTEST_SKIP() << "the sanitizer's allocator is locked in what is forked beside threads";
+  }
   EXPECT_EQ(InChild([] {
               std::atomic<int> failed{0};
               std::atomic<bool> done{false};
