@@ -111,7 +111,7 @@ def has_processes(uid):
 def test_LimitOfProcesses_GivesTheRest117(serve):
     assert wait_for(lambda: not has_processes(account("alice")[0]), 20)
     compound = serve("/usr/bin/prlimit", "--nproc=40:40")
-    results = compound.results([entry("slow", ms=1000)] * 100, mode="parallel")
+    results = compound.results([entry("slow", ms=4000)] * 100, mode="parallel")
     codes = [code(result) for result in results]
     good = codes.count(0)
     assert 30 <= good < 40
