@@ -18,7 +18,7 @@ APIPollingPrivate::~APIPollingPrivate() = default;
 
 void APIPollingPrivate::SetUser(const std::string& user) {
   Json::Value init;
-  init["session"] = makeUserSession(user);
+  init["session"] = CallerSession::OfUser(user);
   ownRequest_ = std::make_unique<APIRequest>(init);
   request_ = ownRequest_.get();
 }

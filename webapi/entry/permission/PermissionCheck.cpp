@@ -17,6 +17,7 @@
 #include "webapi/entry/permission/SessionOrigin.h"
 #include "webapi/entry/permission/UserClass.h"
 #include "webapi/json/Literal.h"
+#include "webapi/model/request/CallerSession.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Token.h"
@@ -82,36 +83,11 @@ std::string optionOf(QeloCgiContext* context, const char* name, const char* def 
   return QeloCgiGetOption(context, name, value, kOptionSize) == 1 ? value : def;
 }
 
-/// What is known of a request's caller, in the form that a request takes it.
-Json::Value sessionOf(const APIRequest& caller) {
-  Json::Value session(Json::objectValue);
-  session["username"] = caller.GetLoginUserName();
-  session["isAdmin"] = caller.IsAdmin();
-  session["sessFile"] = caller.GetSessionFilePath();
-  session["isTimeout"] = caller.IsTimeout();
-  session["timeout"] = caller.GetTimeoutDuration();
-  session["isSkipCheckIP"] = caller.IsSkipCheckIP();
-  session["uiLang"] = caller.GetUILanguage();
-  session["app"] = caller.GetApplication();
-  session["webapi"] = caller.GetWebAPIPriv();
-  session["isAuthorized"] = caller.IsAuthorized();
-  session["tokenEnable"] = caller.IsTokenEnable();
-  return session;
-}
-
 /// Tells other programs of the system whom the process works for; nobody rather than somebody else.
 void setUserVariable(const std::string& user) {
   if (setenv(kUserVariable, user.c_str(), 1) != 0) {
     unsetenv(kUserVariable);
   }
-}
-
-/// A session with nobody in it.
-Json::Value emptySessionOf(const APIRequest& caller) {
-  Json::Value session(Json::objectValue);
-  session["uiLang"] = caller.GetUILanguage();
-  session["tokenEnable"] = caller.IsTokenEnable();
-  return session;
 }
 
 }  // namespace
@@ -143,7 +119,8 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
   }
   if (request != &caller_) {
     // A request within this one, which may still hold what the check before found.
-    request->InitSession(code == WEBAPI_ERR_NONE ? sessionOf(caller_) : emptySessionOf(caller_));
+    request->InitSession(code == WEBAPI_ERR_NONE ? CallerSession::Of(caller_).ToJson()
+                                                 : CallerSession::OfNobody(caller_));
     request->SetCookie("id", caller_.GetSessionID());
   }
   request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
@@ -168,7 +145,8 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
     return JsonHelper::member(record, "session").type() == Json::objectValue;
   };
   if (request != &caller_ || !hasSession()) {
-    request->InitSession(sessionOf(caller_));  // the caller's own holds already what was found
+    request->InitSession(
+        CallerSession::Of(caller_).ToJson());  // the caller's own holds already what was found
   }
   if (hasSession()) {
     record[Literal("session")][Literal("appPriv")] = JsonHelper::asString(appPriv);
@@ -220,7 +198,7 @@ void PermissionCheck::TurnTo(unsigned slot) {
     now_->sessionId = caller_.GetSessionID();
     const bool isKnown = KnownResult(slot).isInt();
     if (!isKnown) {
-      unchecked_.session = emptySessionOf(caller_);
+      unchecked_.session = CallerSession::OfNobody(caller_);
       QeloCgiInit("", context_);
       QeloCgiLoadInCookies(context_);
     }
@@ -288,20 +266,19 @@ bool PermissionCheck::KeepsIdle(const CallName& call) {
 void PermissionCheck::FillSession(const std::string& user, const std::string& language,
                                   bool isAuthorized) {
   setUserVariable(user);
-  Json::Value session(Json::objectValue);
-  session[Literal("username")] = user;
-  session[Literal("isAdmin")] = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
-  session[Literal("sessFile")] = optionOf(context_, "sessfile");
-  session[Literal("isTimeout")] = optionOf(context_, "istimeout") == "1";
-  session[Literal("timeout")] =
-      static_cast<Json::Int64>(strtol(optionOf(context_, "timeout", "0").c_str(), nullptr, 10));
-  session[Literal("isSkipCheckIP")] = optionOf(context_, "skipcheckip") == "1";
-  session[Literal("uiLang")] = language;
-  session[Literal("app")] = optionOf(context_, "app");
-  session[Literal("webapi")] = optionOf(context_, "webapi");
-  session[Literal("isAuthorized")] = isAuthorized;
-  session[Literal("tokenEnable")] = QeloCgiIsTokenEnable(context_) != 0;
-  caller_.InitSession(std::move(session));
+  CallerSession session;
+  session.username = user;
+  session.isAdmin = !user.empty() && QLIBGroupIsAdminGroupMem(user.c_str(), 0) == 1;
+  session.sessFile = optionOf(context_, "sessfile");
+  session.isTimeout = optionOf(context_, "istimeout") == "1";
+  session.timeout = strtol(optionOf(context_, "timeout", "0").c_str(), nullptr, 10);
+  session.isSkipCheckIP = optionOf(context_, "skipcheckip") == "1";
+  session.uiLang = language;
+  session.app = optionOf(context_, "app");
+  session.webapi = optionOf(context_, "webapi");
+  session.isAuthorized = isAuthorized;
+  session.tokenEnable = QeloCgiIsTokenEnable(context_) != 0;
+  caller_.InitSession(session.ToJson());
 }
 
 }  // namespace QELO

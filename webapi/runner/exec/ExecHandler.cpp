@@ -132,7 +132,7 @@ bool ExecHandler::CheckParams() {
 }
 
 void ExecHandler::PrepareReq() {
-  request_["session"] = makeUserSession(param_->GetRunner());
+  request_["session"] = CallerSession::OfUser(param_->GetRunner());
   request_["environ"] = objectOr(param_->GetEnv());
   request_["environ"]["REQUEST_METHOD"] = "POST";
   request_["postParam"] = objectOr(param_->GetParams());
