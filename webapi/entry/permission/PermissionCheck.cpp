@@ -14,6 +14,7 @@
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
+#include "webapi/entry/permission/Refusal.h"
 #include "webapi/entry/permission/SessionOrigin.h"
 #include "webapi/entry/permission/UserClass.h"
 #include "webapi/json/Literal.h"
@@ -107,37 +108,21 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
   const CallName call(*request);
   const bool allowTimeout =
       runner_.GetMethodAttr(call.api, call.version, call.method, "allowTimeout");
-  int code = CheckPermission(allowTimeout);
-  const unsigned slot = SlotOf(allowTimeout);
-  int result = JsonHelper::asInt(KnownResult(slot), AUTHORIZED_UNKNOWN);
-  if (code == WEBAPI_ERR_NONE && !CoversInnerCall(*request, findings_[slot])) {
-    result = AUTHORIZED_UNAUTHENTICATED;
-    code = errorOf(result);
-  }
-  if (result == AUTHORIZED_TOKEN_MISMATCH && authLevelOf(*request) == APIDescription::AUTH_LOGIN) {
-    syslog(LOG_ERR, "%s:%d Token Authentication Fail.", "WebEntry", kTokenFailLine);
-  }
+  const auto result = static_cast<_tag_authorized_result_>(ResultOf(*request, allowTimeout));
+  const int code = errorOf(result);
   if (request != &caller_) {
     // A request within this one, which may still hold what the check before found.
     request->InitSession(code == WEBAPI_ERR_NONE ? CallerSession::Of(caller_).ToJson()
                                                  : CallerSession::OfNobody(caller_));
     request->SetCookie("id", caller_.GetSessionID());
   }
-  request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
+  request->SetAuthResult(result);
   response->SetError(code);
   if (code != WEBAPI_ERR_NONE) {
-    if (serverErrorOf(code) != nullptr) {
-      response->SetServerError(serverErrorOf(code));
-    }
-    return false;
-  }
-  if (!IsAllowedUser(*request, call)) {
-    response->SetError(WEBAPI_ERR_NO_PERMISSION);
-    return false;
+    return RefuseSession(*request, *response, result);
   }
   const Json::Value appPriv = descriptionOf(*request).GetAppPriv();
-  if (!HoldsAppPriv(appPriv, caller_.GetLoginUserName(), caller_.GetRemoteIP())) {
-    response->SetError(WEBAPI_ERR_NO_APP_PRIVILEGE);
+  if (!PassesUserChecks(*request, *response, call, appPriv)) {
     return false;
   }
   Json::Value& record = request->Serialize();
@@ -145,14 +130,23 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
     return JsonHelper::member(record, "session").type() == Json::objectValue;
   };
   if (request != &caller_ || !hasSession()) {
-    request->InitSession(
-        CallerSession::Of(caller_).ToJson());  // the caller's own holds already what was found
+    // The caller's own holds already what was found.
+    request->InitSession(CallerSession::Of(caller_).ToJson());
   }
   if (hasSession()) {
     record[Literal("session")][Literal("appPriv")] = JsonHelper::asString(appPriv);
   }
-  request->SetAuthResult(static_cast<_tag_authorized_result_>(result));
+  request->SetAuthResult(result);
   return true;
+}
+
+/// The caller's result, or that its access token is for other calls than this one.
+int PermissionCheck::ResultOf(const APIRequest& request, bool allowTimeout) {
+  const unsigned slot = SlotOf(allowTimeout);
+  const int code = CheckPermission(allowTimeout);
+  return code == WEBAPI_ERR_NONE && !CoversInnerCall(request, findings_[slot])
+             ? AUTHORIZED_UNAUTHENTICATED
+             : JsonHelper::asInt(KnownResult(slot), AUTHORIZED_UNKNOWN);
 }
 
 /// A token stands for the calls that it was made for, within a compound request too.
@@ -164,11 +158,45 @@ bool PermissionCheck::CoversInnerCall(const APIRequest& request, const Finding& 
   return IsTokenGranted(request, user, kUserNameSize);
 }
 
-bool PermissionCheck::IsAllowedUser(APIRequest& request, const CallName& call) {
+bool PermissionCheck::PassesUserChecks(APIRequest& request, APIResponse& response,
+                                       const CallName& call, const Json::Value& appPriv) {
   const std::string user = caller_.GetLoginUserName();
   const Json::Value& allowUser =
       descriptionOf(request).GetAllowUser(runner_.GetMethod(call.api, call.version, call.method));
-  return !user.empty() && ListsUserClass(allowUser, APIAuth::GetUserClass(caller_.IsAdmin(), user));
+  const std::string userClass = APIAuth::GetUserClass(caller_.IsAdmin(), user);
+  if (user.empty() || !ListsUserClass(allowUser, userClass)) {
+    return Refuse(request, response, WEBAPI_ERR_NO_PERMISSION,
+                  "\"allowUser\" does not list " + userClass);
+  }
+  if (!HoldsAppPriv(appPriv, user, caller_.GetRemoteIP())) {
+    return Refuse(request, response, WEBAPI_ERR_NO_APP_PRIVILEGE,
+                  "the application privilege " + JsonHelper::asString(appPriv) + " is missing");
+  }
+  return true;
+}
+
+bool PermissionCheck::RefuseSession(APIRequest& request, APIResponse& response,
+                                    _tag_authorized_result_ result) {
+  if (result == AUTHORIZED_TOKEN_MISMATCH && authLevelOf(request) == APIDescription::AUTH_LOGIN) {
+    syslog(LOG_ERR, "%s:%d Token Authentication Fail.", "WebEntry", kTokenFailLine);
+  }
+  const int code = errorOf(result);
+  if (serverErrorOf(code) != nullptr) {
+    response.SetServerError(serverErrorOf(code));
+  }
+  const char* token = request.GetQeloAccessTokenID();
+  return Refuse(request, response, code, RefusalReason(result, token != nullptr && *token != '\0'));
+}
+
+/// The answer to a login, and to who asks for a compound request as a whole, is no refusal: the
+/// method runs in spite of it.
+bool PermissionCheck::Refuse(APIRequest& request, APIResponse& response, int code,
+                             const std::string& reason) {
+  response.SetError(code);
+  if (!SkipPermission(&request) && request.GetAPIClass() != kCompoundAPI) {
+    LogRefusal(caller_, reason);
+  }
+  return false;
 }
 
 const Json::Value& PermissionCheck::KnownResult(unsigned slot) const {

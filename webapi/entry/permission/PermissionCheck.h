@@ -4,11 +4,12 @@
 
 #include <string>
 
+#include "webapi/APIRequest.h"
+
 struct QeloCgiContext;
 
 namespace QELO {
 
-class APIRequest;
 class APIResponse;
 class APIRunner;
 struct CallName;
@@ -47,7 +48,11 @@ class PermissionCheck {
   void FillSession(const std::string& user, const std::string& language, bool isAuthorized);
   bool CoversInnerCall(const APIRequest& request, const Finding& finding);
   bool KeepsIdle(const CallName& call);
-  bool IsAllowedUser(APIRequest& request, const CallName& call);
+  int ResultOf(const APIRequest& request, bool allowTimeout);
+  bool RefuseSession(APIRequest& request, APIResponse& response, _tag_authorized_result_ result);
+  bool Refuse(APIRequest& request, APIResponse& response, int code, const std::string& reason);
+  bool PassesUserChecks(APIRequest& request, APIResponse& response, const CallName& call,
+                        const Json::Value& appPriv);
 
   APIRunner& runner_;
   APIRequest& caller_;

@@ -86,7 +86,7 @@ TEST_F(Permission, NeitherSessionNorTokenIsNoPrivilege) {
 TEST_F(Permission, TokenMismatchIsLoggedForAnApiThatNeedsALogin) {
   platform->authorized = -7;
   EXPECT_FALSE(Check(kOpenToAll));
-  ASSERT_EQ(SyslogCapture::Messages().size(), 1U);
+  ASSERT_EQ(SyslogCapture::Messages().size(), 2U);  // and the one that tells to whom
   EXPECT_EQ(SyslogCapture::Messages()[0].text, "WebEntry:577 Token Authentication Fail.");
   EXPECT_EQ(SyslogCapture::Messages()[0].priority, 3);
 }
