@@ -38,7 +38,9 @@ class WEBAPI_API APIRunner {
   ///         for null, an empty object, a missing API and "relay_zt", 118 when the process cannot
   ///         be named, those of CheckRequestParam()
   virtual bool Run(const Json::Value& param);
-  /// Whether a daemon serves the request. None does yet: false.
+  /// Whether the request goes to an API daemon: its description names a "socket" that is there, and
+  /// neither turns that off nor has the method send a file or read its upload itself. Never within
+  /// a daemon, that is with "in_qeloapid" in the process environment.
   virtual bool CanProcessSocket(APIRequest* request);
   /// Prepares the runner's request: the process environment, what `param` has in "environ",
   /// "session" and "attr", then its parameters.
@@ -155,7 +157,11 @@ class WEBAPI_API APIRunner {
   bool HandleCompound(APIRequest* request, APIResponse* response);
   /// How many compound requests are being handled, one within the other; 0 outside of them.
   int CompoundDepth() const { return compoundDepth_; }
-  /// Hands the request to a daemon. There is none yet: false with error 117.
+  /// Has a daemon make the call: permission and upload here, then request and response go to it as
+  /// one message, and its response takes the place of `response`.
+  /// @return false with what the hooks have set, or with error 117 (logged) when the daemon could
+  /// not
+  ///         be asked or gave no answer; the call is not made in this process then
   bool ProcessSocket(APIRequest* request, APIResponse* response);
   /// Runs the method in this process: permission, count, upload, then with standard streams shut,
   /// priority and credentials as the description wants them. All are given back but the credentials
@@ -165,6 +171,9 @@ class WEBAPI_API APIRunner {
   /// link, for all others CheckPermission() when NeedPermission() says so; and what they refuse
   /// passes all the same when SkipPermission() says so. @return whether the call may go on
   bool IsPermitted(APIRequest* request, APIResponse* response);
+  /// Takes the upload that the request may be. @return false when it is one, and the method takes
+  /// none or HandleUpload() fails
+  bool TakeUpload(APIRequest* request, APIResponse* response, const Json::Value& attributes);
   /// Adds one to the call's usage count. A count that cannot be stored is lost in silence.
   void IncreaseCounter(APIRequest* request);
   /// Ask a library for one table each.

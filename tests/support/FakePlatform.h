@@ -62,6 +62,14 @@ struct FakePlatform {
 
   std::string keptVariable;  ///< the one that a setting adds to the environment
 
+  // Connections to daemons: what each step answers, and the reply. Sent messages are recorded
+  // whole.
+  bool daemonConnects = true;
+  bool daemonSends = true;
+  bool daemonAnswers = true;
+  std::string daemonReply;
+  std::string daemonMessage;
+
   // Login service
   int loginAttempt = 0;
   int passwordCheck = 0;

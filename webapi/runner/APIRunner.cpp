@@ -22,6 +22,7 @@
 #include "webapi/runner/CompoundCall.h"
 #include "webapi/runner/catalogue/Catalogue.h"
 #include "webapi/runner/counter/UsageCounter.h"
+#include "webapi/runner/daemon/DaemonCall.h"
 #include "webapi/runner/exec/ExecCall.h"
 #include "webapi/runner/execution/Execution.h"
 #include "webapi/runner/library/LibraryCache.h"
@@ -180,13 +181,17 @@ bool APIRunner::HandleCompound(APIRequest* request, APIResponse* response) {
   return CompoundHandler(request, response, this).Process();
 }
 
-bool APIRunner::CanProcessSocket(APIRequest*) {
-  return false;  // no daemon is served yet
+bool APIRunner::CanProcessSocket(APIRequest* request) {
+  return DaemonCall(*this, request).IsPossible();
 }
 
-bool APIRunner::ProcessSocket(APIRequest*, APIResponse* response) {
-  response->SetError(WEBAPI_ERR_NO_ANSWER);
-  return false;
+bool APIRunner::ProcessSocket(APIRequest* request, APIResponse* response) {
+  if (!IsPermitted(request, response)) {
+    return false;
+  }
+  const CallName call(*request);
+  return TakeUpload(request, response, GetMethod(call.api, call.version, call.method)) &&
+         DaemonCall(*this, request).Run(response);
 }
 
 bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
@@ -201,11 +206,14 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
       JsonHelper::asBool(request->GetAPIInfo("count", true))) {
     IncreaseCounter(request);
   }
-  if (request->IsUploadRequest() &&
-      !(APIDescription::IsSet(attributes, "allowUpload") && HandleUpload(request, response))) {
-    return false;
-  }
-  return Execution(*this, request, response).Run(attributes);
+  return TakeUpload(request, response, attributes) &&
+         Execution(*this, request, response).Run(attributes);
+}
+
+bool APIRunner::TakeUpload(APIRequest* request, APIResponse* response,
+                           const Json::Value& attributes) {
+  return !request->IsUploadRequest() ||
+         (APIDescription::IsSet(attributes, "allowUpload") && HandleUpload(request, response));
 }
 
 bool APIRunner::IsPermitted(APIRequest* request, APIResponse* response) {

@@ -204,13 +204,15 @@ TEST_F(Dispatch, RequestThatADaemonServesIsNotRunInProcess) {
   } tested;
   WriteDescription(Description("state"));
   MakeRequest("QELO.Test.Call", 1, "run");
+  platform->daemonConnects = false;
   SyslogCapture::Clear();
   EXPECT_FALSE(tested.Process(request.get(), response.get()));
   EXPECT_EQ(response->GetError(), 117);
-  EXPECT_EQ(tested.asked.rfind("socket run ", 0), 0u) << tested.asked;
+  EXPECT_EQ(tested.asked, "socket run need ");
   // Nobody's credentials were taken.
   const std::vector<std::string> expected{"QLIBCFileExist(QELO.Test.lib)",
-                                          "QLIBCFileExist(QELO.Test.Call.lib)"};
+                                          "QLIBCFileExist(QELO.Test.Call.lib)", "Connect()",
+                                          "Disconnect()"};
   EXPECT_EQ(platform->calls, expected);
   EXPECT_EQ(SyslogCapture::Openings().size(), 2u);  // named before and after
   MakeRequest("QELO.Test.Call", 9, "run");
