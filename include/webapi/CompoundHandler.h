@@ -103,6 +103,8 @@ class WEBAPI_API CompoundHandler {
   /// @return the error for a request with too many entries
   int RefuseSize();
   bool IsClientGone() const;
+  void KeepCaller();
+  void RestoreCaller();
   void TakeEntry(const Json::Value& entry);
   int RefuseEntry(int code, const char* message, unsigned index);
   int ForkEntry(unsigned index);
@@ -124,6 +126,7 @@ class WEBAPI_API CompoundHandler {
   std::list<Child> children_;
   std::string message_;
   unsigned entryCount_ = 0;  ///< at all levels
+  Json::Value caller_;       ///< the entry request's, before any entry's permission was asked
 };
 
 }  // namespace QELO

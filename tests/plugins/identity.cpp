@@ -6,6 +6,7 @@
 #include <grp.h>
 #include <unistd.h>
 
+#include <cstdlib>
 #include <string>
 
 #include "PluginTable.h"
@@ -31,6 +32,9 @@ static void whoami(QELO::APIRequest* request, QELO::APIResponse* response) {
   }
   data["directory"] = directory;
   data["user"] = request->GetLoginUserName();
+  const char* variable = getenv("QELO_WEBAPI_USERNAME");
+  data["userVariable"] = variable != nullptr ? variable : "";
+  data["session"] = request->GetSessionID();
   data["uid"] = request->GetLoginUID();
   data["isAdmin"] = request->IsAdmin();
   data["isTimeout"] = request->IsTimeout();
@@ -51,6 +55,7 @@ static QELO::_tag_API_TABLE table[] = {{"QELO.Test.Identity", 1, "plain", whoami
                                        {"QELO.Test.Identity", 1, "adminOnly", whoami},
                                        {"QELO.Test.Identity", 1, "patientAsRoot", whoami},
                                        {"QELO.Test.Open", 1, "plain", whoami},
+                                       {"QELO.Test.Open", 1, "asRoot", whoami},
                                        {nullptr, 0, nullptr, nullptr}};
 
 PLUGIN_EXPORT QELO::_tag_API_TABLE* GetAPITable() {

@@ -1,5 +1,5 @@
-"""A session that has timed out and an access token in one compound request: each entry has the caller
-that it would have alone."""
+"""One compound request, whose entries may come in by different ways: each entry has the caller that it
+would have alone."""
 
 import json
 import os
@@ -9,6 +9,7 @@ import time
 from conftest import BUILD, SESSIONS, needs_root
 
 API = "QELO.Test.Identity"
+OPEN = "QELO.Test.Open"  # its authLevel is 0
 
 
 @needs_root
@@ -27,3 +28,20 @@ def test_TimedOutSessionAndToken_EachEntryHasItsOwnCaller(client, alice):
     )
     callers = [result["data"]["user"] for result in answer.data["result"]]
     assert callers == ["bob", "alice", "bob", "alice"]
+
+
+@needs_root
+def test_EntryThatNeedsNoLogin_SeesNothingOfTheOneBeforeIt(client, alice):
+    def call(api, method):
+        return {"api": api, "version": 1, "method": method}
+
+    def caller(data):
+        return {key: data[key] for key in (
+            "user", "userVariable", "session", "isAdmin", "isTimeout", "isAuthorized", "authResult")}
+
+    entries = [call(API, "asRoot"), call(OPEN, "asRoot"), call(API, "asRoot"), call(OPEN, "plain")]
+    answer = client.call(
+        "QELO.Entry.Request", "request", compound=json.dumps(entries), _sid=alice["sid"])
+    alone = [client.call(e["api"], e["method"], _sid=alice["sid"]).data for e in entries]
+    assert [caller(result["data"]) for result in answer.data["result"]] == [caller(d) for d in alone]
+    assert [d["user"] for d in alone] == ["alice", "", "alice", ""]

@@ -6,6 +6,7 @@
 #include <poll.h>
 #include <unistd.h>
 
+#include <cstdlib>
 #include <new>
 
 #include "webapi/APIRequest.h"
@@ -16,6 +17,7 @@
 #include "webapi/base/Log.h"
 #include "webapi/batch/compound/EntryLimit.h"
 #include "webapi/batch/pipe/AnswerPipe.h"
+#include "webapi/model/request/CallerSession.h"
 #include "webapi/runner/CompoundCall.h"
 #include "webapi/runner/execution/StandardStreams.h"
 #include "webapi/runner/execution/WorkingDirectory.h"
@@ -24,6 +26,7 @@ namespace QELO {
 namespace {
 
 constexpr char kSource[] = "CompoundHandler.cpp";
+constexpr const char* kCallerSections[] = {"session", "cookie"};
 
 Json::Value asPostParameters(const Json::Value& entry) {
   Json::Value params;
@@ -92,6 +95,7 @@ int CompoundHandler::PrepareNewCompReqResp() {
     return WEBAPI_ERR_NO_ANSWER;
   }
   PrepareEnvironment();
+  KeepCaller();
   entryRequest_->InitParam(asPostParameters(Json::Value(Json::objectValue)), false);
   entryResponse_.reset(new (std::nothrow) APIResponse(entryRequest_.get()));
   if (entryResponse_ == nullptr) {
@@ -124,8 +128,31 @@ void CompoundHandler::RepairRequest() {
   }
 }
 
+void CompoundHandler::KeepCaller() {
+  const Json::Value& record = entryRequest_->Serialize();
+  caller_ = Json::Value(Json::objectValue);
+  for (const char* section : kCallerSections) {
+    caller_[section] = JsonHelper::member(record, section);
+  }
+  const char* user = getenv(kCallerVariable);
+  caller_[kCallerVariable] = user != nullptr ? Json::Value(user) : Json::Value();
+}
+
+/// Entries before this one may have left their caller, whom an entry that asks for no permission
+/// would go on with.
+void CompoundHandler::RestoreCaller() {
+  for (const char* section : kCallerSections) {
+    entryRequest_->Serialize()[section] = caller_[section];
+  }
+  const Json::Value& user = caller_[kCallerVariable];
+  if (user.isNull() || setenv(kCallerVariable, user.asCString(), 1) != 0) {
+    unsetenv(kCallerVariable);
+  }
+}
+
 void CompoundHandler::TakeEntry(const Json::Value& entry) {
   RepairRequest();
+  RestoreCaller();
   entryRequest_->InitParam(asPostParameters(entry), true);
 }
 

@@ -28,7 +28,6 @@
 namespace QELO {
 namespace {
 
-constexpr char kUserVariable[] = "QELO_WEBAPI_USERNAME";
 constexpr int kOptionSize = 1024;    ///< bytes of a session's option with its NUL
 constexpr int kTokenFailLine = 577;  ///< administrators' log filters know the message by this line
 
@@ -84,10 +83,10 @@ std::string optionOf(QeloCgiContext* context, const char* name, const char* def 
   return QeloCgiGetOption(context, name, value, kOptionSize) == 1 ? value : def;
 }
 
-/// Tells other programs of the system whom the process works for; nobody rather than somebody else.
+/// Nobody rather than somebody else.
 void setUserVariable(const std::string& user) {
-  if (setenv(kUserVariable, user.c_str(), 1) != 0) {
-    unsetenv(kUserVariable);
+  if (setenv(kCallerVariable, user.c_str(), 1) != 0) {
+    unsetenv(kCallerVariable);
   }
 }
 
@@ -115,6 +114,7 @@ bool PermissionCheck::CheckPermission(APIRequest* request, APIResponse* response
     request->InitSession(code == WEBAPI_ERR_NONE ? CallerSession::Of(caller_).ToJson()
                                                  : CallerSession::OfNobody(caller_));
     request->SetCookie("id", caller_.GetSessionID());
+    setUserVariable(code == WEBAPI_ERR_NONE ? caller_.GetLoginUserName() : "");
   }
   request->SetAuthResult(result);
   response->SetError(code);

@@ -9,6 +9,9 @@ namespace QELO {
 
 class APIRequest;
 
+/// Tells other programs of the system whom the process works for.
+inline constexpr char kCallerVariable[] = "QELO_WEBAPI_USERNAME";
+
 /// What is known of the one for whom a call is made: the "session" section of a request's record,
 /// whose members have these names.
 struct CallerSession {

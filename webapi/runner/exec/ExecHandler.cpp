@@ -32,7 +32,6 @@ constexpr char kSource[] = "ExecHandler.cpp";
 /// Leaves the child's standard descriptors as they are.
 constexpr int kForkFlags = 65;
 constexpr char kUserVariable[] = "USERNAME";
-constexpr char kRunnerVariable[] = "QELO_WEBAPI_USERNAME";
 constexpr size_t kChunkSize = 4096;
 constexpr int kReapTries = 20;
 constexpr useconds_t kReapPauseMicroseconds = 5000;
@@ -143,18 +142,18 @@ void ExecHandler::PrepareReq() {
 }
 
 void ExecHandler::Run(bool inChild) {
-  const char* set = inChild ? nullptr : getenv(kRunnerVariable);
+  const char* set = inChild ? nullptr : getenv(kCallerVariable);
   const bool restore = set != nullptr;
   const std::string former = restore ? set : "";
   const std::string user = param_->GetRunner();
   setenv(kUserVariable, user.c_str(), 1);
-  setenv(kRunnerVariable, user.c_str(), 1);
+  setenv(kCallerVariable, user.c_str(), 1);
   runner_.Run(request_);
   result_ = runner_.GetResponse();
   if (restore) {
     // Both from the one variable: outside of calls the two are the same user.
     setenv(kUserVariable, former.c_str(), 1);
-    setenv(kRunnerVariable, former.c_str(), 1);
+    setenv(kCallerVariable, former.c_str(), 1);
   }
 }
 
