@@ -194,12 +194,12 @@ class EndOfEntry:
 @pytest.mark.parametrize(
     "version, mode", [(1, "sequential"), (1, "parallel"), (2, "sequential"), (2, "parallel")]
 )
-def test_CallbackOfFiveSeconds_DoesNotHoldTheClient(
+def test_LongCallback_DoesNotHoldTheClient(
     server, compound, mark, version, mode  # noqa: F811
 ):
     entries = [
         entry("slow", ms=300),
-        entry("later", version=version, file=str(mark), ms=5000),
+        entry("later", version=version, file=str(mark), ms=2000),
         entry("echo"),
     ]
     end = EndOfEntry(server)
@@ -212,5 +212,5 @@ def test_CallbackOfFiveSeconds_DoesNotHoldTheClient(
     assert complete - end.at < 0.1
     assert mark.read_text() == ""
     assert wait_for(lambda: mark.read_text() != "", 20)
-    assert time.monotonic() - started >= 5
+    assert time.monotonic() - started >= 2
     assert mark.read_text() == "ran\n"
