@@ -36,8 +36,14 @@ struct Body {
 constexpr char kCall[] = "api=QELO.Access.Session&version=1&method=current&a=";
 constexpr size_t kAlmostTooMany = 49'900;      // values
 constexpr size_t kAlmostTooManyPairs = 9'900;  // parameters
+constexpr char kCompound[] =
+    "api=QELO.Entry.Request&version=1&method=request&mode=parallel&compound=";
+constexpr size_t kAlmostTooManyEntries = 250;  // of an anonymous compound request
 
 const std::string kLongPiece = '"' + std::string(330, 'x') + "\",";
+const std::string kLongEntry =
+    R"({"api":"QELO.Access.Session","version":1,"method":"current","a":")" +
+    std::string(65'000, 'x') + "\"},";
 const std::string kLongEscapes = "\"\\u0041" + std::string(320, 'x') + "\",";
 
 const Body kBodies[] = {
@@ -75,6 +81,10 @@ const Body kBodies[] = {
     {"string-escapes", kCall, kLongEscapes.c_str(), "0]", kAlmostTooMany},
     {"most-zeros", kCall, "0,", "0]", kAlmostTooMany},
     {"most-objects", kCall, "{\"abcdefghijklmnopqrstuvwxyz\":[]},", "0]", kAlmostTooMany / 2},
+    {"compound", kCompound, "0,", "0]"},
+    {"compound-nested", kCompound, "{\"compound\":[0]},", "0]"},
+    {"compound-values", kCompound, "0,", "0]", kAlmostTooMany},
+    {"compound-entries", kCompound, kLongEntry.c_str(), "0]", kAlmostTooManyEntries},
     {"most-parameters", "a=1", "&a=1", "", kAlmostTooManyPairs},
 };
 
@@ -90,7 +100,7 @@ size_t write(const Body& body, const std::string& path) {
     fail(path.c_str());
   }
   std::string front = body.front;
-  front += body.pieces != SIZE_MAX && *body.back == '0' ? "[" : "";
+  front += *body.back == '0' ? "[" : "";
   const size_t length = std::strlen(body.piece);
   size_t size = front.size() + std::strlen(body.back);
   std::fputs(front.c_str(), file);
