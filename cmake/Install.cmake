@@ -81,6 +81,13 @@ install(CODE "
         fi
       done\" COMMAND_ERROR_IS_FATAL ANY)
   endif()")
+# The list of shared folders is the administrator's: one that is there stays, changed or not.
+set(webapi_shares ${WEBAPI_ROOT_PREFIX}/etc/webapi)
+install(CODE "
+  if(NOT EXISTS \"\$ENV{DESTDIR}${webapi_shares}/shares.json\")
+    file(INSTALL DESTINATION \"${webapi_shares}\" TYPE FILE
+         FILES \"${PROJECT_SOURCE_DIR}/packaging/shares.json\")
+  endif()")
 get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
 install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
 

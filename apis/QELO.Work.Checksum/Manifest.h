@@ -19,7 +19,4 @@ class Manifest {
   bool complete_ = true;
 };
 
-/// A file name as JSON text can hold it: bytes that are no UTF-8 become U+FFFD.
-std::string printable(const std::string& name);
-
 }  // namespace checksum

@@ -1,11 +1,15 @@
 #include "Report.h"
 
+#include <webapi/JsonHelper.h>
+
 #include <algorithm>
 #include <cmath>
 #include <cstring>
 
 namespace checksum {
 namespace {
+
+namespace JsonHelper = QELO::JsonHelper;
 
 /// What opening a file costs, in bytes that could be read instead: so that the time left is right
 /// for many small files too.
@@ -30,7 +34,7 @@ std::string reasonOf(int error) {
 
 Report::Report(QELO::APIResponse* response, const std::string& directory)
     : response_(response), data_(Json::objectValue) {
-  data_["path"] = printable(directory);
+  data_["path"] = JsonHelper::repairUtf8(directory);
   data_["state"] = "counting";
   data_["current"] = "";
   data_["error_count"] = 0;
@@ -51,7 +55,7 @@ void Report::StartReading() {
 }
 
 void Report::Reading(const std::string& name) {
-  data_["current"] = printable(name);
+  data_["current"] = JsonHelper::repairUtf8(name);
   Tell();
 }
 
@@ -69,7 +73,7 @@ void Report::Failed(const std::string& name, int error) {
   Json::Value& errors = data_["errors"];
   if (errors.size() < kMostErrors) {
     Json::Value entry(Json::objectValue);
-    entry["path"] = printable(name);
+    entry["path"] = JsonHelper::repairUtf8(name);
     entry["reason"] = reasonOf(error);
     errors.append(entry);
   }

@@ -62,4 +62,8 @@ WEBAPI_API uint64_t asUInt64(const Json::Value& value, uint64_t fallback = 0);
 /// Truth: a boolean as it is, a number other than 0; null and all else give `fallback`.
 WEBAPI_API bool asBool(const Json::Value& value, bool fallback = false);
 
+/// The text as JSON can hold it: bytes that are no part of valid UTF-8 become U+FFFD. Names of
+/// files are any bytes.
+WEBAPI_API std::string repairUtf8(const std::string& text);
+
 }  // namespace QELO::JsonHelper

@@ -8,6 +8,7 @@
 #include "webapi/base/Number.h"
 #include "webapi/base/ReplaceFile.h"
 #include "webapi/base/TextFile.h"
+#include "webapi/base/Utf8.h"
 #include "webapi/json/Reader.h"
 
 namespace QELO::JsonHelper {
@@ -137,6 +138,10 @@ bool asBool(const Json::Value& value, bool fallback) {
     default:
       return fallback;
   }
+}
+
+std::string repairUtf8(const std::string& text) {
+  return RepairUtf8(text);
 }
 
 }  // namespace QELO::JsonHelper

@@ -192,3 +192,8 @@ TEST(JsonFromString, ReadsBackWhatToStringWrote) {
   ASSERT_TRUE(JsonHelper::fromString(JsonHelper::toString(value), again));
   EXPECT_EQ(again, value);
 }
+
+TEST(JsonRepairUtf8, ReplacesWhatIsNoCharacter) {
+  EXPECT_EQ(JsonHelper::repairUtf8("na\xEFve"), "na\xEF\xBF\xBDve");
+  EXPECT_EQ(JsonHelper::repairUtf8("na\xC3\xAFve"), "na\xC3\xAFve");
+}
