@@ -30,7 +30,7 @@ ALLOWED = {
     "platform": FLOOR | SEAM | {"webapi/json"},
     "programs": FLOOR | SEAM | {"webapi/json", "webapi/model", "webapi/runner", "webapi/batch",
                                 "webapi/entry"},
-    "apis": {"webapi/model", "webapi/runner", "webapi/batch", "webapi/entry"},
+    "apis": {"webapi/model", "webapi/runner", "webapi/batch", "webapi/transfer", "webapi/entry"},
 }
 # Exported headers whose file of the same name is none: the folder that they belong to.
 IMPLEMENTED_IN = {

@@ -14,7 +14,10 @@ LITERALS = re.compile(rf"\s*({LITERAL}(?:\s*{LITERAL})*)\s*\Z")
 MACRO = re.compile(r"^#define (\w+)\(((?:.*\\\n)*.*)", re.MULTILINE)
 CONSTANT = re.compile(rf"\bconstexpr char (\w+)\[\] = ({LITERAL});")
 # A source that is a parameter: what callers hand in.
-HANDED_IN = {"webapi/runner/execution/Fence.h": {"APIRunner.cpp", "APIPolling.cpp"}}
+HANDED_IN = {
+    "webapi/runner/execution/Fence.h": {"APIRunner.cpp", "APIPolling.cpp"},
+    "webapi/model/response/HeaderLines.cpp": {"APIDownload.cpp", "WebEntry.cpp"},
+}
 FACILITIES = {"LOG_AUTH": "auth", "LOG_AUTHPRIV": "authpriv"}
 LEVELS = {"LOG_CRIT": "crit", "LOG_ERR": "err", "LOG_WARNING": "warning", "LOG_NOTICE": "notice",
           "LOG_INFO": "info", "LOG_DEBUG": "debug"}

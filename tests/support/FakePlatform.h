@@ -84,4 +84,8 @@ struct FakePlatform {
 
   // Web server
   bool engineThrows = false;
+
+  // File output
+  int fileOutput = 0;      ///< result of each output
+  bool fastOutput = true;  ///< the switch
 };

@@ -3,11 +3,12 @@
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Utf8.h"
-#include "webapi/entry/output/HeaderLines.h"
+#include "webapi/model/response/HeaderLines.h"
 
 namespace QELO {
 namespace {
 
+constexpr char kSource[] = "WebEntry.cpp";
 /// Sent with every answer: it is nobody else's to guess its type, show it or keep it.
 constexpr char kFixedLines[] =
     "X-Content-Type-Options: nosniff\r\n"
@@ -21,7 +22,7 @@ constexpr char kFixedLines[] =
 
 std::string HeaderText(const APIResponse& response) {
   std::string text;
-  for (const std::string& line : HeaderLines(response)) {
+  for (const std::string& line : HeaderLines(response, kSource)) {
     text += line + "\r\n";
   }
   for (const std::string& line : CookieLines(response)) {

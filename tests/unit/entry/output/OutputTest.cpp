@@ -3,8 +3,8 @@
 #include <dlfcn.h>
 
 #include "tests/support/CgiFixture.h"
-#include "webapi/entry/output/BrokenPipe.h"
-#include "webapi/entry/output/HeaderLines.h"
+#include "webapi/base/BrokenPipe.h"
+#include "webapi/model/response/HeaderLines.h"
 
 namespace {
 FILE* purged = nullptr;  ///< the last stream that was
@@ -21,6 +21,8 @@ namespace QELO {
 namespace {
 
 using Lines = std::vector<std::string>;
+
+constexpr char kSource[] = "WebEntry.cpp";
 
 constexpr char kFixed[] =
     "X-Content-Type-Options: nosniff\r\n"
@@ -73,7 +75,7 @@ TEST_F(Output, HeaderThatIsNoTextIsSkipped) {
   Headers()["X-Null"] = Json::Value();
   Headers()["X-Text"] = "t";
   Headers().removeMember("Content-type");
-  EXPECT_EQ(HeaderLines(*entry_.Response()), Lines{"X-Text: t"});
+  EXPECT_EQ(HeaderLines(*entry_.Response(), kSource), Lines{"X-Text: t"});
   EXPECT_TRUE(SyslogCapture::Messages().empty());
 }
 
@@ -87,7 +89,7 @@ TEST_F(Output, CookieThatIsNoTextIsSkipped) {
 TEST_F(Output, HeadersAndCookiesThatAreNoContainersYieldNone) {
   Headers() = Json::Value(5);
   Cookies() = Json::Value("a=1");
-  EXPECT_EQ(HeaderLines(*entry_.Response()), Lines{});
+  EXPECT_EQ(HeaderLines(*entry_.Response(), kSource), Lines{});
   EXPECT_EQ(CookieLines(*entry_.Response()), Lines{});
 }
 
@@ -97,7 +99,7 @@ TEST_F(Output, HeaderValueWithALineEndOrNulIsNotSent) {
   entry_.Response()->SetHeader("X-Lf", "a\nSet-Cookie: id=1");
   entry_.Response()->SetHeader("X-Nul", std::string("a\0b", 3));
   entry_.Response()->SetHeader("X-Tab", "a\tb");
-  EXPECT_EQ(HeaderLines(*entry_.Response()), Lines{"X-Tab: a\tb"});
+  EXPECT_EQ(HeaderLines(*entry_.Response(), kSource), Lines{"X-Tab: a\tb"});
   EXPECT_EQ(SyslogCapture::Count("header X-Cr is not sent"), 1);
   EXPECT_EQ(SyslogCapture::Count("header X-Lf is not sent"), 1);
   EXPECT_EQ(SyslogCapture::Count("header X-Nul is not sent"), 1);
@@ -111,7 +113,7 @@ TEST_F(Output, HeaderNameThatIsNoTokenIsNotSent) {
   Headers()[std::string("a\0b", 3)] = "v";
   Headers()[""] = "v";
   Headers()["a-Z0!#$%&'*+.^_`|~"] = "v";
-  EXPECT_EQ(HeaderLines(*entry_.Response()), Lines{"a-Z0!#$%&'*+.^_`|~: v"});
+  EXPECT_EQ(HeaderLines(*entry_.Response(), kSource), Lines{"a-Z0!#$%&'*+.^_`|~: v"});
   EXPECT_EQ(SyslogCapture::Count("is not sent"), 9);
   EXPECT_EQ(SyslogCapture::Count("header a?b is not sent"), 4);  // no line end reaches the log
 }
@@ -131,25 +133,25 @@ TEST_F(Output, AnotherSpellingOfContentTypeWinsOverThePreset) {
   for (const char* name : {"Content-Type", "content-type", "content-Type"}) {
     TestEntry entry;
     entry.Response()->SetHeader(name, "text/html");
-    EXPECT_EQ(HeaderLines(*entry.Response()), Lines{std::string(name) + ": text/html"});
+    EXPECT_EQ(HeaderLines(*entry.Response(), kSource), Lines{std::string(name) + ": text/html"});
   }
 }
 
 TEST_F(Output, PresetContentTypeThatAMethodReplacedStays) {
   entry_.Response()->SetHeader("Content-type", "text/html");
-  EXPECT_EQ(HeaderLines(*entry_.Response()), Lines{"Content-type: text/html"});
+  EXPECT_EQ(HeaderLines(*entry_.Response(), kSource), Lines{"Content-type: text/html"});
 }
 
 TEST_F(Output, TwoOtherSpellingsOfContentTypeGiveOneLine) {
   entry_.Response()->SetHeader("Content-Type", "text/html");
   entry_.Response()->SetHeader("content-type", "text/css");
-  EXPECT_EQ(HeaderLines(*entry_.Response()), Lines{"Content-Type: text/html"});
+  EXPECT_EQ(HeaderLines(*entry_.Response(), kSource), Lines{"Content-Type: text/html"});
 }
 
 TEST_F(Output, OtherSpellingThatCannotBeSentLeavesThePreset) {
   Headers()["content-type"] = "text/html\r\nX: y";
   Headers()["Content-Type"] = 5;
-  EXPECT_EQ(HeaderLines(*entry_.Response()),
+  EXPECT_EQ(HeaderLines(*entry_.Response(), kSource),
             Lines{"Content-type: application/json; charset=\"UTF-8\""});
 }
 

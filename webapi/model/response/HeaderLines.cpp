@@ -1,4 +1,4 @@
-#include "webapi/entry/output/HeaderLines.h"
+#include "webapi/model/response/HeaderLines.h"
 
 #include <json/json.h>
 #include <strings.h>
@@ -32,12 +32,12 @@ bool isContentType(const std::string& name) {
 }
 
 /// Whether a header makes a line; one that should but cannot is logged.
-bool isSendable(const std::string& name, const Json::Value& value) {
+bool isSendable(const std::string& name, const Json::Value& value, const char* source) {
   if (value.type() != Json::stringValue) {
     return false;
   }
   if (!isToken(name) || !fitsOneLine(JsonHelper::asString(value))) {
-    WEBAPI_LOG("WebEntry.cpp", "header %s is not sent", LogText(name).c_str());
+    WEBAPI_LOG(source, "header %s is not sent", LogText(name).c_str());
     return false;
   }
   return true;
@@ -45,7 +45,7 @@ bool isSendable(const std::string& name, const Json::Value& value) {
 
 }  // namespace
 
-std::vector<std::string> HeaderLines(const APIResponse& response) {
+std::vector<std::string> HeaderLines(const APIResponse& response, const char* source) {
   const Json::Value headers = response.GetHeaders();
   std::vector<std::string> lines;
   std::string contentType;
@@ -54,7 +54,7 @@ std::vector<std::string> HeaderLines(const APIResponse& response) {
     const char* end = nullptr;
     const char* start = it.memberName(&end);
     const std::string name(start, end);
-    if (!isSendable(name, *it)) {
+    if (!isSendable(name, *it, source)) {
       continue;
     }
     const std::string line = name + ": " + JsonHelper::asString(*it);
