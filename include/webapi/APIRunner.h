@@ -186,6 +186,7 @@ class WEBAPI_API APIRunner {
   void CloseLib();
 
  private:
+  friend class ExecHandler;  ///< closes the libraries of its call with the streams shut
   struct Rooms;
 
   Json::Value libDef;

@@ -23,6 +23,7 @@
 #include "webapi/model/request/CallerSession.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
+#include "webapi/runner/execution/StandardStreams.h"
 #include "webapi/runner/execution/WorkingDirectory.h"
 
 namespace QELO {
@@ -96,7 +97,10 @@ int copyBody(Pipe& output, int fd) {
 
 ExecHandler::ExecHandler(const ExecParam& param) : param_(&param) {}
 
-ExecHandler::~ExecHandler() = default;
+ExecHandler::~ExecHandler() {
+  const StandardStreams shut(true, true);  // destructors of API libraries are foreign code
+  runner_.CloseLib();
+}
 
 Json::Value ExecHandler::Process() {
   const WorkingDirectory former;

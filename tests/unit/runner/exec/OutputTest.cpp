@@ -3,6 +3,9 @@
 #include <fcntl.h>
 #include <sys/mman.h>
 
+#include <cstdio>
+#include <iostream>
+
 #include "tests/unit/runner/exec/Fixture.h"
 
 namespace QELO {
@@ -23,6 +26,11 @@ class ExecOutput : public ExecTest {
   std::string Printed(const std::string& method, const Json::Value& params = Json::Value()) {
     const ExecParam param = Call(method, 1, "{}", kDownload).SetParams(params).SetOutputFd(output_);
     result = APIRunner::Exec(param);
+    return Text();
+  }
+
+  /// What reached the descriptor, which is empty afterwards.
+  std::string Text() const {
     std::string text(static_cast<size_t>(lseek(output_, 0, SEEK_END)), '\0');
     EXPECT_EQ(pread(output_, text.data(), text.size(), 0), static_cast<ssize_t>(text.size()));
     EXPECT_EQ(ftruncate(output_, 0), 0);
@@ -31,8 +39,6 @@ class ExecOutput : public ExecTest {
   }
 
   Json::Value result;
-
- private:
   int output_ = -1;
 };
 
@@ -126,6 +132,22 @@ TEST_F(ExecOutput, MethodThatMayNotDownloadPrintsNothing) {
   params["body"] = "x";
   EXPECT_EQ(Printed("print", params), "");
   EXPECT_EQ(result["data"], Json::Value("printed"));
+}
+
+TEST_F(ExecOutput, LibraryThatPrintsWhenItIsClosedPrintsNothing) {
+  Describe("QELO.Test.Call", "printing", {"run"}, R"({"grantable": true})");
+  fflush(stdout);
+  std::cout.flush();
+  const int former = dup(STDOUT_FILENO);
+  dup2(output_, STDOUT_FILENO);
+  printf("before ");
+  result = APIRunner::Exec(Call("run", 1, "{}", "QELO.Test.Call"));
+  printf("after");
+  fflush(stdout);
+  dup2(former, STDOUT_FILENO);
+  close(former);
+  EXPECT_EQ(result["data"], Json::Value("printed"));
+  EXPECT_EQ(Text(), "before after");
 }
 
 TEST_F(ExecOutput, LostChildLeavesWhatItPrinted) {
