@@ -91,6 +91,11 @@ install(CODE "
 get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
 install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
 
+# Where the service manager looks for what administrators install.
+configure_file(packaging/qeloapid.service.in ${CMAKE_BINARY_DIR}/qeloapid.service.configured @ONLY)
+install(FILES ${CMAKE_BINARY_DIR}/qeloapid.service.configured
+        DESTINATION lib/systemd/system RENAME qeloapid.service)
+
 # The documents stand to each other as in the source tree, so their links work.
 install(FILES README.md DEVELOPING.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
 install(FILES packaging/lighttpd.conf.in packaging/lighttpd.service.conf packaging/nginx.conf.in

@@ -28,8 +28,9 @@ ALLOWED = {
     "webapi/entry": FLOOR | SEAM | {"webapi/model", "webapi/runner", "webapi/batch",
                                     "webapi/transfer"},
     "platform": FLOOR | SEAM | {"webapi/json"},
+    "programs/server": FLOOR | SEAM,
     "programs": FLOOR | SEAM | {"webapi/json", "webapi/model", "webapi/runner", "webapi/batch",
-                                "webapi/entry"},
+                                "webapi/entry", "programs/server"},
     "apis": {"webapi/model", "webapi/runner", "webapi/batch", "webapi/transfer", "webapi/entry"},
 }
 # Exported headers whose file of the same name is none: the folder that they belong to.
@@ -53,6 +54,8 @@ EXCEPTIONS = {
 def folder_of(path):
     """The layer that a file belongs to."""
     parts = name(path).split("/")
+    if parts[:2] == ["programs", "server"]:
+        return "programs/server"
     if parts[0] in ("platform", "programs", "apis"):
         return parts[0]
     return "/".join(parts[:2])
@@ -78,6 +81,8 @@ def target_of(header):
         return "/".join(header.split("/")[:2])
     if header.startswith("platform/"):
         return "platform"
+    if header.startswith("programs/"):
+        return folder_of(SOURCE / header)
     return None
 
 

@@ -18,6 +18,7 @@ import pytest
 from accounts import account, reachable
 from client import Client
 from conftest import BUILD, ENTRY, PASSWORDS, ROOT, SOURCE, needs_root
+from service import Service
 from webserver import WebServer
 
 API = "QELO.Test.Looking"
@@ -217,6 +218,23 @@ def test_TokenProgram_StaysRoot(root):
                                "--api", "QELO.Host.Info")
     assert answer.strip()
     expect("token", seen)
+
+
+def test_DaemonsCall_HasRootsRightsUntilItTakesTheMethods(root, describe, record, tmp_path):
+    described = {"authLevel": 1, "allowUser": ["normal.local"], "methods": {"1": ["run"]}}
+    describe(API, "looking.so", socket=str(ROOT / "run" / "webapi" / "api" / "looking.sock"), **described)
+    daemon = Service(tmp_path, "qeloapid")
+    try:
+        daemon.start(stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, extra_groups=[])
+        words = ["--user", "alice", "--api", API, "--method", "run", "--param", f"record={record}"]
+        subprocess.run([BUILD / "programs" / "webapi-exec", *words], check=True, timeout=30,
+                       stdout=subprocess.DEVNULL)
+        expect("daemon", process(daemon.process.pid))
+    finally:
+        daemon.stop()
+    seen = stages(record, "method")
+    expect("daemon call before", seen["before"])
+    expect("daemon call after", seen["method"])
 
 
 def test_Table_HasNoOtherRows():

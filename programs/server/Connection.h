@@ -1,0 +1,23 @@
+#pragma once
+
+#include <chrono>
+#include <cstddef>
+#include <string>
+
+#include "webapi/base/UniqueFd.h"
+
+namespace QELO {
+
+using ServerClock = std::chrono::steady_clock;
+
+/// One accepted connection on its way to the process that serves it.
+struct Connection {
+  UniqueFd socket;
+  std::string listener;  ///< the path of the socket that it came by; "" for another kind
+  std::string header;    ///< what has come of the request's front
+  size_t wanted = 0;     ///< bytes that the header has, once that is known; 0: not yet
+  ServerClock::time_point accepted;
+  ServerClock::time_point deadline;  ///< of what is waited for at present
+};
+
+}  // namespace QELO

@@ -1,0 +1,79 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <deque>
+#include <memory>
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+#include "programs/server/Connection.h"
+#include "programs/server/Jobs.h"
+#include "programs/server/Limits.h"
+#include "programs/server/Listener.h"
+#include "programs/server/Service.h"
+#include "programs/server/SignalQueue.h"
+#include "webapi/base/UniqueFd.h"
+
+namespace QELO {
+
+/// Accepts connections and has each served by a process of its own, within limits, so that nothing
+/// of one request is left for another, and one that crashes, leaks or hangs costs nobody else.
+///
+/// One thread, which never waits for one connection: a header is taken as it comes, and no process
+/// is spent before it is whole. SIGHUP reloads; SIGTERM finishes what has been accepted and stops,
+/// a second one kills it.
+class Server {
+ public:
+  Server(Service& service, const ServerLimits& limits);
+  Server(const Server&) = delete;
+  Server& operator=(const Server&) = delete;
+
+  /// @return false, with errno, when the server cannot be had
+  bool Open();
+  /// Listens there as well.
+  bool Listen(Listener listener);
+  /// Listens there no more.
+  void StopListening(const std::string& path);
+  std::vector<std::string> Paths() const;
+
+  /// Serves until it is told to stop.
+  void Run();
+
+ private:
+  using Held = std::unique_ptr<Connection>;
+
+  bool Watch(int descriptor);
+  void Unwatch(int descriptor);
+  void HandleSignals();
+  void Accept(const Listener& listener);
+  void Arrive(Held connection);
+  void Enqueue(Held connection);
+  void Start(Held connection);
+  void StartWaiting();
+  [[noreturn]] void RunChild(Held connection, Note& note);
+  void Refuse(Held connection, Service::Refusal reason);
+  void Hear(int descriptor);
+  void EndJob(Jobs::Job job, int status);
+  void Sweep();
+  void LogRefusals(ServerClock::time_point now);
+  void Stop();
+  bool IsIdle() const;
+
+  Service& service_;
+  const ServerLimits limits_;
+  SignalQueue signals_;
+  UniqueFd events_;
+  std::vector<Listener> listeners_;
+  std::unordered_map<int, Held> arriving_;  ///< by descriptor
+  std::unordered_map<int, Held> leaving_;   ///< refused; what still comes is dropped
+  std::deque<Held> waiting_;
+  Jobs jobs_;
+  ServerClock::time_point nextSweep_;
+  ServerClock::time_point nextRefusalLine_;
+  unsigned refused_ = 0;  ///< since the last line on it
+  bool isStopping_ = false;
+};
+
+}  // namespace QELO
