@@ -14,6 +14,9 @@ QELO::_tag_API_TABLE table[] = {
     {kApi, 1, "stat", files::stat},
     {kApi, 1, "create_folder", files::createFolder},
     {kApi, 1, "rename", files::rename},
+    {kApi, 1, "copy", files::copy},
+    {kApi, 1, "move", files::move},
+    {kApi, 1, "remove", files::remove},
     {nullptr, 0, nullptr, nullptr},
 };
 

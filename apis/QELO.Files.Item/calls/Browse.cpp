@@ -102,9 +102,7 @@ bool addItem(Call& call, const VirtualPath& path, Json::Value& items) {
   if (!call.Locate(path, located)) {
     return false;
   }
-  const Reason reason = located.name.empty() ? located.parent.LookAtItself(item)
-                                             : located.parent.Look(located.name, item);
-  if (reason != Reason::kNone) {
+  if (const Reason reason = located.Look(item); reason != Reason::kNone) {
     return call.Refuse(reason, path);
   }
   item.name = path.Name();

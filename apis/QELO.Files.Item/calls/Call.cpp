@@ -60,29 +60,13 @@ bool Call::Parse(const std::string& text, VirtualPath& path) {
 }
 
 bool Call::OpenFolder(const VirtualPath& path, Folder& folder) {
-  return Open(path, path, folder);
-}
-
-bool Call::Open(const VirtualPath& path, const VirtualPath& asked, Folder& folder) {
-  const Share* share = path.IsRoot() ? nullptr : shares_.Find(path.Share());
-  if (share == nullptr) {
-    return Refuse(Reason::kNoShare, asked);
-  }
-  Folder root;
-  Reason reason = Folder::OpenShare(*share, root);
-  if (reason == Reason::kNone) {
-    reason = root.Enter(path.Below(), folder);
-  }
-  return reason == Reason::kNone || Refuse(reason, asked);
+  const Reason reason = openFolder(shares_, path, folder);
+  return reason == Reason::kNone || Refuse(reason, path);
 }
 
 bool Call::Locate(const VirtualPath& path, Located& located) {
-  if (!Open(path.IsShare() ? path : path.Parent(), path, located.parent)) {
-    return false;
-  }
-  located.path = path;
-  located.name = path.IsShare() ? "" : path.Name();
-  return true;
+  const Reason reason = locate(shares_, path, located);
+  return reason == Reason::kNone || Refuse(reason, path);
 }
 
 bool Call::IsChangeable(const VirtualPath& path) {

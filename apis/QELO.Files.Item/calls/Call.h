@@ -6,21 +6,9 @@
 #include <string>
 #include <vector>
 
-#include "paths/Folder.h"
-#include "paths/Item.h"
-#include "paths/Reason.h"
-#include "paths/Shares.h"
-#include "paths/VirtualPath.h"
+#include "paths/Located.h"
 
 namespace files {
-
-/// An item by the folder that holds it, which is open.
-struct Located {
-  VirtualPath path;
-  Folder parent;  ///< for a shared folder that itself
-  /// "" for a shared folder
-  std::string name;
-};
 
 /// One call of a method: whose shared folders it may reach, and its answer.
 class Call {
@@ -45,6 +33,8 @@ class Call {
   /// is read only.
   bool LocateForChange(const VirtualPath& path, Located& located);
   bool OpenFolderForChange(const VirtualPath& path, Folder& folder);
+  /// Whether things in its shared folder may be changed.
+  bool IsChangeable(const VirtualPath& path);
 
   /// The answer is an error, which names the item. @return false
   bool Refuse(Reason reason, const std::string& path);
@@ -54,9 +44,6 @@ class Call {
 
  private:
   bool Parse(const std::string& text, VirtualPath& path);
-  /// @param asked  the item that the call is about, which an error names
-  bool Open(const VirtualPath& path, const VirtualPath& asked, Folder& folder);
-  bool IsChangeable(const VirtualPath& path);
 
   QELO::APIRequest* request_;
   QELO::APIResponse* response_;

@@ -10,5 +10,8 @@ void list(QELO::APIRequest* request, QELO::APIResponse* response);
 void stat(QELO::APIRequest* request, QELO::APIResponse* response);
 void createFolder(QELO::APIRequest* request, QELO::APIResponse* response);
 void rename(QELO::APIRequest* request, QELO::APIResponse* response);
+void copy(QELO::APIRequest* request, QELO::APIResponse* response);
+void move(QELO::APIRequest* request, QELO::APIResponse* response);
+void remove(QELO::APIRequest* request, QELO::APIResponse* response);
 
 }  // namespace files

@@ -40,7 +40,7 @@ const char* wordOf(ItemType type) {
 int lookAt(int folder, const std::string& name, Item& item) {
   struct statx info {};
   const int flags = AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT | (name.empty() ? AT_EMPTY_PATH : 0);
-  if (statx(folder, name.c_str(), flags, STATX_BASIC_STATS, &info) != 0) {
+  if (statx(folder, name.c_str(), flags, STATX_BASIC_STATS | STATX_MNT_ID, &info) != 0) {
     return errno;
   }
   Item seen;
@@ -56,6 +56,7 @@ int lookAt(int folder, const std::string& name, Item& item) {
     seen.links = info.stx_nlink;
     seen.device = makedev(info.stx_dev_major, info.stx_dev_minor);
     seen.inode = info.stx_ino;
+    seen.mount = info.stx_mnt_id;
   }
   item = seen;
   return 0;

@@ -22,6 +22,7 @@ struct Item {
   uint32_t links = 0;
   uint64_t device = 0;
   uint64_t inode = 0;
+  uint64_t mount = 0;  ///< between two of them nothing can be moved
 
   bool IsFile() const { return type == ItemType::kFile; }
   bool IsFolder() const { return type == ItemType::kFolder; }

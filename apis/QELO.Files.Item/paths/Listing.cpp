@@ -1,20 +1,13 @@
 #include "paths/Listing.h"
 
-#include <dirent.h>
-
 #include <algorithm>
-#include <cerrno>
-#include <memory>
-#include <tuple>
+#include <utility>
 
+#include "paths/Entries.h"
 #include "paths/VirtualPath.h"
 
 namespace files {
 namespace {
-
-struct Close {
-  void operator()(DIR* stream) const { closedir(stream); }
-};
 
 char lower(char c) {
   return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
@@ -115,8 +108,7 @@ class Page {
 };
 
 bool isShown(const std::string& name, const std::string& pattern) {
-  return name != "." && name != ".." && !isTemporaryName(name) &&
-         (pattern.empty() || matches(pattern, name));
+  return !isTemporaryName(name) && (pattern.empty() || matches(pattern, name));
 }
 
 }  // namespace
@@ -148,38 +140,30 @@ bool matches(std::string_view pattern, std::string_view name) {
 
 Reason Listing::Read(const Folder& folder, const Wish& wish, std::vector<Item>& items,
                      uint64_t& total) {
-  Descriptor descriptor;
-  if (const Reason reason = folder.OpenForReading(descriptor); reason != Reason::kNone) {
+  Entries entries;
+  if (const Reason reason = entries.Open(folder); reason != Reason::kNone) {
     return reason;
   }
-  const std::unique_ptr<DIR, Close> stream(fdopendir(descriptor.Get()));
-  if (stream == nullptr) {
-    return reasonOf(errno);
-  }
-  descriptor.Release();
   const bool looksAtAll = wish.order != Order::kName || wish.kind != Kind::kAll;
   Page page(wish);
   uint64_t count = 0;
-  errno = 0;
-  while (const dirent* entry = readdir(stream.get())) {
-    Item item;
-    item.name = entry->d_name;
+  Item item;
+  while (entries.Next(item.name)) {
     // One that is gone by now is no longer an item.
     if (isShown(item.name, wish.pattern) &&
         (!looksAtAll || folder.Look(item.name, item) == Reason::kNone) &&
         isWanted(wish.kind, item)) {
       ++count;
-      page.Add(std::move(item));
+      page.Add(std::exchange(item, Item()));
     }
-    errno = 0;
   }
-  if (errno != 0) {
-    return reasonOf(errno);
+  if (entries.Fault() != Reason::kNone) {
+    return entries.Fault();
   }
   items = page.Take(wish.offset);
   if (!looksAtAll) {
-    std::erase_if(items, [&](Item& item) {
-      return folder.Look(std::string(item.name), item) != Reason::kNone;
+    std::erase_if(items, [&](Item& shown) {
+      return folder.Look(std::string(shown.name), shown) != Reason::kNone;
     });
   }
   total = count;

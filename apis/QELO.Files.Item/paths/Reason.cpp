@@ -34,6 +34,7 @@ constexpr Word kWords[] = {
     {Reason::kBusy, "busy"},
     {Reason::kShareItself, "share_itself"},
     {Reason::kFailed, "failed"},
+    {Reason::kTooManyTasks, "too_many_tasks"},
 };
 
 struct Meaning {

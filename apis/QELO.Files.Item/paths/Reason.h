@@ -27,6 +27,7 @@ enum class Reason : int {
   kBusy = 419,
   kShareItself = 420,
   kFailed = 421,
+  kTooManyTasks = 422,
 };
 
 /// The word that clients see beside the code, as "not_found".
