@@ -109,7 +109,8 @@ bool Answer::SendWhole(bool mayUseFastRoad) {
     return SendStream();
   }
   if (mayUseFastRoad && FastRoad::Take(content_, head_)) {
-    head_.Remove("Content-Length:");
+    head_.Remove("Content-Length:");  // these two are the server's to say
+    head_.Remove("Accept-Ranges:");
     return SendHead();
   }
   head_.Set("Content-Length", std::to_string(content_.Length()));

@@ -10,7 +10,7 @@ from conftest import BUILD, DESCRIPTIONS, SOURCE
 from documents import broken_links
 
 README = (SOURCE / "README.md").read_text()
-DESCRIPTION = (SOURCE / "docs" / "description.md").read_text()
+DOWNLOADS = (SOURCE / "docs" / "downloads.md").read_text()
 PARAMETERS = (SOURCE / "docs" / "parameters.md").read_text()
 PORT = "127.0.0.1:8080"
 
@@ -83,13 +83,13 @@ def test_FirstApiLibrary_IsBuiltAndAnswers(server, tmp_path):
 
 
 def test_Download_IsBuiltAndSendsTheFile(server, alice, tmp_path):
-    (tmp_path / "Download.cpp").write_text(block("download-library", DESCRIPTION))
-    (tmp_path / "QELO.Hello.Download.lib").write_text(block("download-description", DESCRIPTION))
+    (tmp_path / "Download.cpp").write_text(block("download-library", DOWNLOADS))
+    (tmp_path / "QELO.Hello.Download.lib").write_text(block("download-description", DOWNLOADS))
     shutil.copytree(SOURCE / "include", tmp_path / "include")
     preamble = f"URL=http://{PORT}/webapi/entry.cgi\nSID={alice['sid']}\n"
-    call = block("download-call", DESCRIPTION)
+    call = block("download-call", DOWNLOADS)
     try:
-        run(block("download-build", DESCRIPTION), tmp_path, server.port)
+        run(block("download-build", DOWNLOADS), tmp_path, server.port)
         run(preamble + call, tmp_path, server.port)
         assert (tmp_path / "hostname").read_bytes() == Path("/etc/hostname").read_bytes()
         absent = call.replace("/etc/hostname", "/no/such/file")

@@ -1,29 +1,20 @@
 """The shipped configuration of each web server serves what the API needs."""
 
 import json
-import os
-import shutil
-import tempfile
 import time
-from pathlib import Path
 from socket import create_connection
 from urllib.parse import quote
 
 import pytest
 
 from client import PATH, Client
-from conftest import ENTRY, session_of
+from conftest import session_of
 from marks import wait_for
+from servers import running, server  # noqa: F401  (a fixture)
 from tasks import alice, started  # noqa: F401  (fixtures)
 from webserver import ApacheCgi, ApacheCgid, Nginx, WebServer
 
 API = "QELO.Test.Entries"
-SERVERS = {
-    "lighttpd": WebServer,
-    "nginx": Nginx,
-    "apache-mod_cgi": ApacheCgi,
-    "apache-mod_cgid": ApacheCgid,
-}
 # A GET's query in bytes, as docs/webservers.md tells: one that is served, one that is refused, and the
 # status of that. lighttpd counts the other fields of the header in.
 LONGEST_QUERY = {
@@ -34,30 +25,8 @@ LONGEST_QUERY = {
 }
 
 
-@pytest.fixture(scope="module", params=SERVERS.values(), ids=SERVERS)
-def server(request, root):
-    """Where there are accounts, the server has its own, and the program is set-user-id root."""
-    directory = Path(tempfile.mkdtemp(prefix="webapi-server-"))
-    entry = directory / "entry.cgi"
-    shutil.copy(ENTRY, entry)
-    identity = {}
-    if os.geteuid() == 0:
-        directory.chmod(0o755)
-        identity = {"user": "www-data", "group": "www-data", "extra_groups": []}
-        entry.chmod(0o4755)
-    server = request.param(directory, entry)
-    if identity:
-        for path in (directory, *directory.iterdir()):
-            if path != entry:
-                shutil.chown(path, "www-data", "www-data")
-    server.start(**identity)
-    yield server
-    server.stop()
-    shutil.rmtree(directory)
-
-
 @pytest.fixture(scope="module")
-def client(server):
+def client(server):  # noqa: F811
     return Client(server.port)
 
 
@@ -66,18 +35,6 @@ def echo(describe):
     """Answers parameters; no session is needed."""
     describe(API, "entries.so", methods={"1": ["echo", "slow", "large"]})
     return f"api={API}&version=1&method=echo"
-
-
-def running(entry):
-    """The processes of a program."""
-    found = []
-    for link in Path("/proc").glob("[0-9]*/exe"):
-        try:
-            if os.readlink(link).removesuffix(" (deleted)") == str(entry):
-                found.append(int(link.parent.name))
-        except OSError:
-            continue  # it has ended
-    return found
 
 
 def test_Login_ServesCallsByCookieAndByParameter(client):

@@ -40,6 +40,7 @@ TEST_F(FastOutput, HasTheServerSendTheFile) {
   EXPECT_EQ(Header(answer, "X-Sendfile"), Path("open/a"));
   EXPECT_EQ(answer.Body(), "");
   EXPECT_EQ(Header(answer, "Content-Length"), "(none)");
+  EXPECT_EQ(Header(answer, "Accept-Ranges"), "(none)");
   EXPECT_EQ(Header(answer, "Content-Type"), "text/plain");
   EXPECT_EQ(Header(answer, "X-Content-Type-Options"), "nosniff");
   EXPECT_EQ(Header(answer, "ETag").size(), 18U);
