@@ -11,6 +11,7 @@
 #include "platform/base/Paths.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/OwnFile.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
@@ -104,13 +105,20 @@ bool areRules(const Json::Value& rules) {
 }
 
 /// The rules of an application: null when there are none.
-/// @return false when the file is there and cannot be understood, which is logged
+/// @return false, with the reason logged, when the file is there and cannot be understood, or
+/// others
+///         may write it
 bool readRules(const std::string& application, Json::Value& rules) {
   Json::Value file;
   struct stat info {};
   rules = Json::Value();
   if (stat(Paths::kAppPrivileges, &info) != 0 && errno == ENOENT) {
     return true;
+  }
+  if (OthersMayChange(Paths::kAppPrivileges)) {
+    WEBAPI_LOG(kSource, "refused to read %s: others may write it or its directory",
+               Paths::kAppPrivileges);
+    return false;
   }
   const bool readable = JsonHelper::fromFile(Paths::kAppPrivileges, file) && file.isObject();
   if (readable) {

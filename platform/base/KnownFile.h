@@ -20,10 +20,11 @@ class KnownFile {
     if (!there) {
       now = {};
     }
-    // A file that is replaced has another inode, one that is written another time or size.
+    // A file that is replaced has another inode; one that is written, or whose mode is changed,
+    // another time of change.
     if (content_ == nullptr || now.st_ino != known_.st_ino || now.st_dev != known_.st_dev ||
-        now.st_size != known_.st_size || now.st_mtim.tv_sec != known_.st_mtim.tv_sec ||
-        now.st_mtim.tv_nsec != known_.st_mtim.tv_nsec) {
+        now.st_size != known_.st_size || now.st_ctim.tv_sec != known_.st_ctim.tv_sec ||
+        now.st_ctim.tv_nsec != known_.st_ctim.tv_nsec) {
       content_ = there ? std::make_shared<const Content>(path_) : std::make_shared<const Content>();
       known_ = now;
     }

@@ -6,19 +6,37 @@
 
 #include "platform/base/KnownFile.h"
 #include "platform/base/Paths.h"
+#include "webapi/base/Log.h"
 #include "webapi/base/Number.h"
+#include "webapi/base/OwnFile.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::Platform {
 namespace {
 
+bool isTrusted(const char* path) {
+  if (!OthersMayChange(path)) {
+    return true;
+  }
+  WEBAPI_LOG("Settings.cpp", "refused to read %s: others may write it or its directory",
+             LogText(path).c_str());
+  return false;
+}
+
+/// Empty when others may write it: a setting decides whose word an address is, and what is logged.
+class SettingsFile : public KeyValueFile {
+ public:
+  SettingsFile() = default;
+  explicit SettingsFile(const char* path) : KeyValueFile(isTrusted(path) ? path : "") {}
+};
+
 std::shared_ptr<const KeyValueFile> defaults() {
-  static KnownFile<KeyValueFile> file(Paths::kSystemInfoDefaults);
+  static KnownFile<SettingsFile> file(Paths::kSystemInfoDefaults);
   return file.Get();
 }
 
 std::shared_ptr<const KeyValueFile> own() {
-  static KnownFile<KeyValueFile> file(Paths::kSystemInfo);
+  static KnownFile<SettingsFile> file(Paths::kSystemInfo);
   return file.Get();
 }
 

@@ -14,6 +14,8 @@
 #include "platform/base/FileLock.h"
 #include "platform/base/Paths.h"
 #include "platform/settings/KeyValueFile.h"
+#include "webapi/base/Log.h"
+#include "webapi/base/OwnFile.h"
 #include "webapi/base/ReplaceFile.h"
 #include "webapi/base/Text.h"
 #include "webapi/base/TextFile.h"
@@ -116,6 +118,11 @@ bool setKey(const char* name, const std::string& key, const std::string& value) 
   const UniqueFd directory(
       open(path.substr(0, path.rfind('/') + 1).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   std::string text;
+  if (OthersMayChange(path)) {  // it does not count
+    WEBAPI_LOG("SystemInfo.cpp", "refused to change %s: others may write it or its directory",
+               LogText(path).c_str());
+    return false;
+  }
   if (!directory || !lockFile(directory.Get(), kLockSeconds) || !readFile(path, text)) {
     return false;
   }

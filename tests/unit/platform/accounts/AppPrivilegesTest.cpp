@@ -33,6 +33,23 @@ TEST_F(AppPrivileges, UserIsAllowedByName) {
   EXPECT_TRUE(Has("admin"));
 }
 
+TEST_F(AppPrivileges, FileThatOthersMayWriteGivesNobodyTheRight) {
+  const char* file = "etc/webapi/appprivs.json";
+  const std::string rules = R"({"QELO.App": {"allow": [{"user": "alice"}]}})";
+  for (const mode_t mode : {0664, 0646}) {
+    Write(file, rules, mode);
+    SyslogCapture::Clear();
+    EXPECT_FALSE(Has("alice")) << mode;
+    EXPECT_FALSE(Has("admin")) << mode;
+    EXPECT_EQ(SyslogCapture::Count("appprivs.json: others may write it or its directory"), 2);
+  }
+  Write(file, rules, 0644);
+  EXPECT_TRUE(Has("alice"));
+  std::filesystem::permissions(Path("etc/webapi"), std::filesystem::perms::group_write,
+                               std::filesystem::perm_options::add);
+  EXPECT_FALSE(Has("alice"));
+}
+
 TEST_F(AppPrivileges, UserIsAllowedByGroup) {
   Rules(R"({"QELO.App": {"allow": [{"group": "users"}]}})");
   EXPECT_TRUE(Has("alice"));

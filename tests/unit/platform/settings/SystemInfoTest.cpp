@@ -85,10 +85,10 @@ TEST_F(SystemInfo, MissingFileIsMadeReadableForAll) {
   EXPECT_EQ(Status(kFile).st_mode & 07777, 0644u);
 }
 
-TEST_F(SystemInfo, ModeAndOwnerStay) {
+TEST_F(SystemInfo, ModeAndGroupStay) {
   Write(kFile, "a=1\n", 0640);
   if (IsRoot()) {
-    ASSERT_EQ(chown(Path(kFile).c_str(), 12, 34), 0);
+    ASSERT_EQ(chown(Path(kFile).c_str(), 0, 34), 0);
   }
   const struct stat before = Status(kFile);
   EXPECT_EQ(SetKey("a", "2"), 0);
