@@ -27,6 +27,8 @@ enum class Lookup {
 
 /// An output is unchanged unless the result is kFound.
 Lookup findAccount(const std::string& name, Account& account);
+/// The first account with this user id.
+Lookup findAccountById(uid_t uid, Account& account);
 Lookup findGroup(const std::string& name, gid_t& gid);
 /// Whether the group is the account's primary one or lists it. @return kFound, kAbsent (also when
 /// there is no such group) or kFailed

@@ -16,18 +16,17 @@ constexpr size_t kFirstSize = 1024;
 constexpr size_t kLargestEntry = 1 << 20;  // bytes
 constexpr int kMostGroups = 65536;         // the kernel's own limit
 
-/// Asks the name service for an entry by name.
-/// @param ask  getpwnam_r, getgrnam_r or getspnam_r
-template <typename Entry, typename Visit>
-Lookup askByName(const std::string& name, int (*ask)(const char*, Entry*, char*, size_t, Entry**),
-                 Visit visit) {
+/// Asks the name service for an entry by its name or number.
+/// @param ask  getpwnam_r, getpwuid_r, getgrnam_r or getspnam_r
+template <typename Key, typename Entry, typename Visit>
+Lookup askFor(Key key, int (*ask)(Key, Entry*, char*, size_t, Entry**), Visit visit) {
   std::vector<char> buffer(kFirstSize);
   Entry entry;
   Entry* found = nullptr;
-  int error = ask(name.c_str(), &entry, buffer.data(), buffer.size(), &found);
+  int error = ask(key, &entry, buffer.data(), buffer.size(), &found);
   while (error == ERANGE && buffer.size() < kLargestEntry) {
     buffer.resize(buffer.size() * 2);
-    error = ask(name.c_str(), &entry, buffer.data(), buffer.size(), &found);
+    error = ask(key, &entry, buffer.data(), buffer.size(), &found);
   }
   if (found != nullptr) {
     visit(*found);
@@ -39,18 +38,24 @@ Lookup askByName(const std::string& name, int (*ask)(const char*, Entry*, char*,
 }  // namespace
 
 Lookup findAccount(const std::string& name, Account& account) {
-  return askByName<passwd>(name, getpwnam_r, [&](const passwd& entry) {
+  return askFor(name.c_str(), getpwnam_r, [&](const passwd& entry) {
+    account = {entry.pw_name, entry.pw_uid, entry.pw_gid, entry.pw_dir, entry.pw_shell};
+  });
+}
+
+Lookup findAccountById(uid_t uid, Account& account) {
+  return askFor(uid, getpwuid_r, [&](const passwd& entry) {
     account = {entry.pw_name, entry.pw_uid, entry.pw_gid, entry.pw_dir, entry.pw_shell};
   });
 }
 
 Lookup findGroup(const std::string& name, gid_t& gid) {
-  return askByName<group>(name, getgrnam_r, [&](const group& entry) { gid = entry.gr_gid; });
+  return askFor(name.c_str(), getgrnam_r, [&](const group& entry) { gid = entry.gr_gid; });
 }
 
 Lookup findShadow(const std::string& name, ShadowEntry& entry) {
   const Lookup lookup =
-      askByName<spwd>(name, getspnam_r, [&](const spwd& found) { entry = ShadowEntry(found); });
+      askFor(name.c_str(), getspnam_r, [&](const spwd& found) { entry = ShadowEntry(found); });
   // To a process that may not read the file, its entries are as good as absent.
   const bool mayRead = lookup != Lookup::kAbsent ||
                        faccessat(AT_FDCWD, Paths::kShadow, R_OK, AT_EACCESS) == 0 ||

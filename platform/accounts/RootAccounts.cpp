@@ -121,6 +121,19 @@ Lookup findAccount(const std::string& name, Account& account) {
   return file->readable ? Lookup::kAbsent : Lookup::kFailed;
 }
 
+Lookup findAccountById(uid_t uid, Account& account) {
+  const auto file = accounts();
+  Account found;
+  if (anyLine(*file, [&](std::string_view entry, std::string_view rest) {
+        found.name = entry;
+        return readAccount(rest, found) && found.uid == uid;
+      })) {
+    account = std::move(found);
+    return Lookup::kFound;
+  }
+  return file->readable ? Lookup::kAbsent : Lookup::kFailed;
+}
+
 Lookup findGroup(const std::string& name, gid_t& gid) {
   const auto file = groups();
   gid_t found = 0;

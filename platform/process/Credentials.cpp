@@ -1,9 +1,11 @@
 #include <grp.h>
+#include <sys/stat.h>
 #include <sys/types.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
+#include <string>
 #include <vector>
 
 #include "platform/accounts/AccountDatabase.h"
@@ -59,6 +61,16 @@ bool switchAsRoot(const Account& account, bool keepPrivilege) {
   return false;
 }
 
+/// What others than the owner may write, or put there, would run as the owner and do their will.
+bool mayOthersChange(const std::string& path, const struct stat& info) {
+  const size_t slash = path.rfind('/');
+  const std::string directory = slash == std::string::npos ? "." : path.substr(0, slash + 1);
+  struct stat place {};
+  return stat(directory.c_str(), &place) != 0 ||
+         (place.st_uid != 0 && place.st_uid != info.st_uid) ||
+         ((info.st_mode | place.st_mode) & (S_IWGRP | S_IWOTH)) != 0;
+}
+
 }  // namespace
 }  // namespace QELO::Platform
 
@@ -91,4 +103,27 @@ bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
     return false;
   }
   return keepPrivilege || setIds(account, false);
+}
+
+bool InitCredentialsByExecutable(const char* path, bool keepPrivilege) {
+  using namespace QELO::Platform;
+  struct stat info {};
+  if (stat(path, &info) != 0 || !S_ISREG(info.st_mode)) {
+    WEBAPI_LOG(kSource, "there is no file %s", QELO::LogText(path).c_str());
+    errno = ENOENT;
+    return false;
+  }
+  if (mayOthersChange(path, info)) {
+    WEBAPI_LOG(kSource, "others may write %s", QELO::LogText(path).c_str());
+    errno = EPERM;
+    return false;
+  }
+  Account account;
+  if (findAccountById(info.st_uid, account) != Lookup::kFound) {
+    WEBAPI_LOG(kSource, "the owner of %s is no account: user id %u", QELO::LogText(path).c_str(),
+               info.st_uid);
+    errno = EPERM;
+    return false;
+  }
+  return ResetCredentialsByName(account.name.c_str(), keepPrivilege);
 }

@@ -314,6 +314,11 @@ bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
                                  : fake().credentialResult;
 }
 
+bool InitCredentialsByExecutable(const char* path, bool keepPrivilege) {
+  note("InitCredentialsByExecutable", path, keepPrivilege ? "keep" : "drop");
+  return fake().credentialResult;
+}
+
 bool QELO::CredRequestUtil::GetDecryptAESString(const std::string& key, const std::string& cipher,
                                                 std::string& plain) {
   note("GetDecryptAESString", key, cipher);

@@ -12,6 +12,12 @@
 ///         as they were
 WEBAPI_API bool ResetCredentialsByName(const char* name, bool keepPrivilege);
 
+/// Switches to the user whom a file belongs to, as ResetCredentialsByName() does: its code then
+/// does nothing that this user could not do anyway.
+/// @return false when there is no such file, others than its owner and root may change it, or its
+///         owner is no user of the host (logged)
+WEBAPI_API bool InitCredentialsByExecutable(const char* path, bool keepPrivilege);
+
 namespace QELO::CredRequestUtil {
 
 /// Deciphers AES text. @return false on failure

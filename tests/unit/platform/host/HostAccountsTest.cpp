@@ -19,6 +19,8 @@ TEST(HostAccounts, EveryUserOfTheHostIsFound) {
     ASSERT_EQ(findAccount(entry->pw_name, account), Lookup::kFound) << entry->pw_name;
     EXPECT_EQ(account.name, entry->pw_name);
     EXPECT_EQ(account.home, entry->pw_dir);
+    ASSERT_EQ(findAccountById(entry->pw_uid, account), Lookup::kFound) << entry->pw_uid;
+    EXPECT_EQ(account.uid, entry->pw_uid);
     ++count;
   }
   endpwent();
@@ -38,6 +40,7 @@ TEST(HostAccounts, UnknownNamesAreAbsent) {
   gid_t gid = 7;
   EXPECT_EQ(findAccount("nobody-of-this-name", account), Lookup::kAbsent);
   EXPECT_EQ(findAccount("", account), Lookup::kAbsent);
+  EXPECT_EQ(findAccountById(4123456789, account), Lookup::kAbsent);
   EXPECT_EQ(findGroup("no-group-of-this-name", gid), Lookup::kAbsent);
   EXPECT_EQ(gid, 7U);
 }

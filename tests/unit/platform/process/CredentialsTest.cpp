@@ -208,6 +208,94 @@ TEST_F(Credentials, OwnAccountWithoutPrivilegeLosesTheWayBack) {
             0);
 }
 
+/// A library in a directory of its own, and whose it is.
+class CredentialsByFile : public Credentials {
+ protected:
+  void SetUp() override {
+    Credentials::SetUp();
+    if (!IsSkipped()) {
+      ASSERT_EQ(mkdir(Path("libraries").c_str(), 0755), 0);
+      ASSERT_EQ(chmod(Path("libraries").c_str(), 0755), 0);
+      Write("libraries/check.so", "code", 0644);
+    }
+  }
+
+  static void Give(uid_t uid) { ASSERT_EQ(chown(library_.c_str(), uid, 0), 0); }
+  /// In a child: 0 when it became what `ids` says and can come back, 1 when refused, else 2.
+  static int Become(uid_t uid, gid_t gid) {
+    return InChild([&] {
+      const Ids before = Ids::Now();
+      if (!InitCredentialsByExecutable(library_.c_str(), true)) {
+        return Ids::Now() == before ? 1 : 2;
+      }
+      return geteuid() == uid && getegid() == gid && seteuid(0) == 0 ? 0 : 2;
+    });
+  }
+  static inline const std::string library_ = Path("libraries/check.so");
+};
+
+TEST_F(CredentialsByFile, AreThoseOfItsOwner) {
+  EXPECT_EQ(Become(0, 0), 0);
+  Give(1002);
+  EXPECT_EQ(Become(1002, 1002), 0);
+}
+
+TEST_F(CredentialsByFile, WithoutPrivilegeThereIsNoWayBack) {
+  Give(1003);
+  EXPECT_EQ(InChild([] {
+              return InitCredentialsByExecutable(library_.c_str(), false) && getuid() == 1003 &&
+                             seteuid(0) != 0
+                         ? 0
+                         : 1;
+            }),
+            0);
+}
+
+TEST_F(CredentialsByFile, OwnerHasToBeAnAccount) {
+  Give(54321);
+  EXPECT_EQ(Become(0, 0), 1);
+  EXPECT_EQ(InChild([] {
+              SyslogCapture::Clear();
+              InitCredentialsByExecutable(library_.c_str(), true);
+              return SyslogCapture::Count("is no account: user id 54321") == 1 ? 0 : 1;
+            }),
+            0);
+}
+
+TEST_F(CredentialsByFile, WhatOthersMayChangeGivesNone) {
+  Give(1002);
+  for (const mode_t mode : {0664, 0646}) {
+    ASSERT_EQ(chmod(library_.c_str(), mode), 0);
+    EXPECT_EQ(Become(1002, 1002), 1);
+  }
+  ASSERT_EQ(chmod(library_.c_str(), 0644), 0);
+  for (const mode_t mode : {0775, 0757, 01777}) {
+    ASSERT_EQ(chmod(Path("libraries").c_str(), mode), 0);
+    EXPECT_EQ(Become(1002, 1002), 1);
+  }
+  ASSERT_EQ(chmod(Path("libraries").c_str(), 0755), 0);
+  ASSERT_EQ(chown(Path("libraries").c_str(), 1003, 0), 0);
+  EXPECT_EQ(Become(1002, 1002), 1);
+  EXPECT_EQ(InChild([] {
+              SyslogCapture::Clear();
+              InitCredentialsByExecutable(library_.c_str(), true);
+              return SyslogCapture::Count("others may write ") == 1 ? 0 : 1;
+            }),
+            0);
+}
+
+TEST_F(CredentialsByFile, MissingFileAndDirectoryGiveNone) {
+  EXPECT_EQ(InChild([] {
+              SyslogCapture::Clear();
+              return !InitCredentialsByExecutable(Path("nothing.so").c_str(), true) &&
+                             !InitCredentialsByExecutable(Path("etc").c_str(), true) &&
+                             SyslogCapture::Count("there is no file ") == 2
+                         ? 0
+                         : 1;
+            }),
+            0);
+}
+
 using OwnCredentials = PrivateRoot;
 
 TEST_F(OwnCredentials, OrdinaryUserBecomesEveryAccountOfItsRoot) {
