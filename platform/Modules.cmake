@@ -30,6 +30,7 @@ if(NOT PAM_LIBRARY AND NOT WEBAPI_ROOT_PREFIX)
 endif()
 find_package(SQLite3 REQUIRED)
 find_package(OpenSSL REQUIRED COMPONENTS Crypto)
+find_package(CURL REQUIRED)
 
 webapi_platform_module(password_crypt SOURCES login/module/PasswordCrypt.cpp base/Secrets.cpp
                        LIBRARIES ${CRYPT_LIBRARY})
@@ -60,11 +61,13 @@ webapi_platform_module(tasks
           tasks/module/TaskDatabase.cpp tasks/module/TaskSchema.cpp tasks/module/Patience.cpp
           base/Secrets.cpp tasks/Id.cpp tasks/ProcessIdentity.cpp
   LIBRARIES SQLite::SQLite3)
+webapi_platform_module(relay SOURCES relay/module/RelayModule.cpp relay/module/Transfer.cpp
+                       LIBRARIES CURL::libcurl)
 
 if(WEBAPI_ROOT_PREFIX)
   set(password_module module_password_crypt)
 else()
   set(password_module module_password_pam)
 endif()
-install(TARGETS ${password_module} module_tokens module_tasks
+install(TARGETS ${password_module} module_tokens module_tasks module_relay
         LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/modules)

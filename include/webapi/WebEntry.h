@@ -96,9 +96,11 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// A client that is gone is no failure.
   void OutputHeader();
   void OutputBody();
-  /// Forwards the request to the host that its parameter "relay_zt" names. Not served yet: false
-  /// with error 109.
-  /// @return whether the other host's answer was printed; else the response has the error
+  /// Forwards the call to the host whose number its parameter "relay_zt" is, and prints that host's
+  /// answer behind the response's own header lines. The caller has to be logged in, or to have an
+  /// access token for the call; what else the API asks of its callers is the other host's to check.
+  /// @return whether the other host's answer was printed, and the response's output switched off;
+  ///         else the response has the error: of a check, or 109
   bool ProcessRelay(APIRequest* request, APIResponse* response);
 
  private:

@@ -18,6 +18,7 @@ inline constexpr char kTaskDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/tasks";
 inline constexpr char kGroupPreferenceDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/groups";
 inline constexpr char kAppPrivileges[] = WEBAPI_ROOT_PREFIX "/etc/webapi/appprivs.json";
 inline constexpr char kMimeTypes[] = WEBAPI_ROOT_PREFIX "/etc/mime.types";
+inline constexpr char kRelayHosts[] = WEBAPI_ROOT_PREFIX "/etc/webapi/relay.json";
 inline constexpr char kPasswd[] = WEBAPI_ROOT_PREFIX "/etc/passwd";
 inline constexpr char kGroup[] = WEBAPI_ROOT_PREFIX "/etc/group";
 inline constexpr char kShadow[] = WEBAPI_ROOT_PREFIX "/etc/shadow";

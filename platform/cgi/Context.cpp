@@ -55,6 +55,16 @@ ContextArea readCookies(std::string_view line) {
   return area;
 }
 
+/// An access token that came as a header, which web servers do not log as they do addresses: from
+/// here on it is where the token of a parameter is too, and the header is gone.
+void takeTokenHeader() {
+  constexpr char kHeader[] = "HTTP_X_QELO_ACCESS_TOKEN";
+  const char* token = getenv(kHeader);
+  if (token != nullptr && setenv("qeloAccessToken", token, 1) == 0) {
+    unsetenv(kHeader);
+  }
+}
+
 }  // namespace
 }  // namespace QELO::Platform
 
@@ -67,6 +77,7 @@ int QeloCgiInit(const char*, QeloCgiContext* context) {
     return 0;
   }
   storeArea(ContextArea{}, *context);
+  takeTokenHeader();
   return 1;
 }
 

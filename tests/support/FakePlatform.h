@@ -82,6 +82,13 @@ struct FakePlatform {
   bool sharingGood = false;
   bool sharingUrlKnown = true;  ///< false: the look-up fails, with an empty address
 
+  // Calls of other hosts: the index that queueing gives, what becomes of them.
+  int relayIndex = 0;
+  bool relayRuns = true;
+  int relayError = 0;
+  std::string relayAnswer;
+  std::string relayBody;  ///< what an upload's stream gave
+
   // Web server
   bool engineThrows = false;
 

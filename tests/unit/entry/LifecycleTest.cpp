@@ -298,12 +298,6 @@ TEST_F(EntryLifecycle, ClientThatIsGoneDoesNotEndTheProcess) {
   EXPECT_EQ(Calls("QLIBCProcFork"), 1);
 }
 
-TEST_F(EntryLifecycle, RelayIsAnsweredWith109) {
-  DescribeOpen();
-  Get(std::string(kEcho) + "&relay_zt=1");
-  EXPECT_EQ(Serve().Code(), 109);
-}
-
 // The entry names the process before it decides; dispatch once more, when the call has ended.
 TEST_F(EntryLifecycle, RelayIsNotDispatched) {
   DescribeOpen();

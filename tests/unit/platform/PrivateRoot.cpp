@@ -40,7 +40,7 @@ const std::string& pristineRoot() {
     fs::remove_all(root);
     EXPECT_EQ(run(std::string(PRIVATE_ROOT_SCRIPT) + " '" + root + "' > /dev/null"), 0);
     fs::create_directory(root + "/modules");
-    for (const char* module : {"password_crypt.so", "tokens.so"}) {
+    for (const char* module : {"password_crypt.so", "relay.so", "tokens.so"}) {
       fs::copy_file(fs::path(kBuiltModuleDir) / module, fs::path(root) / "modules" / module);
     }
     return root;
@@ -53,8 +53,9 @@ const std::string& pristineRoot() {
 void PrivateRoot::SetUp() {
   removeRoot();
   ASSERT_EQ(run("cp -a '" + pristineRoot() + "' '" + QELO::Paths::kRootPrefix + "'"), 0);
-  for (const char* name :
-       {"HTTP_COOKIE", "HTTP_X_QELO_TOKEN", "HTTP_X_REAL_IP", "HTTP_X_FORWARDED_FOR"}) {
+  for (const char* name : {"HTTP_COOKIE", "HTTP_X_QELO_TOKEN", "HTTP_X_REAL_IP",
+                           "HTTP_X_FORWARDED_FOR", "HTTP_X_QELO_RELAY", "HTTP_X_QELO_ACCESS_TOKEN",
+                           "QELO_WEBAPI_USERNAME", "qeloAccessToken"}) {
     unsetenv(name);
   }
   setenv("REMOTE_ADDR", kAddress, 1);

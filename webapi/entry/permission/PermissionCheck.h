@@ -32,6 +32,8 @@ class PermissionCheck {
   static bool SkipPermission(APIRequest* request);
   bool CheckPermission(APIRequest* request, APIResponse* response);
   int CheckPermission(bool allowTimeout);
+  /// Whether the last check let the caller in by an access token.
+  bool CameByToken() const { return now_ != nullptr && now_->byToken; }
 
  private:
   /// What was found with an allowance, so that the caller's request can hold it again.

@@ -160,4 +160,17 @@ TEST_F(CgiContext, TokenIsDemandedUnlessTheSettingSaysNo) {
   EXPECT_EQ(enabled(""), 1);
 }
 
+TEST_F(CgiContext, AccessTokenOfAHeaderBecomesTheVariable) {
+  QeloCgiContext context;
+  EXPECT_EQ(QeloCgiInit("", &context), 1);
+  EXPECT_EQ(getenv("qeloAccessToken"), nullptr);
+  setenv("HTTP_X_QELO_ACCESS_TOKEN", "T", 1);
+  setenv("qeloAccessToken", "before", 1);
+  EXPECT_EQ(QeloCgiInit("", &context), 1);
+  EXPECT_STREQ(getenv("qeloAccessToken"), "T");
+  EXPECT_EQ(getenv("HTTP_X_QELO_ACCESS_TOKEN"), nullptr);
+  EXPECT_EQ(QeloCgiInit("", &context), 1);
+  EXPECT_STREQ(getenv("qeloAccessToken"), "T");
+}
+
 }  // namespace
