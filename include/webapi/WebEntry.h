@@ -55,8 +55,10 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// @return false with 105, 106, 119, 150 or 160 set, and for all but the class and the privilege
   ///         a server error; with null arguments without
   bool CheckPermission(APIRequest* request, APIResponse* response) override;
-  /// Passes the upload of a method with "deferUpload", which reads it itself. Others are not served
-  /// yet: false with error 108 and {"upload_err": -9}.
+  /// Takes the upload in: its fields become parameters of the request, and its files are there as
+  /// APIUpload::GetFiles() tells. The call stays the one that was checked. The upload of a method
+  /// with "deferUpload", which reads it itself, is left alone.
+  /// @return false with error 108 and {"upload_err": an APIUpload::Result}
   bool HandleUpload(APIRequest* request, APIResponse* response) override;
   /// Whether the method runs in spite of what the check found: "authLevel" 2.
   bool SkipPermission(APIRequest* request) override;
@@ -81,7 +83,8 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// most and not be empty; standard input leads to /dev/null afterwards. What is sent too slowly
   /// is taken as far as it came.
   bool InitPostParam(Json::Value& section);
-  /// The call of an upload whose query does not name it. Not served yet: false.
+  /// The call of an upload whose query does not name it: the fields in front of its first file. The
+  /// request's CONTENT_LENGTH is that of the rest from then on.
   bool LoadUploadAPIDesc(Json::Value& section);
   /// A parameter line, "a=1&b=2", up to its first NUL: deciphered when it is enciphered, then the
   /// two envelopes of enciphered parameters opened. An inner one that cannot be is left out.
@@ -108,10 +111,12 @@ class WEBAPI_API WebEntry : public APIRunner {
   bool GatherEnvironment();
   void Serve();
   bool RewriteCredentials();
+  void RemoveUpload();
 
-  Json::Value spare_;                            ///< an array; not used
+  Json::Value temporaryFiles_;                   ///< paths of the upload's files, a list
   alignas(void*) unsigned char cgiContext_[60];  ///< the CGI library's, see Context()
   Json::Value permission_;  ///< "permResult": authorisation results, by CheckPermission(bool)
+  bool hasUpload_ = false;  ///< there may be temporary files
   std::unique_ptr<PermissionCheck> check_;  ///< over the members above
 };
 

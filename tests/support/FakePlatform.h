@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "tests/support/FakeUpload.h"
+
 /// The host's operations as unit tests want them: each answers what its field says, and the calls
 /// that matter are recorded. Linked in place of the embedded platform.
 struct FakePlatform {
@@ -95,4 +97,6 @@ struct FakePlatform {
   // File output
   int fileOutput = 0;      ///< result of each output
   bool fastOutput = true;  ///< the switch
+
+  FakeUpload upload;
 };

@@ -22,6 +22,7 @@
 #include "webapi/json/Literal.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"
+#include "webapi/platform/StringHash.h"
 #include "webapi/runner/CompoundCall.h"
 
 namespace QELO {
@@ -122,13 +123,21 @@ void answer(const APIResponse& response, UnreadBody& body) {
 
 }  // namespace
 
-WebEntry::WebEntry() : spare_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
+WebEntry::WebEntry()
+    : temporaryFiles_(Json::arrayValue), cgiContext_(), permission_(Json::objectValue) {
   static_assert(sizeof cgiContext_ == sizeof(QeloCgiContext));
   permission_[Literal("permResult")] = Json::Value(Json::arrayValue);
   check_ = std::make_unique<PermissionCheck>(*this, *Request(), Context(), permission_);
 }
 
-WebEntry::~WebEntry() = default;
+WebEntry::~WebEntry() {
+  guarded([this] { RemoveUpload(); });
+  QLIBSZHASH* fields = nullptr;
+  memcpy(&fields, cgiContext_, sizeof fields);
+  if (fields != nullptr) {
+    QLIBCSzHashFree(fields);
+  }
+}
 
 QeloCgiContext* WebEntry::Context() {
   return reinterpret_cast<QeloCgiContext*>(cgiContext_);
@@ -156,6 +165,7 @@ bool WebEntry::Run(const Json::Value&) {
   if (!guarded([this] { Serve(); })) {
     guarded([this] { Response()->SetError(WEBAPI_ERR_NO_ANSWER); });
   }
+  guarded([this] { RemoveUpload(); });  // a client that has its answer may have the process ended
   if (!guarded([&] { answer(*Response(), body); })) {
     // Of one of its own: what there was no memory for may stand in any part of the response.
     guarded([&] {
@@ -283,19 +293,19 @@ int WebEntry::CheckPermission(bool allowTimeout) {
 }
 
 bool WebEntry::InitParam(Json::Value& params) {
-  return Intake(*Request(), *Response()).InitParam(params);
+  return Intake(*Request(), *Response(), *Context()).InitParam(params);
 }
 
 bool WebEntry::InitGetParam(Json::Value& section) {
-  return Intake(*Request(), *Response()).InitGetParam(section);
+  return Intake(*Request(), *Response(), *Context()).InitGetParam(section);
 }
 
 bool WebEntry::InitPostParam(Json::Value& section) {
-  return Intake(*Request(), *Response()).InitPostParam(section);
+  return Intake(*Request(), *Response(), *Context()).InitPostParam(section);
 }
 
 bool WebEntry::LoadUploadAPIDesc(Json::Value& section) {
-  return Intake(*Request(), *Response()).LoadUploadAPIDesc(section);
+  return Intake(*Request(), *Response(), *Context()).LoadUploadAPIDesc(section);
 }
 
 bool WebEntry::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {

@@ -36,6 +36,21 @@ WEBAPI_API int QLIBCINFOSetKeyValue(const char* key, const char* value);
 WEBAPI_API int QELOFSMkdirP(const char* path, int keepExistingOwner, int reserved, uid_t uid,
                             gid_t gid, mode_t mode);
 
+/// A volume: a file system for users' data.
+struct QELOVolumeRecord {
+  char path[1024];
+};
+/// Finds a volume with room.
+/// @param size    bytes that it must have free
+/// @param volume  receives the volume
+/// @return 1 when there is one; 0 else, and `volume` is unchanged
+WEBAPI_API int VolumeAvailGet(unsigned long long size, struct QELOVolumeRecord* volume);
+
+/// Notes the last error of the process, for whoever asks with QLIBCErrGet().
+WEBAPI_API void QLIBCErrSetEx(int error, const char* file, int line);
+/// @return 0 when none was noted
+WEBAPI_API int QLIBCErrGet(void);
+
 /// Forks a background process: the child has /dev/null as descriptors 0, 1 and 2, so that nobody
 /// who waits for the end of our output waits for it. Buffered output is written first.
 /// @return as fork()

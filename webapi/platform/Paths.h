@@ -13,6 +13,9 @@ inline constexpr char kDescriptionDir[] = WEBAPI_ROOT_PREFIX "/usr/qelo/qeloman/
 inline constexpr char kLibDef[] = WEBAPI_ROOT_PREFIX "/usr/qelo/qeloman/webapi/lib.def";
 inline constexpr char kSystemInfo[] = WEBAPI_ROOT_PREFIX "/etc/qeloinfo.conf";
 inline constexpr char kSystemInfoDefaults[] = WEBAPI_ROOT_PREFIX "/etc.defaults/qeloinfo.conf";
+inline constexpr char kRoot[] = WEBAPI_ROOT_PREFIX "/";
+inline constexpr char kTmp[] = WEBAPI_ROOT_PREFIX "/tmp";
+inline constexpr char kVarTmp[] = WEBAPI_ROOT_PREFIX "/var/tmp";
 inline constexpr char kCounterDir[] = WEBAPI_ROOT_PREFIX "/var/spool/webapi";
 
 }  // namespace QELO::Paths

@@ -16,6 +16,7 @@
 #include "webapi/json/Literal.h"
 #include "webapi/model/request/CipherEnvelope.h"
 #include "webapi/platform/Cgi.h"
+#include "webapi/platform/Upload.h"
 #include "webapi/platform/WebAPIUtil.h"
 
 namespace QELO {
@@ -25,6 +26,8 @@ constexpr char kQueryString[] = "QUERY_STRING";
 constexpr char kUploadContentType[] = "text/plain; charset=\"UTF-8\"";
 constexpr char kEnvelope[] = "webapi";
 constexpr char kCipherToken[] = "__cIpHeRtOkEn";
+constexpr int kCallFields = 3;  ///< what names a call: API, version and method
+constexpr int kPartSize = 256;  ///< bytes of a part's header, and fields of an upload, as expected
 constexpr int kExceptionLine = 275;  ///< administrators' log filters know the message by this line
 
 /// The member `name` of the parameters, an object from now on.
@@ -95,9 +98,24 @@ bool Intake::InitPostParam(Json::Value& section) {
   }
 }
 
-/// None is read: uploads are not served yet.
-bool Intake::LoadUploadAPIDesc(Json::Value&) {
-  return false;
+bool Intake::LoadUploadAPIDesc(Json::Value& section) {
+  char part[kPartSize] = {};
+  unsigned long long positions[2] = {};
+  QLIBSZHASH* fields = nullptr;
+  memcpy(&fields, context_.block, sizeof fields);
+  if (fields == nullptr) {
+    fields = QLIBCSzHashAlloc(kPartSize);
+    memcpy(context_.block, &fields, sizeof fields);
+  } else {
+    QLIBCHashRemoveAll(fields);
+  }
+  if (QeloCgiLoadUploadNumParams(&context_, kCallFields, 0, positions, part, kPartSize) < 0) {
+    return false;
+  }
+  Json::Value environment(Json::objectValue);
+  environment["CONTENT_LENGTH"] = std::to_string(positions[1] - positions[0]);
+  request_.InitEnv(std::move(environment));
+  return WebAPIUtil::SzHashToJsonObj(fields, section);
 }
 
 bool Intake::DetectAndDecryptParamLine(const std::string& line, Json::Value& section) {

@@ -4,6 +4,8 @@
 
 #include <string>
 
+struct QeloCgiContext;
+
 namespace QELO {
 
 class APIRequest;
@@ -15,7 +17,9 @@ class Intake {
  public:
   /// @param request   has its environment
   /// @param response  receives error 101, and the content type of an upload's answer
-  Intake(APIRequest& request, APIResponse& response) : request_(request), response_(response) {}
+  /// @param context   its string hash receives the fields of an upload
+  Intake(APIRequest& request, APIResponse& response, QeloCgiContext& context)
+      : request_(request), response_(response), context_(context) {}
 
   bool InitParam(Json::Value& params);
   bool InitGetParam(Json::Value& section);
@@ -32,6 +36,7 @@ class Intake {
 
   APIRequest& request_;
   APIResponse& response_;
+  QeloCgiContext& context_;
 };
 
 }  // namespace QELO

@@ -1,15 +1,50 @@
-// The web entry's hook for uploads, which are not served yet: none is read here. A method that
-// reads its upload itself is called.
+// The web entry's hook for uploads.
+
+#include <sys/types.h>
+
+#include <string>
+#include <utility>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
+#include "webapi/APIUpload.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/WebEntry.h"
+#include "webapi/json/Literal.h"
+#include "webapi/platform/Core.h"
+#include "webapi/platform/Upload.h"
+#include "webapi/runner/CallName.h"
+#include "webapi/runner/execution/MethodAccount.h"
+#include "webapi/transfer/upload/TemporaryFiles.h"
 
 namespace QELO {
 namespace {
 
-constexpr int kUploadUnavailable = -9;  ///< "upload_err": the upload could not be converted
+/// The files shall belong to whom the method will run as.
+void setOwner(APIRequest& request, const Json::Value& attributes) {
+  uid_t uid = 0;
+  gid_t gid = 0;
+  const std::string account = MethodAccount(request, attributes);
+  if (!account.empty() && QELOUserGetUGID(account.c_str(), &uid, &gid) == 0) {
+    QeloCgiUploadOwnerSet(uid, gid);
+  }
+}
+
+/// Takes the fields into the request. The call stays the one that was checked, whatever they name.
+void takeFields(Json::Value&& params, APIRequest& request) {
+  const CallName call(request);
+  request.InitParam(std::move(params), false);
+  const CallName named(request);
+  if (named.api == call.api && named.version == call.version && named.method == call.method) {
+    return;
+  }
+  Json::Value checked(Json::objectValue);
+  Json::Value& names = checked[Literal("postParam")];
+  names["api"] = call.api;
+  names["version"] = call.version;
+  names["method"] = call.method;
+  request.InitParam(std::move(checked), false);
+}
 
 }  // namespace
 
@@ -17,13 +52,35 @@ bool WebEntry::HandleUpload(APIRequest* request, APIResponse* response) {
   if (request == nullptr || response == nullptr) {
     return false;
   }
+  hasUpload_ = true;
   if (GetMethodAttr(request, "deferUpload")) {
     return true;
   }
-  Json::Value errors(Json::objectValue);
-  errors["upload_err"] = kUploadUnavailable;
-  response->SetError(WEBAPI_ERR_UPLOAD_FAILED, errors);
-  return false;
+  setOwner(*request,
+           GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod()));
+  Json::Value params(Json::objectValue);
+  Json::Value& fields = params[Literal("postParam")];
+  fields = Json::Value(Json::objectValue);
+  const int result = APIUpload(request).GetUploadAll(fields, &temporaryFiles_);
+  if (result != APIUpload::DONE) {
+    Json::Value errors(Json::objectValue);
+    errors["upload_err"] = result;
+    response->SetError(WEBAPI_ERR_UPLOAD_FAILED, errors);
+    return false;
+  }
+  takeFields(std::move(params), *request);
+  return true;
+}
+
+void WebEntry::RemoveUpload() {
+  if (!hasUpload_) {
+    return;
+  }
+  hasUpload_ = false;
+  for (const Json::Value& file : APIUpload(Request()).GetFiles()) {
+    temporaryFiles_.append(file["path"]);
+  }
+  RemoveTemporaryFiles(temporaryFiles_);
 }
 
 }  // namespace QELO

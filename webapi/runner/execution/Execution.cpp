@@ -11,6 +11,7 @@
 #include "webapi/runner/CallName.h"
 #include "webapi/runner/execution/Credentials.h"
 #include "webapi/runner/execution/Fence.h"
+#include "webapi/runner/execution/MethodAccount.h"
 #include "webapi/runner/execution/Priority.h"
 #include "webapi/runner/execution/StandardStreams.h"
 #include "webapi/runner/execution/WorkingDirectory.h"
@@ -48,7 +49,6 @@ bool passesCheck(const _tag_API_CHECK_TABLE* table, const CallName& call, APIReq
 /// Takes the credentials that the description asks for.
 /// @param giveBack  receives whether they are given back after the call
 bool takeCredentials(APIRequest& request, const Json::Value& attributes, bool* giveBack) {
-  const APIDescription description(JsonHelper::member(request.Serialize(), "reqLib"));
   const bool keepPrivilege = APIDescription::IsSet(attributes, "grantable");
   *giveBack = keepPrivilege;
   if (APIDescription::IsSet(attributes, "grantByDefault")) {
@@ -59,20 +59,19 @@ bool takeCredentials(APIRequest& request, const Json::Value& attributes, bool* g
     }
     return true;
   }
+  const std::string account = MethodAccount(request, attributes);
   if (APIDescription::IsSet(attributes, "grantByUser")) {
-    const std::string user = request.GetLoginUserName();
-    if (user.empty()) {
+    if (account.empty()) {
       WEBAPI_LOG("APIRunner.cpp", "grantByUser: failed to get login username.");
       return false;
     }
-    if (!Credentials::BecomeUser(user, keepPrivilege)) {
+    if (!Credentials::BecomeUser(account, keepPrivilege)) {
       WEBAPI_LOG("APIRunner.cpp", "grantByUser failed. [%m]");
       return false;
     }
     return true;
   }
-  const std::string runAs = description.GetRunAs(attributes);
-  if (!Credentials::BecomeUser(runAs, keepPrivilege)) {
+  if (!Credentials::BecomeUser(account, keepPrivilege)) {
     WEBAPI_LOG("APIRunner.cpp", "grantable failed. [%m]");
     return false;
   }

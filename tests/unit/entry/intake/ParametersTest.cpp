@@ -210,13 +210,44 @@ TEST_F(ParameterIntake, UploadNamedInTheQueryLeavesTheBodyUnread) {
   EXPECT_EQ(entry_.Response()->GetHeader("Content-type", ""), "text/plain; charset=\"UTF-8\"");
 }
 
-TEST_F(ParameterIntake, UploadNotNamedInTheQuerySets101) {
+TEST_F(ParameterIntake, UploadWhoseFieldsCannotBeReadSets101) {
   Post("--x\r\nbody");
   Set("CONTENT_TYPE", "multipart/form-data; boundary=x");
   Set("QUERY_STRING", "api=x&version=1");
+  platform->upload.fields = -3;
   EXPECT_FALSE(Take());
   EXPECT_EQ(Code(), 101);
   EXPECT_EQ(entry_.Response()->GetHeader("Content-type", ""), "text/plain; charset=\"UTF-8\"");
+}
+
+TEST_F(ParameterIntake, UploadNamesItsCallInTheFieldsInFrontOfItsFile) {
+  Post("--x\r\nbody");
+  Set("CONTENT_TYPE", "multipart/form-data; boundary=x");
+  Set("QUERY_STRING", "api=x&version=1");
+  platform->upload.parameters = {{"method", "m"}, {"n", "5"}};
+  platform->upload.positions[0] = 5'000'000'000;
+  platform->upload.positions[1] = 12'000'000'000;
+  EXPECT_TRUE(Take());
+  EXPECT_EQ(params_["postParam"], Parse(R"({"method": "m", "n": 5})"));
+  EXPECT_EQ(entry_.Request()->GetEnv("CONTENT_LENGTH"), "7000000000");
+  EXPECT_EQ(platform->calls.back(), "QeloCgiLoadUploadNumParams(3, 0, 256)");
+  // The context's hash is emptied for the next one.
+  platform->upload.parameters = {{"k", "v"}};
+  Json::Value section(Json::objectValue);
+  EXPECT_TRUE(entry_.LoadUploadAPIDesc(section));
+  EXPECT_EQ(section, Parse(R"({"k": "v"})"));
+}
+
+TEST_F(ParameterIntake, UploadWhoseFieldsHoldTooManyValuesSets101) {
+  Post("--x\r\nbody");
+  Set("CONTENT_TYPE", "multipart/form-data; boundary=x");
+  std::string many = "[0";
+  for (int i = 0; i < 50'000; ++i) {
+    many += ",0";
+  }
+  platform->upload.parameters = {{"many", many + "]"}};
+  EXPECT_FALSE(Take());
+  EXPECT_EQ(Code(), 101);
 }
 
 TEST_F(ParameterIntake, UploadIsNoPost) {

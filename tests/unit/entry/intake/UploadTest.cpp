@@ -1,12 +1,18 @@
-// Uploads: whether the web entry reads one or leaves it to the method.
+// Uploads: whether the web entry reads one or leaves it to the method, and what becomes of it.
 
 #include "tests/support/CgiFixture.h"
 
 namespace QELO {
 namespace {
 
+constexpr char kTaken[] = R"({"allowUpload": true, "grantByDefault": true})";
+
 class UploadIntake : public CgiTest {
  protected:
+  void SetUp() override {
+    CgiTest::SetUp();
+    platform->upload.volume = directory;
+  }
   CgiAnswer Upload(const std::string& attributes) {
     Describe(R"({"authLevel": 0})", attributes);
     Post("--x\r\nbody");
@@ -22,12 +28,92 @@ TEST_F(UploadIntake, MethodThatReadsItItselfFindsTheBodyUnread) {
   EXPECT_TRUE(answer.Json()["success"].asBool());
   EXPECT_TRUE(answer.HasLine("Content-type: text/plain; charset=\"UTF-8\""));
   EXPECT_EQ(RestOfInput(), "--x\r\nbody");
+  EXPECT_EQ(Calls("QeloCgiLoadUploadAll"), 0);
 }
 
-TEST_F(UploadIntake, UploadThatCannotBeReadSets108) {
-  const CgiAnswer answer = Upload(R"({"allowUpload": true, "grantByDefault": true})");
-  EXPECT_EQ(answer.Json(),
-            Parse(R"({"success": false, "error": {"code": 108, "errors": {"upload_err": -9}}})"));
+TEST_F(UploadIntake, FieldsAndFilesBecomeParameters) {
+  platform->upload.parameters = {{"n", "5"}, {"f", "a.txt"}};
+  platform->upload.files = {{"f", "/nonexistent/one"}};
+  const CgiAnswer answer = Upload(kTaken);
+  EXPECT_EQ(answer.Json()["data"],
+            Parse(R"({"api": "QELO.Test.Good", "version": 1, "method": "echo", "n": 5,
+                      "f": "/nonexistent/one"})"));
+  EXPECT_EQ(platform->upload.directory, directory.string() + "/@tmp");
+}
+
+TEST_F(UploadIntake, FieldsThatNameAnotherCallLeaveTheOneThatWasChecked) {
+  platform->upload.parameters = {{"api", "QELO.Other"}, {"version", "7"}, {"method", "fail"}};
+  EXPECT_EQ(Upload(kTaken).Json()["data"],
+            Parse(R"({"api": "QELO.Test.Good", "version": 1, "method": "echo"})"));
+}
+
+TEST_F(UploadIntake, EncipheredFieldsThatNameAnotherCallLeaveTheOneThatWasChecked) {
+  platform->upload.parameters = {{"__cIpHeRtExT", "api=QELO.Other&method=fail&k=v"}};
+  platform->decryptParam = [](char*) { return 1; };
+  const Json::Value data = Upload(kTaken).Json()["data"];
+  EXPECT_EQ(data["k"], "v");
+  EXPECT_EQ(data["api"], "QELO.Test.Good");
+}
+
+TEST_F(UploadIntake, FilesAreRemovedWhenTheRequestEnds) {
+  const std::string path = directory / "one";
+  const std::string folder = directory / "folder";
+  std::ofstream(path) << "content";
+  std::filesystem::create_directory(folder);
+  platform->upload.files = {{"f", path}, {"g", folder}};
+  Upload(kTaken);
+  EXPECT_FALSE(std::filesystem::exists(path));
+  EXPECT_TRUE(std::filesystem::exists(folder));
+}
+
+TEST_F(UploadIntake, FilesOfALoadThatFailedAreRemovedToo) {
+  const std::string path = directory / "one";
+  std::ofstream(path) << "content";
+  platform->upload.files = {{"f", path}};
+  platform->upload.all = -7;
+  EXPECT_EQ(Upload(kTaken).Json(),
+            Parse(R"({"success": false, "error": {"code": 108, "errors": {"upload_err": -7}}})"));
+  EXPECT_FALSE(std::filesystem::exists(path));
+}
+
+TEST_F(UploadIntake, FilesAreGivenToWhomTheMethodRunsAs) {
+  platform->userGetUGID = [](const std::string& name, uid_t* uid, gid_t* gid) {
+    *uid = name == "root" ? 0 : name == "system" ? 900 : name == "other" ? 901 : 1;
+    *gid = *uid + 1000;
+    return 0;
+  };
+  Upload(kTaken);
+  EXPECT_EQ(platform->upload.owner, 0U);
+  Upload(R"({"allowUpload": true})");
+  EXPECT_EQ(platform->upload.owner, 900U);
+  EXPECT_EQ(platform->upload.group, 1900U);
+  Upload(R"({"allowUpload": true, "runAs": "other"})");
+  EXPECT_EQ(platform->upload.owner, 901U);
+}
+
+TEST_F(UploadIntake, FilesForNobodyAreNotGivenAway) {
+  platform->userGetUGID = [](const std::string&, uid_t*, gid_t*) { return -1; };
+  Upload(kTaken);
+  Upload(R"({"allowUpload": true, "grantByUser": true})");  // nobody is logged in
+  EXPECT_EQ(platform->upload.owner, static_cast<uid_t>(-1));
+}
+
+TEST_F(UploadIntake, WithoutALengthSets108) {
+  Describe(R"({"authLevel": 0})", kTaken);
+  Set("REQUEST_METHOD", "POST");
+  Set("CONTENT_TYPE", "multipart/form-data; boundary=x");
+  Set("QUERY_STRING", "api=QELO.Test.Good&version=1&method=echo");
+  EXPECT_EQ(Serve().Json(),
+            Parse(R"({"success": false, "error": {"code": 108, "errors": {"upload_err": -6}}})"));
+}
+
+TEST_F(UploadIntake, SliceOfAFileIsAnUpload) {
+  Describe(R"({"authLevel": 0})", kTaken);
+  Post("content");
+  Set("HTTP_X_TYPE_NAME", "sliceupload");
+  Set("QUERY_STRING", "api=QELO.Test.Good&version=1&method=echo");
+  EXPECT_TRUE(Serve().Json()["success"].asBool());
+  EXPECT_EQ(Calls("QeloCgiLoadUploadAll"), 1);
 }
 
 TEST_F(UploadIntake, UploadToAMethodThatTakesNoneSets115) {

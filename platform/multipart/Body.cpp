@@ -1,0 +1,50 @@
+#include "platform/multipart/Body.h"
+
+#include <poll.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+
+#include "webapi/platform/Upload.h"
+
+namespace QELO::Platform {
+namespace {
+
+bool hasAWriter(int descriptor) {
+  struct stat info {};
+  return fstat(descriptor, &info) != 0 || !S_ISREG(info.st_mode);
+}
+
+}  // namespace
+
+Body::Body(int descriptor, uint64_t length, std::chrono::milliseconds idleLimit)
+    : descriptor_(descriptor),
+      length_(length),
+      left_(length),
+      idleLimit_(idleLimit),
+      mayBlock_(hasAWriter(descriptor)) {}
+
+int64_t Body::Read(char* buffer, size_t size) {
+  const size_t wanted = static_cast<size_t>(std::min<uint64_t>(size, left_));
+  while (wanted > 0) {
+    if (mayBlock_) {
+      pollfd input{descriptor_, POLLIN, 0};
+      if (TEMP_FAILURE_RETRY(poll(&input, 1, static_cast<int>(idleLimit_.count()))) <= 0) {
+        return QELO_UPLOAD_BROKEN_OFF;
+      }
+    }
+    const ssize_t count = TEMP_FAILURE_RETRY(read(descriptor_, buffer, wanted));
+    if (count > 0) {
+      left_ -= static_cast<uint64_t>(count);
+      return count;
+    }
+    if (count == 0 || errno != EAGAIN) {
+      return QELO_UPLOAD_BROKEN_OFF;
+    }
+  }
+  return 0;
+}
+
+}  // namespace QELO::Platform

@@ -1,0 +1,30 @@
+#pragma once
+
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+
+namespace QELO::Platform {
+
+/// The body of a request on a descriptor: as many bytes as were announced.
+class Body {
+ public:
+  /// @param idleLimit  how long the client may send nothing
+  Body(int descriptor, uint64_t length, std::chrono::milliseconds idleLimit);
+
+  /// Reads some. @return how many bytes; 0 when all announced ones have been read; a negative
+  /// QeloUploadResult when the client broke off, stalls, or the descriptor cannot be read
+  int64_t Read(char* buffer, size_t size);
+
+  uint64_t Length() const { return length_; }
+  uint64_t Received() const { return length_ - left_; }
+
+ private:
+  int descriptor_;
+  uint64_t length_;
+  uint64_t left_;
+  std::chrono::milliseconds idleLimit_;
+  bool mayBlock_;  ///< a pipe or a socket, at whose other end somebody may stall
+};
+
+}  // namespace QELO::Platform
