@@ -6,7 +6,9 @@
 #include <time.h>
 
 #include <cerrno>
+#include <functional>
 #include <string>
+#include <utility>
 
 #include "webapi/platform/Core.h"
 
@@ -32,18 +34,26 @@ bool isOlder(const struct stat& info, long age) {
   return time(nullptr) - info.st_mtim.tv_sec > age;
 }
 
-/// Whether nobody looked lately; notes that we do now.
-bool mayPurge(int dir, long pause) {
+/// Notes that we look now. Its size is the number of names that were there the last time.
+/// @param names  receives that number
+/// @return none when somebody looked lately
+UniqueFd openMark(int dir, long pause, size_t& names) {
   struct stat info {};
-  if (pause <= 0) {
-    return true;
+  const bool known = fstatat(dir, kPurgeMark, &info, AT_SYMLINK_NOFOLLOW) == 0;
+  names = known ? static_cast<size_t>(info.st_size) : 0;
+  if (known && pause > 0 && !isOlder(info, pause)) {
+    return UniqueFd();
   }
-  if (fstatat(dir, kPurgeMark, &info, AT_SYMLINK_NOFOLLOW) == 0 && !isOlder(info, pause)) {
-    return false;
-  }
-  const UniqueFd mark(
+  UniqueFd mark(
       openat(dir, kPurgeMark, O_WRONLY | O_CREAT | O_NOFOLLOW | O_CLOEXEC, S_IRUSR | S_IWUSR));
-  return mark && futimens(mark.Get(), nullptr) == 0;
+  return mark && futimens(mark.Get(), nullptr) == 0 ? std::move(mark) : UniqueFd();
+}
+
+/// Whether this file may go.
+bool isStale(int dir, const char* name, long age) {
+  struct stat info {};
+  return fstatat(dir, name, &info, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(info.st_mode) &&
+         isOlder(info, age);
 }
 
 }  // namespace
@@ -65,25 +75,37 @@ UniqueFd openPrivateDir(const char* path, bool create) {
   return dir;
 }
 
-bool purgeFiles(int dir, long age, long pause) {
-  if (!mayPurge(dir, pause)) {
-    return false;
-  }
-  UniqueFd readable(openat(dir, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+PurgeShare::PurgeShare(size_t names) : shares_(names / kMost + 1), drawn_(0) {
+  timespec now{};
+  clock_gettime(CLOCK_MONOTONIC, &now);
+  drawn_ = static_cast<size_t>(now.tv_nsec) % shares_;
+}
+
+bool PurgeShare::Has(std::string_view name) const {
+  return shares_ == 1 || std::hash<std::string_view>()(name) % shares_ == drawn_;
+}
+
+std::optional<PurgeShare> purgeFiles(int dir, long age, long pause) {
+  size_t names = 0;
+  const UniqueFd mark = openMark(dir, pause, names);
+  UniqueFd readable(mark ? openat(dir, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC) : -1);
   DIR* stream = readable ? fdopendir(readable.Get()) : nullptr;
   if (stream == nullptr) {
-    return false;
+    return std::nullopt;
   }
   readable.Release();  // closedir closes it
+  const PurgeShare share(names);
+  names = 0;
   while (const dirent* entry = readdir(stream)) {
-    struct stat info {};
-    if (entry->d_name[0] != '.' && fstatat(dir, entry->d_name, &info, AT_SYMLINK_NOFOLLOW) == 0 &&
-        S_ISREG(info.st_mode) && isOlder(info, age)) {
+    ++names;
+    if (entry->d_name[0] != '.' && share.Has(entry->d_name) && isStale(dir, entry->d_name, age)) {
       unlinkat(dir, entry->d_name, 0);
+      --names;
     }
   }
   closedir(stream);
-  return true;
+  [[maybe_unused]] const int kept = ftruncate(mark.Get(), static_cast<off_t>(names));
+  return share;
 }
 
 }  // namespace QELO::Platform

@@ -1,5 +1,9 @@
 #pragma once
 
+#include <cstddef>
+#include <optional>
+#include <string_view>
+
 #include "webapi/base/UniqueFd.h"
 
 namespace QELO::Platform {
@@ -11,10 +15,26 @@ namespace QELO::Platform {
 ///         may use the directory
 UniqueFd openPrivateDir(const char* path, bool create);
 
+/// Which names of a directory one purge looks at: all of them, or of many a share that is drawn
+/// anew each time, so that whoever's call happens to purge does not wait for thousands.
+class PurgeShare {
+ public:
+  /// Names that one purge looks at, about.
+  static constexpr size_t kMost = 5000;
+
+  /// @param names  that the directory has, about
+  explicit PurgeShare(size_t names);
+  bool Has(std::string_view name) const;
+
+ private:
+  size_t shares_;
+  size_t drawn_;
+};
+
 /// Removes the regular files that were last written more than `age` seconds ago, but those whose
-/// name starts with a dot.
+/// name starts with a dot, within the share that is drawn.
 /// @param pause  nothing is done when this was called less than so many seconds ago
-/// @return whether it was done
-bool purgeFiles(int dir, long age, long pause);
+/// @return the share that was looked at, or none when it was not done
+std::optional<PurgeShare> purgeFiles(int dir, long age, long pause);
 
 }  // namespace QELO::Platform

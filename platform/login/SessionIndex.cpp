@@ -97,13 +97,13 @@ void SessionIndex::Cap(size_t limit, const std::string& kept) const {
   }
 }
 
-void SessionIndex::Purge(int store) {
+void SessionIndex::Purge(int store, const PurgeShare& share) {
   const UniqueFd users = openDir(store, kUsersDir);
   if (!users) {
     return;
   }
-  forEachEntry(users.Get(), [&users, store](const char* user) {
-    const UniqueFd dir = openDir(users.Get(), user);
+  forEachEntry(users.Get(), [&users, store, &share](const char* user) {
+    const UniqueFd dir = share.Has(user) ? openDir(users.Get(), user) : UniqueFd();
     if (dir) {
       forEachEntry(dir.Get(), [&dir, store](const char* id) {
         struct stat info {};

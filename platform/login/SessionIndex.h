@@ -4,6 +4,7 @@
 
 #include <string>
 
+#include "platform/base/PrivateDir.h"
 #include "webapi/base/UniqueFd.h"
 
 namespace QELO::Platform {
@@ -24,8 +25,8 @@ class SessionIndex {
   /// @param kept  the session that is not looked at: it has just been made
   void Cap(size_t limit, const std::string& kept) const;
 
-  /// Frees the files of all accounts that are no sessions any more.
-  static void Purge(int store);
+  /// Frees the files of the accounts within a share that are no sessions any more.
+  static void Purge(int store, const PurgeShare& share);
 
  private:
   int store_;

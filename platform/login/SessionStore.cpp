@@ -165,8 +165,10 @@ bool SessionStore::Remove(const std::string& id) const {
 }
 
 void SessionStore::Purge(int timeout, int pause) const {
-  if (dir_ && purgeFiles(dir_.Get(), kPurgeFactor * timeout, pause)) {
-    SessionIndex::Purge(dir_.Get());
+  const std::optional<PurgeShare> share =
+      dir_ ? purgeFiles(dir_.Get(), kPurgeFactor * timeout, pause) : std::nullopt;
+  if (share) {
+    SessionIndex::Purge(dir_.Get(), *share);
   }
 }
 
