@@ -17,8 +17,8 @@ class Call {
 
   Call(QELO::APIRequest* request, QELO::APIResponse* response);
 
-  QELO::APIRequest& Request() { return *request_; }
-  QELO::APIResponse& Response() { return *response_; }
+  QELO::APIRequest& Request() const { return *request_; }
+  QELO::APIResponse& Response() const { return *response_; }
   const Shares& SharedFolders() const { return shares_; }
 
   /// The parameter `name`, a path. @return false when it was refused, which is the answer

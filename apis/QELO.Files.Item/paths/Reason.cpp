@@ -35,6 +35,7 @@ constexpr Word kWords[] = {
     {Reason::kShareItself, "share_itself"},
     {Reason::kFailed, "failed"},
     {Reason::kTooManyTasks, "too_many_tasks"},
+    {Reason::kNoHome, "no_home"},
 };
 
 struct Meaning {

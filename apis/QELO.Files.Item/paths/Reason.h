@@ -28,6 +28,7 @@ enum class Reason : int {
   kShareItself = 420,
   kFailed = 421,
   kTooManyTasks = 422,
+  kNoHome = 423,
 };
 
 /// The word that clients see beside the code, as "not_found".

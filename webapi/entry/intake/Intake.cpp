@@ -23,6 +23,7 @@ namespace QELO {
 namespace {
 
 constexpr char kQueryString[] = "QUERY_STRING";
+constexpr char kResumableVersion[] = "HTTP_TUS_RESUMABLE";
 constexpr char kUploadContentType[] = "text/plain; charset=\"UTF-8\"";
 constexpr char kEnvelope[] = "webapi";
 constexpr char kCipherToken[] = "__cIpHeRtOkEn";
@@ -54,6 +55,10 @@ bool Intake::InitParam(Json::Value& params) {
     return false;
   }
   if (request_.GetRequestMethod() != APIRequest::METHOD_POST) {
+    return true;
+  }
+  // A client of resumable uploads sends a piece of a file, or nothing; the method reads that.
+  if (request_.HasEnv(kResumableVersion) && namesCall(JsonHelper::member(params, "getParam"))) {
     return true;
   }
   bool taken = false;

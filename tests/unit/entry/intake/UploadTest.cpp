@@ -116,6 +116,28 @@ TEST_F(UploadIntake, SliceOfAFileIsAnUpload) {
   EXPECT_EQ(Calls("QeloCgiLoadUploadAll"), 1);
 }
 
+TEST_F(UploadIntake, PieceOfAResumableUploadIsNoParameterAndMayBeEmpty) {
+  for (const std::string body : {"piece=1&of=2", ""}) {
+    Describe(R"({"authLevel": 0})",
+             R"({"allowUpload": true, "deferUpload": true, "grantByDefault": true})");
+    Post(body);
+    Set("CONTENT_TYPE", "application/offset+octet-stream");
+    Set("HTTP_TUS_RESUMABLE", "1.0.0");
+    Set("QUERY_STRING", "api=QELO.Test.Good&version=1&method=echo");
+    const CgiAnswer answer = Serve();
+    EXPECT_TRUE(answer.Json()["success"].asBool());
+    EXPECT_TRUE(answer.Json()["data"]["param"]["piece"].isNull());
+    EXPECT_EQ(RestOfInput(), body);
+  }
+}
+
+TEST_F(UploadIntake, ResumableUploadThatNamesItsCallInTheBodyIsReadAsAnyOther) {
+  Describe(R"({"authLevel": 0})", R"({"grantByDefault": true})");
+  Post("api=QELO.Test.Good&version=1&method=echo");
+  Set("HTTP_TUS_RESUMABLE", "1.0.0");
+  EXPECT_TRUE(Serve().Json()["success"].asBool());
+}
+
 TEST_F(UploadIntake, UploadToAMethodThatTakesNoneSets115) {
   EXPECT_EQ(Upload(R"({"grantByDefault": true})").Code(), 115);
 }

@@ -1,0 +1,116 @@
+// The body of a request as it arrives, into the unfinished file.
+
+#include <poll.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <memory>
+
+#include "calls/Call.h"
+#include "transfer/Digest.h"
+#include "transfer/Library.h"
+#include "tus/Base64.h"
+#include "tus/Exchange.h"
+
+namespace files {
+namespace {
+
+constexpr size_t kPiece = 256 << 10;   ///< bytes that are read at once
+constexpr int kIdleLimit = 60 * 1000;  ///< milliseconds without a byte, after which it is over
+constexpr char kMismatch[] = "460";    ///< the protocol's own status
+
+/// Some bytes of the request's body. @return 0 at its end, and when no more come
+ssize_t readSome(char* buffer, size_t size) {
+  pollfd input{STDIN_FILENO, POLLIN, 0};
+  if (TEMP_FAILURE_RETRY(poll(&input, 1, kIdleLimit)) <= 0) {
+    return 0;
+  }
+  return std::max<ssize_t>(TEMP_FAILURE_RETRY(read(STDIN_FILENO, buffer, size)), 0);
+}
+
+/// @return 0 or errno
+int writeAll(int file, const char* data, size_t size, uint64_t at) {
+  while (size > 0) {
+    const ssize_t count = TEMP_FAILURE_RETRY(pwrite(file, data, size, static_cast<off_t>(at)));
+    if (count < 0) {
+      return errno;
+    }
+    data += count;
+    size -= static_cast<size_t>(count);
+    at += static_cast<uint64_t>(count);
+  }
+  return 0;
+}
+
+/// Writes what comes behind the file's first `length` bytes, up to `end`.
+/// @param isMore  whether the client sent more than that
+/// @return 0 or errno
+int receive(int file, uint64_t end, Digest* digest, uint64_t& length, bool& isMore) {
+  const std::unique_ptr<char[]> buffer(new char[kPiece]);
+  isMore = false;
+  while (true) {
+    const size_t room = std::min<uint64_t>(kPiece, end - length + 1);  // one more shows more
+    const ssize_t count = readSome(buffer.get(), room);
+    const size_t taken = std::min<uint64_t>(static_cast<uint64_t>(count), end - length);
+    if (const int error = writeAll(file, buffer.get(), taken, length); error != 0) {
+      return error;
+    }
+    if (digest != nullptr) {
+      digest->Add(buffer.get(), taken);
+    }
+    length += taken;
+    isMore = static_cast<size_t>(count) > taken;
+    if (count == 0 || isMore) {
+      return 0;
+    }
+  }
+}
+
+}  // namespace
+
+bool Exchange::Receive(const UploadState& state, const UploadData& data, uint64_t& length) {
+  bool isMore = false;
+  if (const int error = receive(data.Get(), state.length, nullptr, length, isMore); error != 0) {
+    return Refuse(reasonOf(error), state.path.Text());
+  }
+  if (isMore) {
+    return Refuse(Reason::kTooLarge, state.path.Text());
+  }
+  return true;
+}
+
+/// What was written counts when the checksum is that of the client, and not before, so that a
+/// process that dies in the middle leaves nothing unchecked behind.
+bool Exchange::ReceiveChecked(UploadState& state, const UploadData& data, uint64_t& length) {
+  const std::string header = Header("HTTP_UPLOAD_CHECKSUM");
+  const size_t blank = std::min(header.find(' '), header.size());
+  std::string expected;
+  const auto make = reinterpret_cast<MakeDigest>(findInLibrary(kDigestLibrary, kMakeDigest));
+  const std::unique_ptr<Digest> digest(make != nullptr ? make(header.substr(0, blank).c_str())
+                                                       : nullptr);
+  if (digest == nullptr || blank == header.size() ||
+      !decodeBase64(std::string_view(header).substr(blank + 1), expected)) {
+    Answer("400");
+    return false;
+  }
+  state.checkedLength = static_cast<int64_t>(length);
+  if (!store_.Save(id_, state)) {
+    return Refuse(Reason::kFailed, state.path.Text());
+  }
+  bool isMore = false;
+  const int error = receive(data.Get(), state.length, digest.get(), length, isMore);
+  const bool isRight = error == 0 && !isMore && digest->Finish() == expected;
+  if (!isRight) {
+    if (!Settle(state, data)) {
+      return false;
+    }
+    return error != 0 ? Refuse(reasonOf(error), state.path.Text())
+                      : Refuse(isMore ? "413" : kMismatch,
+                               isMore ? Reason::kTooLarge : Reason::kChanged, state.path.Text());
+  }
+  state.checkedLength = -1;
+  return store_.Save(id_, state) || Refuse(Reason::kFailed, state.path.Text());
+}
+
+}  // namespace files
