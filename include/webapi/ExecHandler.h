@@ -2,6 +2,9 @@
 
 #include <json/json.h>
 
+#include <cstddef>
+#include <string>
+
 #include "webapi/APIRunner.h"
 #include "webapi/Export.h"
 
@@ -44,11 +47,21 @@ class WEBAPI_API ExecHandler {
   /// Makes the call in a child and waits for its answer; 117 when none comes.
   void RunFork();
   /// As RunFork(), and writes what the method prints behind its header lines to the call's
-  /// descriptor, while the child runs. Header lines that do not end within the first 4095 bytes
+  /// descriptor, while the child runs. A method that sends a download answers "HTTP_RANGE" and
+  /// "HTTP_IF_RANGE" of the call's environment, and no condition of a request that this process
+  /// may be serving. Header lines that do not end within the first 4095 bytes
   /// take all of the output with them. A descriptor that takes no more loses the rest (logged).
   void RunForkForStdout();
 
+ protected:
+  /// For who watches what RunForkForStdout() gets. The header block, with its empty line, before
+  /// what stands behind it is written to the descriptor.
+  virtual void OutputBegins(const std::string& head);
+  /// So many bytes more are written.
+  virtual void OutputGrows(size_t bytes);
+
  private:
+  int CopyBody(Pipe& output, int fd);
   void Fail(int code);
   /// An exception must end the child here: the code around the caller is the parent's.
   [[noreturn]] void RunChild(Pipe& result) noexcept;

@@ -1,5 +1,6 @@
 #include "platform/fileoutput/Writer.h"
 
+#include <fcntl.h>
 #include <poll.h>
 #include <stdio_ext.h>
 #include <sys/sendfile.h>
@@ -16,7 +17,10 @@ namespace QELO::Platform {
 namespace {
 
 constexpr char kSource[] = "FileOutputer.cpp";
-constexpr size_t kChunk = 65536;           ///< bytes that go through the process at once
+constexpr size_t kChunk = 65536;  ///< bytes that go through the process at once
+/// Bytes that a pipe to the web server may hold: each time it is full or empty the two wait for
+/// each other. All pipes of a user have 64 MiB before the kernel makes new ones small.
+constexpr int kPipeRoom = 262144;
 constexpr size_t kMostAtOnce = 1U << 30U;  ///< bytes of one call that send within the kernel
 
 /// @return false
@@ -45,6 +49,9 @@ bool Writer::WriteText(std::string_view text) {
 }
 
 bool Writer::SendFile(int file, off_t start, off_t length) {
+  if (length > kPipeRoom) {
+    fcntl(STDOUT_FILENO, F_SETPIPE_SZ, kPipeRoom);  // not where it is no pipe, or there is no room
+  }
   off_t position = start;
   const off_t end = start + length;
   while (position < end) {

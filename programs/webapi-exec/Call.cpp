@@ -1,15 +1,16 @@
 #include "programs/webapi-exec/Call.h"
 
-#include <fcntl.h>
 #include <pwd.h>
 #include <unistd.h>
 
-#include <cerrno>
+#include <cstdio>
 #include <cstring>
 
 #include "programs/webapi-exec/Accounts.h"
-#include "webapi/ExecHandler.h"
+#include "programs/webapi-exec/transfer/DownloadCall.h"
+#include "programs/webapi-exec/transfer/OutputFile.h"
 #include "webapi/ExecParam.h"
+#include "webapi/JsonHelper.h"
 #include "webapi/platform/Core.h"
 
 namespace QELO::ExecProgram {
@@ -17,7 +18,6 @@ namespace {
 
 constexpr char kBatchAPI[] = "QELO.Entry.Request";
 constexpr char kBatchMethod[] = "request";
-constexpr mode_t kOutputMode = 0666;  // less the umask, as files that programs make are
 
 /// The name of the calling account, "" when it has none.
 std::string ownName() {
@@ -49,10 +49,14 @@ std::string checkUser(const std::string& user) {
   return geteuid() == 0 || uid == geteuid() ? "" : "only root may call as another user";
 }
 
-/// What a downloading method prints is never mixed with the answer.
-int openOutput(const std::string& file) {
-  return open(file.empty() ? "/dev/null" : file.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC,
-              kOutputMode);
+/// The call's request: for what is not there yet.
+Json::Value requestOf(const OutputFile& output) {
+  Json::Value request(Json::objectValue);
+  if (output.There() > 0) {
+    request["HTTP_RANGE"] = "bytes=" + std::to_string(output.There()) + "-";
+    request["HTTP_IF_RANGE"] = output.Mark();
+  }
+  return request;
 }
 
 }  // namespace
@@ -68,9 +72,11 @@ std::string makeCall(const Options& options, Json::Value& answer) {
   if (!wrong.empty()) {
     return wrong;
   }
-  const int output = openOutput(options.output);
-  if (output < 0) {
-    return options.output + ": " + strerror(errno);
+  // What a downloading method prints is never mixed with the answer.
+  OutputFile output;
+  const int closed = output.Open(options.output);
+  if (closed != 0) {
+    return options.output + ": " + strerror(closed);
   }
   const bool isBatch = !options.batch.empty();
   ExecParam param;
@@ -78,15 +84,23 @@ std::string makeCall(const Options& options, Json::Value& answer) {
       .SetAPI(isBatch ? kBatchAPI : options.api)
       .SetVersion(options.version != 0 ? options.version : 1)
       .SetMethod(isBatch ? kBatchMethod : options.method)
+      .SetEnv(requestOf(output))
       .SetRunner(user)
-      .SetOutputFd(output);
-  ExecHandler handler(param);
-  answer = handler.Process();
-  int error = handler.GetOutputError();
-  if (close(output) != 0 && error == 0) {
-    error = errno;
+      .SetOutputFd(output.Descriptor());
+  DownloadCall call(param, output, !options.output.empty());
+  answer = call.Process();
+  int error = call.GetOutputError();
+  const bool isWhole =
+      error == 0 && call.IsWhole() && JsonHelper::asBool(JsonHelper::member(answer, "success"));
+  const int lost = output.Finish(isWhole);
+  error = error != 0 ? error : lost;
+  if (!output.Left().empty()) {
+    fprintf(stderr, "webapi-exec: %s\n", output.Left().c_str());
   }
-  return error == 0 ? "" : options.output + ": " + strerror(error);
+  if (error != 0) {
+    return options.output + ": " + strerror(error);
+  }
+  return call.IsWhole() ? "" : options.output + ": the download broke off";
 }
 
 }  // namespace QELO::ExecProgram

@@ -25,7 +25,7 @@ const char kHelp[] =
     "                        wire: 5 is a number, true a boolean, '\"5\"' and five are texts\n"
     "    --json FILE         object of parameters, \"-\" for standard input; --param counts "
     "before\n"
-    "    --output FILE       gets the body that a downloading method prints; else it is dropped\n"
+    "    --output FILE       gets the download, else it is dropped; one that broke off goes on\n"
     "webapi-exec --follow --api API --method METHOD [OPTION...]\n"
     "webapi-exec --follow --task ID [--user NAME]\n"
     "    Starts a background task, or takes one that runs; shows its progress on a terminal, and\n"

@@ -5,6 +5,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <iostream>
@@ -34,6 +35,7 @@ constexpr char kSource[] = "ExecHandler.cpp";
 constexpr int kForkFlags = 65;
 constexpr char kUserVariable[] = "USERNAME";
 constexpr size_t kChunkSize = 4096;
+constexpr size_t kLongestHead = 65536;  ///< bytes that are kept of a header block
 constexpr int kReapTries = 20;
 constexpr useconds_t kReapPauseMicroseconds = 5000;
 constexpr std::string_view kHeaderEnd = "\r\n\r\n";
@@ -71,26 +73,22 @@ void letGoOfOutput() {
   }
 }
 
-/// Copies what stands behind the header block of CGI output. The block's end must come within one
-/// read, or all is dropped.
-/// @return 0, or the errno of the write that failed
-int copyBody(Pipe& output, int fd) {
-  char chunk[kChunkSize] = {};
-  bool inBody = false;
-  int error = 0;
-  for (int count; (count = output.Read(chunk, kChunkSize - 1)) > 0;) {
-    std::string_view text(chunk, static_cast<size_t>(count));
-    if (!inBody) {
-      const size_t end = text.find(kHeaderEnd);
-      inBody = end != std::string_view::npos;
-      text.remove_prefix(inBody ? end + kHeaderEnd.size() : text.size());
-    }
-    if (error == 0 && !WriteText(fd, text)) {
-      error = errno;  // the child must not wait for us, so the rest is read all the same
-      WEBAPI_LOG(kSource, "write output failed [%m]");
+/// Downloads answer to the request that the process environment tells. In the child that is what
+/// the call asks for, and not what this process may be serving.
+void tellRequest(const Json::Value& environment) {
+  unsetenv("REQUEST_METHOD");
+  for (const char* name : {"HTTP_RANGE", "HTTP_IF_RANGE"}) {
+    const std::string value = JsonHelper::asString(JsonHelper::member(environment, name));
+    unsetenv(name);
+    if (!value.empty()) {
+      setenv("REQUEST_METHOD", "GET", 1);
+      setenv(name, value.c_str(), 1);
     }
   }
-  return error;
+  for (const char* name : {"HTTP_IF_MATCH", "HTTP_IF_NONE_MATCH", "HTTP_IF_MODIFIED_SINCE",
+                           "HTTP_IF_UNMODIFIED_SINCE", "GATEWAY_INTERFACE"}) {
+    unsetenv(name);
+  }
 }
 
 }  // namespace
@@ -185,14 +183,48 @@ void ExecHandler::RunForkForStdout() {
     return;
   }
   if (child == 0) {
+    tellRequest(JsonHelper::member(request_, "environ"));
     output.WriteOnly(STDOUT_FILENO);
     output.Close();  // a background process that the method leaves must not hold it, too
     RunChild(result);
   }
   output.ReadOnly(-1);
   result.ReadOnly(-1);
-  outputError_ = copyBody(output, param_->GetOutputFd());
+  outputError_ = CopyBody(output, param_->GetOutputFd());
   ReceiveResult(result, child);
+}
+
+void ExecHandler::OutputBegins(const std::string&) {}
+
+void ExecHandler::OutputGrows(size_t) {}
+
+/// Copies what stands behind the header block of CGI output. The block's end must come within one
+/// read, or all is dropped.
+/// @return 0, or the errno of the write that failed
+int ExecHandler::CopyBody(Pipe& output, int fd) {
+  char chunk[kChunkSize] = {};
+  bool inBody = false;
+  int error = 0;
+  std::string head;
+  for (int count; (count = output.Read(chunk, kChunkSize - 1)) > 0;) {
+    std::string_view text(chunk, static_cast<size_t>(count));
+    if (!inBody) {
+      const size_t end = text.find(kHeaderEnd);
+      inBody = end != std::string_view::npos;
+      const size_t length = inBody ? end + kHeaderEnd.size() : text.size();
+      head.append(text.substr(0, std::min(length, kLongestHead - head.size())));
+      text.remove_prefix(length);
+      if (inBody) {
+        OutputBegins(head);
+      }
+    }
+    if (error == 0 && !WriteText(fd, text)) {
+      error = errno;  // the child must not wait for us, so the rest is read all the same
+      WEBAPI_LOG(kSource, "write output failed [%m]");
+    }
+    OutputGrows(error == 0 ? text.size() : 0);
+  }
+  return error;
 }
 
 void ExecHandler::RunChild(Pipe& result) noexcept {

@@ -144,6 +144,12 @@ TEST_F(Conditions, OfAPostAreNoQuestionsOfACache) {
   EXPECT_EQ(StatusOf({{"REQUEST_METHOD", "POST"}, {kNoneMatch, tag_}}), "412");
 }
 
+TEST_F(Conditions, OfNoRequestAreNone) {
+  const std::map<std::string, std::string> call = {
+      {"REQUEST_METHOD", ""}, {kMatch, "\"a\""}, {kNoneMatch, tag_}, {"HTTP_RANGE", "bytes=0-1"}};
+  EXPECT_EQ(StatusOf(call), "200");
+}
+
 TEST_F(Conditions, ComeBeforeRanges) {
   EXPECT_EQ(StatusOf({{"HTTP_RANGE", "bytes=0-1"}, {kNoneMatch, tag_}}), "304");
   EXPECT_EQ(StatusOf({{"HTTP_RANGE", "bytes=0-1"}, {kMatch, "\"a\""}}), "412");
