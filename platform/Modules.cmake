@@ -61,6 +61,7 @@ webapi_platform_module(tasks
           tasks/module/TaskDatabase.cpp tasks/module/TaskSchema.cpp tasks/module/Patience.cpp
           base/Secrets.cpp tasks/Id.cpp tasks/ProcessIdentity.cpp
   LIBRARIES SQLite::SQLite3)
+webapi_platform_module(ciphers SOURCES ciphers/module/CipherModule.cpp LIBRARIES OpenSSL::Crypto)
 webapi_platform_module(relay SOURCES relay/module/RelayModule.cpp relay/module/Transfer.cpp
                        LIBRARIES CURL::libcurl)
 
@@ -69,5 +70,5 @@ if(WEBAPI_ROOT_PREFIX)
 else()
   set(password_module module_password_pam)
 endif()
-install(TARGETS ${password_module} module_tokens module_tasks module_relay
+install(TARGETS ${password_module} module_tokens module_tasks module_relay module_ciphers
         LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/modules)

@@ -1,10 +1,15 @@
+#include <string>
+#include <string_view>
+
 #include "platform/accounts/Accounts.h"
 #include "platform/base/ModuleLoader.h"
 #include "platform/base/Paths.h"
 #include "platform/base/Secrets.h"
 #include "platform/base/TextBuffer.h"
+#include "platform/ciphers/module/CipherModule.h"
 #include "platform/tokens/module/TokenModule.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/Number.h"
 #include "webapi/platform/Token.h"
 
 namespace QELO::Platform {
@@ -25,6 +30,17 @@ bool isUsable(const char* user, uid_t uid, bool isService) {
   const Usability usability = usabilityOf(account);
   return isService ? usability != Usability::kExpired && usability != Usability::kUnknown
                    : usability == Usability::kGood;
+}
+
+/// The key of an access token, which its owner can derive too and nobody else: from the token's
+/// hash.
+bool keyOf(int64_t id, std::string& text) {
+  unsigned char hash[kTokenHashSize];
+  const auto findHash = reinterpret_cast<TokenHash>(findInModule(kTokenModule, kTokenHash));
+  const auto derive = reinterpret_cast<DeriveKeyText>(findInModule(kCipherModule, kDeriveKeyText));
+  return findHash != nullptr && derive != nullptr &&
+         findHash(QELO::Paths::kTokenDatabase, id, uidOf, hash) == kTokenGranted &&
+         derive(hash, &text);
 }
 
 }  // namespace
@@ -59,4 +75,15 @@ extern "C" int QeloAccessTokenGrant(const char* token, const char* api, const ch
     return kTokenUnknown;
   }
   return kTokenGranted;
+}
+
+// What clients send along is the number of an access token, which is no secret.
+extern "C" int QELOCloudServiceZttokenGenerateToken(const char* token, char* key, int size) {
+  fillBuffer("", key, size);
+  int64_t id = 0;
+  std::string text;
+  return token != nullptr && QELO::ParseNumber(std::string_view(token), id) && id > 0 &&
+                 keyOf(id, text) && fillBuffer(text, key, size)
+             ? 0
+             : -1;
 }

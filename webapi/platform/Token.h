@@ -11,7 +11,10 @@ extern "C" {
 WEBAPI_API int QeloAccessTokenGrant(const char* token, const char* api, const char* method,
                                     char* user, int size);
 
-/// Derives an AES key's text from a client's token. @return a negative value on failure
+/// The text that stands for an AES key, 32 characters, by what a client sends along.
+/// @param token  the number of an access token, which its owner knows
+/// @param key    receives the text; "" on failure
+/// @return a negative value when there is no such token, or it has expired
 WEBAPI_API int QELOCloudServiceZttokenGenerateToken(const char* token, char* key, int size);
 
 }  // extern "C"

@@ -37,3 +37,11 @@ extern "C" WEBAPI_API int webapiTokenGrant(const char* database, const char* tok
       return kTokenFailed;
   }
 }
+
+extern "C" WEBAPI_API int webapiTokenHash(const char* database, int64_t id,
+                                          uid_t (*findUid)(const char* user), unsigned char* hash) {
+  TokenStore store;
+  return store.Open(database, false, findUid) && store.FindHash(id, time(nullptr), hash)
+             ? kTokenGranted
+             : kTokenUnknown;
+}

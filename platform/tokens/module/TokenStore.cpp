@@ -208,6 +208,23 @@ TokenStore::Grant TokenStore::Check(const std::string& token, const std::string&
   return Grant::kGranted;
 }
 
+bool TokenStore::FindHash(int64_t id, int64_t now, unsigned char* hash) {
+  sqlite3_stmt* prepared = nullptr;
+  if (!Prepare("SELECT hash FROM tokens WHERE id = ?1 AND (expires = 0 OR expires > ?2)",
+               prepared)) {
+    return false;
+  }
+  const Statement statement(prepared);
+  sqlite3_bind_int64(prepared, 1, id);
+  sqlite3_bind_int64(prepared, 2, now);
+  if (sqlite3_step(prepared) != SQLITE_ROW ||
+      sqlite3_column_bytes(prepared, 0) != SHA256_DIGEST_LENGTH) {
+    return false;
+  }
+  memcpy(hash, sqlite3_column_blob(prepared, 0), SHA256_DIGEST_LENGTH);
+  return true;
+}
+
 bool TokenStore::List(std::vector<Entry>& entries) {
   sqlite3_stmt* prepared = nullptr;
   if (!Prepare(

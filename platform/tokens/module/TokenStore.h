@@ -56,6 +56,8 @@ class TokenStore {
   /// @param owner  receives whom the token stands for when the result is kGranted
   Grant Check(const std::string& token, const std::string& api, const std::string& method,
               int64_t now, Owner& owner);
+  /// The SHA-256, 32 bytes, of the token with this number. @return false when it is no good token
+  bool FindHash(int64_t id, int64_t now, unsigned char* hash);
   bool List(std::vector<Entry>& entries);
   /// @param found  receives whether there was such a token
   bool Revoke(int64_t id, bool& found);
