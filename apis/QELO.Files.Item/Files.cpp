@@ -18,6 +18,7 @@ QELO::_tag_API_TABLE table[] = {
     {kApi, 1, "move", files::move},
     {kApi, 1, "remove", files::remove},
     {kApi, 1, "download", files::download},
+    {kApi, 1, "upload", files::upload},
     {kApi, 1, "tus", files::tus},
     {nullptr, 0, nullptr, nullptr},
 };

@@ -14,6 +14,7 @@ void copy(QELO::APIRequest* request, QELO::APIResponse* response);
 void move(QELO::APIRequest* request, QELO::APIResponse* response);
 void remove(QELO::APIRequest* request, QELO::APIResponse* response);
 void download(QELO::APIRequest* request, QELO::APIResponse* response);
+void upload(QELO::APIRequest* request, QELO::APIResponse* response);
 void tus(QELO::APIRequest* request, QELO::APIResponse* response);
 
 }  // namespace files

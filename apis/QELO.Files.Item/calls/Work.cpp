@@ -7,6 +7,7 @@
 
 #include "calls/Call.h"
 #include "calls/Methods.h"
+#include "calls/ReadExisting.h"
 #include "work/Report.h"
 #include "work/Stop.h"
 #include "work/Walks.h"
@@ -174,15 +175,6 @@ bool readItems(Call& call, Job& job) {
     }
   }
   return true;
-}
-
-bool readExisting(const APIRequest& request, Existing& existing) {
-  const auto word = request.GetAndCheckString("existing", APIRequest::PARAM_OPTIONAL);
-  const std::string text = word.Get("refuse");
-  existing = text == "replace" ? Existing::kReplace
-             : text == "skip"  ? Existing::kSkip
-                               : Existing::kRefuse;
-  return !word.IsInvalid() && (existing != Existing::kRefuse || text == "refuse");
 }
 
 /// The folder that the items go into. @return false when it was refused, which is the answer

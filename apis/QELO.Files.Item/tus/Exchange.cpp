@@ -2,11 +2,13 @@
 
 #include <sys/statvfs.h>
 #include <webapi/JsonHelper.h>
+#include <webapi/WebAPIError.h>
 
 #include <charconv>
 #include <ctime>
 
-#include "tus/Metadata.h"
+#include "calls/ReadExisting.h"
+#include "text/Metadata.h"
 
 namespace files {
 namespace {
@@ -78,14 +80,6 @@ bool hasRoom(const Folder& folder, uint64_t length) {
   return fstatvfs(folder.Get(), &room) != 0 || room.f_bavail * room.f_frsize >= length;
 }
 
-Existing existingOf(const APIRequest& request) {
-  const std::string word =
-      request.GetAndCheckString("existing", APIRequest::PARAM_OPTIONAL).Get("refuse");
-  return word == "replace" ? Existing::kReplace
-         : word == "skip"  ? Existing::kSkip
-                           : Existing::kRefuse;
-}
-
 }  // namespace
 
 Exchange::Exchange(APIRequest* request, QELO::APIResponse* response)
@@ -139,17 +133,18 @@ void Exchange::Create() {
   Folder folder;
   Item taken;
   state.metadata = Header("HTTP_UPLOAD_METADATA");
-  state.existing = existingOf(call_.Request());
   const auto named = call_.Request().GetAndCheckString("name", APIRequest::PARAM_OPTIONAL);
   const std::string name = named.Get(metadataOf(state.metadata, "filename"));
   if (!readNumber(Header("HTTP_UPLOAD_LENGTH"), state.length) ||
-      state.metadata.size() > kLongestMetadata) {
+      !readExisting(call_.Request(), state.existing) || state.metadata.size() > kLongestMetadata) {
     Answer(kBadRequest);
     return;
   }
   if (!call_.ReadPath("path", folderPath) || !call_.OpenFolderForChange(folderPath, folder)) {
-    call_.Response().SetHeader("Status",
-                               statusOf(static_cast<Reason>(call_.Response().GetError())));
+    const int code = call_.Response().GetError();
+    call_.Response().SetHeader("Status", code == QELO::WEBAPI_ERR_BAD_REQUEST
+                                             ? kBadRequest
+                                             : statusOf(static_cast<Reason>(code)));
     return;
   }
   state.path = folderPath.Child(name);
@@ -252,6 +247,10 @@ bool Exchange::Find(UploadState& state, UploadData& data) {
   }
   if (state.isFinished) {
     return true;
+  }
+  const Share* share = call_.SharedFolders().Find(state.path.Share());
+  if (share != nullptr && share->isReadOnly) {  // by now
+    return Refuse(Reason::kReadOnly, state.path.Text());
   }
   const Reason reason = UploadData::Open(call_.SharedFolders(), state, data);
   return reason == Reason::kNone || Refuse(reason, state.path.Text());

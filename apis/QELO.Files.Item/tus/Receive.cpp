@@ -8,9 +8,9 @@
 #include <memory>
 
 #include "calls/Call.h"
+#include "text/Base64.h"
 #include "transfer/Digest.h"
 #include "transfer/Library.h"
-#include "tus/Base64.h"
 #include "tus/Exchange.h"
 
 namespace files {

@@ -47,7 +47,8 @@ bool stateOf(const Json::Value& json, UploadState& state) {
   state.isFinished = JsonHelper::asBool(JsonHelper::member(json, "finished"));
   return isTemporaryName(state.dataName) && state.dataName.find('/') == std::string::npos &&
          VirtualPath::Parse(JsonHelper::asString(JsonHelper::member(json, "path")), state.path) ==
-             Reason::kNone;
+             Reason::kNone &&
+         isNewName(state.path.Name());
 }
 
 time_t changeOf(const std::string& file) {

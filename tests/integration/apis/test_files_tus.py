@@ -288,9 +288,25 @@ def test_TooLarge_IsRefused(alice, home):
 
 
 def test_FolderThatCannotBeWritten_IsRefused(alice, root):
-    for folder, status in (("/public", 403), ("/none", 404), ("/own/none", 404), ("/", 404),
+    for folder, status in ((7, 400), ("/public", 403), ("/none", 404), ("/own/none", 404), ("/", 404),
                            ("/own/..", 400)):
         assert Uploader(alice, folder).create("file", 3).status == status, folder
+
+
+def test_RecordThatTheUserHasForged_LeadsNowhere(alice, home, root):
+    upload = Uploader(alice)
+    upload.create("file", 3)
+    (state,) = states(home)
+    record = json.loads(state.read_text())
+    for forged in ({"path": "/own/../x"}, {"path": "/public/file"}, {"data": "file"},
+                   {"data": ".qelo-part-/../../../bob/x"}, {"path": "/own/a\nb"}, {"data": 7}):
+        state.write_text(json.dumps({**record, **forged}))
+        assert upload.patch(0, b"new").status in (403, 404), forged
+    state.write_text("no JSON")
+    assert upload.patch(0, b"new").status == 404
+    assert os.listdir(root / "srv" / "public") == []
+    state.write_text(json.dumps(record))
+    assert upload.patch(0, b"new").status == 204
 
 
 def test_UploadOfAnother_IsNotFound(alice, streaming, common):

@@ -53,6 +53,18 @@ def test_CallWithAccessToken_Works(server, root, tmp_path):
     assert "hostName" in answer["data"]
 
 
+def test_Files_GoInAndOut(server, root, alice, tmp_path):
+    (tmp_path / "README.md").write_bytes(b"some text")
+    preamble = f"URL=http://{PORT}/webapi/entry.cgi\nSID={alice['sid']}\n"
+    try:
+        upload, listing = run(preamble + block("files"), tmp_path, server.port).splitlines()
+        assert [item["path"] for item in json.loads(upload)["data"]["items"]] == ["/own/README.md"]
+        assert [item["name"] for item in json.loads(listing)["data"]["items"]] == ["README.md"]
+        assert (tmp_path / "copy.md").read_bytes() == b"some text"
+    finally:
+        (root / "home" / "alice" / "README.md").unlink(missing_ok=True)
+
+
 def test_CompoundExample_Works(server, alice, tmp_path):
     text = (SOURCE / "docs" / "compound.md").read_text()
     preamble = f"URL=http://{PORT}/webapi/entry.cgi\nSID={alice['sid']}\n"

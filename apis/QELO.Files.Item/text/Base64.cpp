@@ -1,4 +1,4 @@
-#include "tus/Base64.h"
+#include "text/Base64.h"
 
 namespace files {
 

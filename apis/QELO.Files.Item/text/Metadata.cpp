@@ -1,8 +1,8 @@
-#include "tus/Metadata.h"
+#include "text/Metadata.h"
 
 #include <algorithm>
 
-#include "tus/Base64.h"
+#include "text/Base64.h"
 
 namespace files {
 
