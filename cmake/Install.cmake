@@ -92,14 +92,20 @@ get_property(webapi_apis DIRECTORY apis PROPERTY BUILDSYSTEM_TARGETS)
 install(TARGETS ${webapi_apis} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/apis)
 
 # Where the service manager looks for what administrators install.
-configure_file(packaging/qeloapid.service.in ${CMAKE_BINARY_DIR}/qeloapid.service.configured @ONLY)
-install(FILES ${CMAKE_BINARY_DIR}/qeloapid.service.configured
-        DESTINATION lib/systemd/system RENAME qeloapid.service)
+set(webapi_client www-data)
+if(WEBAPI_CGI_GROUP)
+  set(webapi_client ${WEBAPI_CGI_GROUP})
+endif()
+foreach(unit qeloapid webapi-server)
+  configure_file(packaging/${unit}.service.in ${CMAKE_BINARY_DIR}/${unit}.service.configured @ONLY)
+  install(FILES ${CMAKE_BINARY_DIR}/${unit}.service.configured
+          DESTINATION lib/systemd/system RENAME ${unit}.service)
+endforeach()
 
 # The documents stand to each other as in the source tree, so their links work.
 install(FILES README.md DEVELOPING.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
 install(FILES packaging/lighttpd.conf.in packaging/lighttpd.service.conf packaging/nginx.conf.in
-              packaging/apache2.conf.in
+              packaging/apache2.conf.in packaging/lighttpd-scgi.conf.in packaging/nginx-scgi.conf.in
         DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY packaging/fail2ban DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)

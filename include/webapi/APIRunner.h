@@ -142,6 +142,15 @@ class WEBAPI_API APIRunner {
   ///         library or the loader refuses it
   bool CacheLib(APIRequest* request, void** handle);
 
+  /// Loads an API library for the runners of processes that are forked from here on, as a copy that
+  /// nobody can change. A runner uses it while the file is what it was, and closes it in the end;
+  /// so only one runner of a process has it.
+  /// @param path  as descriptions name it, with a "/"
+  /// @return false, with the reason logged, when it was not loaded: runners load it themselves then
+  static bool PreloadLibrary(const std::string& path);
+  /// Loads those anew whose files are others by now.
+  static void RefreshLibraries();
+
  protected:
   APIRequest* Request() const { return request_.get(); }
   APIResponse* Response() const { return response_.get(); }

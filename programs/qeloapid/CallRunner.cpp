@@ -1,16 +1,17 @@
 #include "programs/qeloapid/CallRunner.h"
 
 #include <cstdio>
+#include <cstdlib>
 
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
+#include "webapi/model/request/CallerSession.h"
 #include "webapi/runner/CallName.h"
 #include "webapi/runner/daemon/Message.h"
 
 namespace QELO {
-
 std::string CallRunner::Answer(Json::Value& message, const std::string& socket, Note& note) {
   if (!JsonHelper::member(message, DaemonMessage::kRequest).isObject() ||
       !JsonHelper::member(message, DaemonMessage::kResponse).isObject()) {
@@ -23,7 +24,11 @@ std::string CallRunner::Answer(Json::Value& message, const std::string& socket, 
   const CallName call(request);
   snprintf(note.call, sizeof note.call, "%s_%d_%s", call.api.c_str(), call.version,
            call.method.c_str());
-  snprintf(note.user, sizeof note.user, "%s", request.GetLoginUserName().c_str());
+  const std::string user = request.GetLoginUserName();
+  snprintf(note.user, sizeof note.user, "%s", user.c_str());
+  if (!user.empty()) {  // other programs of the system are told, as by the front
+    setenv(kCallerVariable, user.c_str(), 1);
+  }
   if (CheckRequestParam(&request, &response) && AddAPIInfo(&request)) {
     if (JsonHelper::isText(request.GetAPIInfo("socket"), socket)) {
       Process(&request, &response);

@@ -1,39 +1,41 @@
 #include "programs/server/Jobs.h"
 
-#include <fcntl.h>
 #include <signal.h>
 #include <sys/mman.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 
-#include <cstring>
+#include <filesystem>
 #include <new>
 #include <string>
-#include <string_view>
+#include <system_error>
 #include <utility>
-
-#include "webapi/base/Number.h"
-#include "webapi/base/TextFile.h"
-#include "webapi/base/UniqueFd.h"
 
 namespace QELO {
 namespace {
 
-constexpr char kWritten[] = "wchar: ";
+/// What /proc shows of a descriptor that leads to a socket.
+std::string linkTo(int socket) {
+  struct stat info {};
+  return fstat(socket, &info) == 0 ? "socket:[" + std::to_string(info.st_ino) + "]" : "";
+}
 
-/// Bytes that a process has written by now; all that there could be when that is not known.
-uint64_t writtenBytes(pid_t pid) {
-  const std::string path = "/proc/" + std::to_string(pid) + "/io";
-  const UniqueFd file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
-  std::string text;
-  uint64_t bytes = UINT64_MAX;
-  if (file && ReadText(file.Get(), 4096, text)) {
-    const size_t begin = text.find(kWritten);
-    if (begin != std::string::npos) {
-      const size_t value = begin + strlen(kWritten);
-      ParseNumber(std::string_view(text).substr(value, text.find('\n', value) - value), bytes);
+/// Whether a process has the connection to its client, but not as standard output: then a method
+/// has its turn that may not write there, and nothing of the answer is out.
+bool isKeptFromClient(pid_t pid, int socket) {
+  const std::string wanted = linkTo(socket);
+  const std::string place = "/proc/" + std::to_string(pid) + "/fd";
+  bool isHeld = false;
+  bool isOutput = false;
+  std::error_code error;
+  for (const auto& entry : std::filesystem::directory_iterator(place, error)) {
+    std::error_code gone;
+    if (std::filesystem::read_symlink(entry.path(), gone) == wanted) {
+      isHeld = true;
+      isOutput = isOutput || entry.path().filename() == "1";
     }
   }
-  return bytes;
+  return !error && isHeld && !isOutput;
 }
 
 }  // namespace
@@ -69,7 +71,7 @@ std::optional<Jobs::Job> Jobs::TakeEnded(int& status) {
 void Jobs::Kill(Job& job) {
   job.isKilled = true;
   kill(job.pid, SIGSTOP);  // so that nothing comes between the look and the end
-  job.isSilent = writtenBytes(job.pid) == job.note->written;
+  job.isSilent = isKeptFromClient(job.pid, job.connection->socket.Get());
   if (kill(-job.pid, SIGKILL) != 0) {  // it has not come so far as to lead a group
     kill(job.pid, SIGKILL);
   }

@@ -12,7 +12,6 @@
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/CompoundHandler.h"
-#include "webapi/ExecHandler.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
@@ -23,9 +22,9 @@
 #include "webapi/runner/catalogue/Catalogue.h"
 #include "webapi/runner/counter/UsageCounter.h"
 #include "webapi/runner/daemon/DaemonCall.h"
-#include "webapi/runner/exec/ExecCall.h"
 #include "webapi/runner/execution/Execution.h"
 #include "webapi/runner/library/LibraryCache.h"
+#include "webapi/runner/library/PreloadedLibraries.h"
 
 namespace QELO {
 
@@ -313,6 +312,14 @@ bool APIRunner::CacheLib(APIRequest* request, void** handle) {
   return rooms_->libraries.CacheLib(request, handle);
 }
 
+bool APIRunner::PreloadLibrary(const std::string& path) {
+  return PreloadedLibraries::Load(path);
+}
+
+void APIRunner::RefreshLibraries() {
+  PreloadedLibraries::Refresh();
+}
+
 bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {
   return rooms_->libraries.GetTableFunc(handle, table);
 }
@@ -323,26 +330,6 @@ bool APIRunner::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkTabl
 
 void APIRunner::CloseLib() {
   rooms_->libraries.CloseLib();
-}
-
-Json::Value APIRunner::Exec(const ExecParam& param) {
-  return ExecHandler(param).Process();
-}
-
-void APIRunner::Exec(Json::Value& result, int outputFd, const char* api, int version,
-                     const char* method, const Json::Value& params, const Json::Value& attributes,
-                     const char* runner) {
-  result = Exec(ExecCall(outputFd, api, version, method, params, attributes, runner));
-}
-
-void APIRunner::Exec(Json::Value& result, const char* api, int version, const char* method,
-                     const Json::Value& params, const Json::Value& attributes, const char* runner) {
-  Exec(result, -1, api, version, method, params, attributes, runner);
-}
-
-void APIRunner::Exec(Json::Value& result, const char* api, int version, const char* method,
-                     const Json::Value& params, const char* runner) {
-  Exec(result, api, version, method, params, Json::Value(), runner);
 }
 
 }  // namespace QELO

@@ -18,6 +18,7 @@ import pytest
 from accounts import account, reachable
 from client import Client
 from conftest import BUILD, ENTRY, PASSWORDS, ROOT, SOURCE, needs_root
+from scgi import ForkServer
 from service import Service
 from webserver import WebServer
 
@@ -38,6 +39,7 @@ KINDS = [
     (r".*/tokens\.db(?:-wal|-shm)?$", "token database"),
     (r".*/tasks(?:/\d+)?(?:/tasks\.db(?:-wal|-shm)?)?$", "task store"),
     (r"anon_inode:", "kernel's"),
+    (r"/memfd:api library", "library copies"),
 ]
 
 pytestmark = needs_root
@@ -235,6 +237,20 @@ def test_DaemonsCall_HasRootsRightsUntilItTakesTheMethods(root, describe, record
     seen = stages(record, "method")
     expect("daemon call before", seen["before"])
     expect("daemon call after", seen["method"])
+
+
+def test_ForkServersRequest_HasRootsRightsUntilItTakesTheMethods(client, looking, record, tmp_path):
+    sid = client.login("alice", PASSWORDS["alice"]).data["sid"]
+    server = ForkServer(tmp_path)
+    try:
+        server.start(stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL, extra_groups=[])
+        assert server.call(f"api={API}&version=1&method=run&record={record}&_sid={sid}")["success"]
+        expect("fork server", process(server.process.pid))
+    finally:
+        server.stop()
+    seen = stages(record, "method")
+    expect("forked before", seen["before"])
+    expect("forked after", seen["method"])
 
 
 def test_Table_HasNoOtherRows():

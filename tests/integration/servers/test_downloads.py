@@ -11,7 +11,7 @@ import pytest
 
 from downloads import downloads, folder, sending  # noqa: F401  (fixtures)
 from marks import wait_for
-from servers import running, server  # noqa: F401  (fixtures)
+from servers import server  # noqa: F401  (a fixture)
 
 # Around the buffers of programs, pipes and servers.
 SIZES = (0, 1, 4095, 4096, 65535, 65536, 65537, 3 << 20)
@@ -164,8 +164,8 @@ def test_ClientThatHangsUp_LeavesNoProcess(server, downloads, method):  # noqa: 
     with create_connection(("127.0.0.1", downloads.port), timeout=10) as connection:
         connection.sendall(f"GET {target} HTTP/1.1\r\nHost: nas\r\n\r\n".encode())
         assert b"200" in connection.recv(1000)
-        assert running(server.entry)
-    assert wait_for(lambda: not running(server.entry), 10)
+        assert server.programs()
+    assert wait_for(lambda: not server.programs(), 10)
 
 
 def test_SlowClient_DelaysNobodyAndGetsAll(downloads):

@@ -10,16 +10,18 @@ import pytest
 from client import PATH, Client
 from conftest import session_of
 from marks import wait_for
-from servers import running, server  # noqa: F401  (a fixture)
+from servers import server  # noqa: F401  (a fixture)
 from tasks import alice, started  # noqa: F401  (fixtures)
-from webserver import ApacheCgi, ApacheCgid, Nginx, WebServer
+from webserver import ApacheCgi, ApacheCgid, LighttpdScgi, Nginx, NginxScgi, WebServer
 
 API = "QELO.Test.Entries"
 # A GET's query in bytes, as docs/webservers.md tells: one that is served, one that is refused, and the
 # status of that. lighttpd counts the other fields of the header in.
 LONGEST_QUERY = {
     WebServer: (65_000, 65_536, 431),
+    LighttpdScgi: (65_000, 65_536, 431),
     Nginx: (28_639, 28_640, 414),
+    NginxScgi: (65_503, 65_504, 414),
     ApacheCgi: (130_970, 130_971, 414),
     ApacheCgid: (130_970, 130_971, 414),
 }
@@ -84,7 +86,7 @@ def test_LargeAnswer_ArrivesWhole(client, echo):
 
 
 def test_BodyBeyondTheLimit_IsRefusedBeforeItIsSent(server):
-    if type(server) is WebServer:
+    if server.takes_any_body:
         pytest.skip("lighttpd takes any body; the program answers 101 from 16 MiB on")
     with create_connection(("127.0.0.1", server.port), timeout=10) as connection:
         connection.sendall(f"POST {PATH} HTTP/1.1\r\nHost: nas\r\nContent-Length: {(16 << 20) + 1}"
@@ -112,11 +114,11 @@ def test_ClientThatHangsUp_LeavesNoProgramAndDelaysNobody(server, client, echo):
     for _ in range(3):
         with create_connection(("127.0.0.1", server.port), timeout=10) as connection:
             connection.sendall(f"GET {PATH}?{slow}&ms=2000 HTTP/1.1\r\nHost: nas\r\n\r\n".encode())
-            assert wait_for(lambda: running(server.entry), 5)
+            assert wait_for(lambda: server.programs(), 5)
     started_at = time.monotonic()
     assert client.get(f"{echo}&x=1").data["x"] == 1
     assert time.monotonic() - started_at < 1.5
-    assert wait_for(lambda: not running(server.entry), 10)
+    assert wait_for(lambda: not server.programs(), 10)
 
 
 def test_WaitingCalls_DelayNobody(server, client, echo):

@@ -9,11 +9,13 @@ from pathlib import Path
 import pytest
 
 from conftest import ENTRY
-from webserver import ApacheCgi, ApacheCgid, Nginx, WebServer
+from webserver import ApacheCgi, ApacheCgid, LighttpdScgi, Nginx, NginxScgi, WebServer
 
 SERVERS = {
     "lighttpd": WebServer,
+    "lighttpd-scgi": LighttpdScgi,
     "nginx": Nginx,
+    "nginx-scgi": NginxScgi,
     "apache-mod_cgi": ApacheCgi,
     "apache-mod_cgid": ApacheCgid,
 }
@@ -49,15 +51,3 @@ def serving(kind, change=lambda text: text):
 def server(request, root):
     with serving(request.param) as one:
         yield one
-
-
-def running(entry):
-    """The processes of a program."""
-    found = []
-    for link in Path("/proc").glob("[0-9]*/exe"):
-        try:
-            if os.readlink(link).removesuffix(" (deleted)") == str(entry):
-                found.append(int(link.parent.name))
-        except OSError:
-            continue  # it has ended
-    return found

@@ -1,14 +1,17 @@
 """Real web servers in front of entry.cgi."""
 
 import os
+import shutil
 import signal
 import socket
 import subprocess
+import tempfile
 import time
 from pathlib import Path
 
 SOURCE = Path(__file__).resolve().parents[3]
 PACKAGING = SOURCE / "packaging"
+FORK_SERVER = Path(os.environ.get("WEBAPI_BUILD_DIR", SOURCE / "build" / "test")) / "programs" / "webapi-server"
 
 
 def free_port():
@@ -21,6 +24,7 @@ class WebServer:
     """A lighttpd that serves one entry.cgi from a directory of its own until it is stopped."""
 
     template = "lighttpd.conf.in"
+    takes_any_body = True  # and leaves its refusal to the program
 
     def __init__(self, directory, entry, extra="", pid=None):
         self.directory = Path(directory)
@@ -28,7 +32,11 @@ class WebServer:
         for folder in ("www", "uploads"):
             (self.directory / folder).mkdir(parents=True, exist_ok=True)
         text = (PACKAGING / self.template).read_text()
-        values = {"DIR": directory, "PORT": self.port, "ENTRY": entry, "PID": pid or f"{directory}/pid"}
+        self.socket = None
+        if "@SOCKET@" in text:  # in a directory that nobody but root may write
+            self.socket = Path(tempfile.mkdtemp(prefix="webapi-socket-")) / "server.sock"
+            self.socket.parent.chmod(0o755)
+        values = {"SOCKET": self.socket, "DIR": directory, "PORT": self.port, "ENTRY": entry, "PID": pid or f"{directory}/pid"}
         for name, value in values.items():
             text = text.replace(f"@{name}@", str(value))
         self.entry = entry
@@ -69,6 +77,46 @@ class WebServer:
             os.killpg(helper.pid, signal.SIGTERM)  # fcgiwrap leaves its children behind
             helper.wait(timeout=10)
         self.helpers = []
+        if self.socket is not None:
+            shutil.rmtree(self.socket.parent)
+
+    def programs(self):
+        """The processes that serve requests at present."""
+        program = FORK_SERVER if self.socket is not None else self.entry
+        helpers = {helper.pid for helper in self.helpers}
+        found = []
+        for link in Path("/proc").glob("[0-9]*/exe"):
+            try:
+                target = os.readlink(link).removesuffix(" (deleted)")
+            except OSError:
+                continue  # it has ended
+            if target == str(program) and self.is_ours(int(link.parent.name), helpers):
+                found.append(int(link.parent.name))
+        return found
+
+    def is_ours(self, process, helpers):
+        """Whether a process of the program serves this server's requests."""
+        if self.socket is None:
+            return True
+        try:
+            parent = int(Path(f"/proc/{process}/stat").read_text().rpartition(")")[2].split()[1])
+        except OSError:
+            return False
+        return parent in helpers
+
+    def start_fork_server(self, **identity):
+        """webapi-server, which needs root's rights as entry.cgi does."""
+        client = ["--client", identity["user"]] if "user" in identity else []
+        with open(self.directory / "cgi.log", "ab") as log:
+            helper = subprocess.Popen([FORK_SERVER, "--socket", self.socket, *client],
+                                      stdin=subprocess.DEVNULL, stdout=log, stderr=log,
+                                      start_new_session=True)
+        deadline = time.monotonic() + 10
+        while not self.socket.exists() and time.monotonic() < deadline:
+            assert helper.poll() is None, self.log()
+            time.sleep(0.01)
+        assert self.socket.exists(), self.log()
+        return [helper]
 
     def log(self):
         """All that the server and the programs behind it wrote."""
@@ -76,10 +124,20 @@ class WebServer:
         return "".join(file.read_text(errors="replace") for file in files if file.exists())
 
 
+class LighttpdScgi(WebServer):
+    """lighttpd, and our fork server."""
+
+    template = "lighttpd-scgi.conf.in"
+
+    def start_helpers(self, **identity):
+        return self.start_fork_server(**identity)
+
+
 class Nginx(WebServer):
     """nginx, and fcgiwrap with some processes."""
 
     template = "nginx.conf.in"
+    takes_any_body = False
     processes = 4
 
     def command(self):
@@ -101,10 +159,20 @@ class Nginx(WebServer):
         return [helper]
 
 
+class NginxScgi(Nginx):
+    """nginx, and our fork server."""
+
+    template = "nginx-scgi.conf.in"
+
+    def start_helpers(self, **identity):
+        return self.start_fork_server(**identity)
+
+
 class ApacheCgi(WebServer):
     """Apache with a process a connection."""
 
     template = "apache2.conf.in"
+    takes_any_body = False
     definitions = ()
 
     def command(self):

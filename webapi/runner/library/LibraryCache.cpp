@@ -8,6 +8,7 @@
 #include "webapi/base/MemoryBound.h"
 #include "webapi/base/OwnFile.h"
 #include "webapi/runner/execution/Fence.h"
+#include "webapi/runner/library/PreloadedLibraries.h"
 
 namespace QELO {
 namespace {
@@ -64,7 +65,10 @@ bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
     return false;
   }
   MemoryBound::Lift();  // a library takes the memory that it needs
-  void* opened = load(path);
+  void* opened = PreloadedLibraries::Find(path);
+  if (opened == nullptr) {
+    opened = load(path);
+  }
   if (opened == nullptr) {
     WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", LogText(path).c_str(),
                LogText(dlerror()).c_str());

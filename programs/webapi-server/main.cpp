@@ -1,0 +1,145 @@
+// The fork server: serves requests that web servers pass on by SCGI as entry.cgi does, in processes
+// that are forked from one with everything loaded.
+
+#include <grp.h>
+#include <pwd.h>
+#include <syslog.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "programs/server/Limits.h"
+#include "programs/server/Options.h"
+#include "programs/server/Server.h"
+#include "programs/server/ServiceManager.h"
+#include "programs/server/Surroundings.h"
+#include "programs/webapi-server/WebService.h"
+#include "webapi/platform/Core.h"
+#include "webapi/platform/Paths.h"
+
+namespace {
+
+constexpr char kBindAtStart[] = "LD_BIND_NOW";
+constexpr char kUsage[] =
+    "usage: webapi-server [--socket PATH] [--port N] [--client ACCOUNT] [LIMITS]\n"
+    "  --socket PATH      local socket to serve, made as the client's\n"
+    "  --port N           port of the loopback address to serve\n"
+    "  --client ACCOUNT   the web server's account: it may use the socket, beside root\n"
+    "limits:\n"
+    "  --requests N       requests at once (32)\n"
+    "  --queue N          requests that wait for their turn (256)\n"
+    "  --arriving N       requests that are on their way (256)\n"
+    "  --header-limit S   seconds until a request's header is here (10)\n"
+    "  --queue-limit S    seconds that a request waits for its turn (30)\n"
+    "  --time-limit S     seconds that a request may take (3600)\n";
+
+struct Settings {
+  QELO::ServerLimits limits;
+  std::string socket;
+  unsigned port = 0;
+  uid_t client = static_cast<uid_t>(-1);
+};
+
+bool findAccount(const std::string& name, uid_t& uid) {
+  const passwd* account = getpwnam(name.c_str());
+  if (account != nullptr) {
+    uid = account->pw_uid;
+  }
+  return account != nullptr;
+}
+
+bool readOptions(int argc, char** argv, Settings& settings) {
+  QELO::ServerLimits& limits = settings.limits;
+  limits.request = std::chrono::hours(1);  // of a large upload, too
+  const auto seconds = [](std::chrono::seconds& limit) {
+    return [&limit](unsigned number) { limit = std::chrono::seconds(number); };
+  };
+  const auto count = [](unsigned& limit) { return [&limit](unsigned number) { limit = number; }; };
+  QELO::Options options;
+  options.Text("socket", [&](const std::string& path) {
+    settings.socket = path;
+    return !path.empty() && path[0] == '/';
+  });
+  options.Number("port", 1, 65535, count(settings.port));
+  options.Text("client",
+               [&](const std::string& name) { return findAccount(name, settings.client); });
+  options.Number("requests", 1, 4096, count(limits.atOnce));
+  options.Number("queue", 0, 65536, count(limits.queued));
+  options.Number("arriving", 1, 65536, count(limits.arriving));
+  options.Number("header-limit", 1, 3600, seconds(limits.arrival));
+  options.Number("queue-limit", 1, 3600, seconds(limits.turn));
+  options.Number("time-limit", 1, 86400, seconds(limits.request));
+  std::string error;
+  if (!options.Read(argc, argv, error)) {
+    fprintf(stderr, "%s\n%s", error.c_str(), kUsage);
+    return false;
+  }
+  return true;
+}
+
+/// Has the loader bind everything before the first request, and not each request's process anew.
+void bindAtStart(char** argv) {
+  if (getenv(kBindAtStart) == nullptr) {
+    setenv(kBindAtStart, "1", 1);
+    execv("/proc/self/exe", argv);
+  }
+}
+
+/// @return whether it listens at all; what cannot be had is told
+bool listen(QELO::Server& server, const Settings& settings, const std::vector<int>& handed) {
+  bool good = true;
+  const auto add = [&](std::optional<QELO::Listener> listener, const std::string& name) {
+    if (!listener || !server.Listen(std::move(*listener))) {
+      perror(name.c_str());
+      good = false;
+    }
+  };
+  for (const int descriptor : handed) {
+    add(QELO::Listener::Handed(descriptor), "handed socket");
+  }
+  if (!settings.socket.empty()) {
+    QELO::Listener::Access access;
+    access.owner = settings.client;
+    add(QELO::Listener::AtPath(settings.socket, access), settings.socket);
+  }
+  if (settings.port != 0) {
+    add(QELO::Listener::AtPort(static_cast<unsigned short>(settings.port)),
+        "port " + std::to_string(settings.port));
+  }
+  if (good && server.Paths().empty()) {
+    fprintf(stderr, "nowhere to listen\n%s", kUsage);
+    good = false;
+  }
+  return good;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  Settings settings;
+  if (!readOptions(argc, argv, settings)) {
+    return 2;
+  }
+  bindAtStart(argv);
+  const std::vector<int> handed = QELO::PrepareServer();
+  openlog("webapi-server", LOG_PID | LOG_CONS, 0);
+  if (chdir(QELO::Paths::kDescriptionDir) != 0) {
+    perror(QELO::Paths::kDescriptionDir);
+    return 1;
+  }
+  QELO::WebService::LoadLibraries();
+  QLIBGroupIsAdminGroupMem("root", 0);  // what accounts are looked up with is loaded now
+  QELO::WebService service(settings.client, argc, argv);
+  QELO::Server server(service, settings.limits);
+  if (!server.Open() || !listen(server, settings, handed)) {
+    return 1;
+  }
+  QELO::ServiceManager::Tell("READY=1");
+  server.Run();
+  return 0;
+}
