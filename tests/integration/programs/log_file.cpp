@@ -1,6 +1,9 @@
 // Preloaded into a program: its messages to the system log go to the file that LOG_FILE names, a
 // line each.
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
@@ -9,11 +12,12 @@
 static const char* const path = getenv("LOG_FILE");
 
 static void add(const char* format, va_list args) {
-  FILE* file = path != nullptr ? fopen(path, "ae") : nullptr;
-  if (file != nullptr) {
-    vfprintf(file, format, args);
-    fputc('\n', file);
-    fclose(file);
+  const int file =
+      path != nullptr ? open(path, O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC, 0644) : -1;
+  if (file >= 0) {  // and no stream, which needs memory
+    vdprintf(file, format, args);
+    dprintf(file, "\n");
+    close(file);
   }
 }
 

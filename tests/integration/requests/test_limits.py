@@ -1,6 +1,7 @@
 """What a request may hold, and what it may cost: far beyond what a person sends, and one beyond the
 limit."""
 
+import json
 import subprocess
 from urllib.parse import urlencode
 
@@ -41,6 +42,41 @@ def logged(tmp_path):
         return answer_of(output), log.read_text().splitlines() if log.exists() else []
 
     return run
+
+
+def preloaded(*libraries):
+    return " ".join(str(BUILD / "tests" / "integration" / f"{name}.so") for name in libraries)
+
+
+def test_NoMemoryToBeginWith_IsLogged(tmp_path, root):
+    log = tmp_path / "log"
+    process = subprocess.run(
+        [ENTRY],
+        input=b"",
+        env={
+            "REQUEST_METHOD": "GET",
+            "QUERY_STRING": OPEN,
+            "LD_PRELOAD": preloaded("starving", "log_file"),
+            "LOG_FILE": str(log),
+        },
+        capture_output=True,
+        timeout=30,
+        check=False,
+    )
+    assert (process.returncode, process.stdout) == (1, b"")
+    (line,) = log.read_text().splitlines()
+    assert line.startswith("main.cpp:") and line.endswith(" std::bad_alloc")
+
+
+def test_LibraryThatNeedsMoreThanARequest_IsGivenIt(describe):
+    describe("QELO.Test.Call", "greedy.so")
+    call = {"api": "QELO.Test.Call", "version": 1, "method": "run"}
+    alone = answer_of(run_entry(urlencode(call)))
+    assert alone == {"data": True, "success": True}
+    compound = {"api": "QELO.Entry.Request", "version": 1, "method": "request",
+                "compound": json.dumps([call])}
+    answer = answer_of(run_entry(urlencode(compound)))
+    assert answer["data"]["result"] == [{**call, **alone}]
 
 
 def test_ApiNameOfAMegabyte_LeavesAShortLogLine(logged):

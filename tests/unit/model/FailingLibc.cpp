@@ -37,6 +37,14 @@ __attribute__((visibility("default"))) int regcomp(regex_t* compiled, const char
   return result;
 }
 
+__attribute__((visibility("default"))) int regexec(const regex_t* compiled, const char* text,
+                                                   size_t count, regmatch_t* matches, int flags) {
+  using Regexec = int (*)(const regex_t*, const char*, size_t, regmatch_t*, int);
+  return current != nullptr && current->regexecFails
+             ? REG_ESPACE
+             : real<Regexec>("regexec")(compiled, text, count, matches, flags);
+}
+
 __attribute__((visibility("default"))) void regfree(regex_t* compiled) {
   if (current != nullptr) {
     ++current->freed;

@@ -6,6 +6,7 @@ struct FailingLibc {
   ~FailingLibc();
 
   bool regcompFails = false;
+  bool regexecFails = false;
   bool strdupFails = false;
   int compiled = 0;  ///< successful regcomp()
   int freed = 0;     ///< regfree()

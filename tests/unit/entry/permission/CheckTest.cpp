@@ -1,5 +1,6 @@
 // Who calls, and whether that user may run the method.
 
+#include "tests/unit/entry/FailingSetenv.h"
 #include "tests/unit/entry/permission/Fixture.h"
 #include "webapi/WebAPIError.h"
 
@@ -207,6 +208,13 @@ TEST_F(Permission, RefusedSessionLeavesNoUserBehind) {
   platform->authorized = -1;
   Check(kOpenToAll);
   EXPECT_EQ(entry_->Request()->GetLoginUserName(), "");
+  EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "(unset)");
+}
+
+TEST_F(Permission, UserWhoCannotBeToldToProgramsIsNobodyRatherThanTheFormer) {
+  Set("QELO_WEBAPI_USERNAME", "former");
+  const FailingSetenv failing("QELO_WEBAPI_USERNAME");
+  EXPECT_TRUE(Check(kOpenToAll));
   EXPECT_EQ(Environment("QELO_WEBAPI_USERNAME"), "(unset)");
 }
 

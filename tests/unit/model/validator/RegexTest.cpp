@@ -92,6 +92,14 @@ TEST(RegexCache, KeepsNothingOfAPatternThatCannotBeCompiled) {
   EXPECT_NE(compiled, nullptr);
 }
 
+TEST(CheckRegex, RefusesAValueThatThereIsNoMemoryToMatch) {
+  FailingLibc libc;
+  EXPECT_TRUE(APIValidator::CheckRegex("ab", "^ab$"));
+  libc.regexecFails = true;
+  EXPECT_FALSE(APIValidator::CheckRegex("ab", "^ab$"));
+  EXPECT_FALSE(APIValidator::IsEMail("ann@example.com"));
+}
+
 TEST(RegexCache, ReleasesItsExpressions) {
   const FailingLibc libc;
   {

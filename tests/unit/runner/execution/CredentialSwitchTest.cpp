@@ -109,6 +109,18 @@ TEST_F(CredentialSwitch, GrantableGivesIdsAndGroupsBackToAProcessThatCanBecomeRo
   });
 }
 
+TEST_F(CredentialSwitch, FailedSwitchThatLeftOtherGroupsAloneIsUndone) {
+  InChild({0, 0, 0, 0, 0, 0}, [&] {
+    platform->resetCredentials = [](const std::string&, bool) {
+      setgroups(0, nullptr);
+      return false;
+    };
+    const std::vector<gid_t> groups = CurrentGroups();
+    return groups.size() == 2 && !ProcessPlugin("state") && response->GetError() == 117 &&
+           CurrentGroups() == groups && CurrentIds() == Ids{0, 0, 0, 0, 0, 0};
+  });
+}
+
 TEST_F(CredentialSwitch, GrantableServesASecondCall) {
   InChild({0, 0, 0, 0, 0, 0}, [&] {
     return ProcessPlugin("state", kGrantable) && RanAsUser() &&
