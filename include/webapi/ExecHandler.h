@@ -3,6 +3,7 @@
 #include <json/json.h>
 
 #include <cstddef>
+#include <memory>
 #include <string>
 
 #include "webapi/APIRunner.h"
@@ -59,6 +60,13 @@ class WEBAPI_API ExecHandler {
   virtual void OutputBegins(const std::string& head);
   /// So many bytes more are written.
   virtual void OutputGrows(size_t bytes);
+  /// Takes the upload that the environment of a call to a method with "allowUpload" announces. Here
+  /// it is left to the method. Temporary files belong to the method's account already.
+  /// @return false, with the response's error set, when it cannot be taken
+  virtual bool HandleUpload(APIRunner& runner, APIRequest* request, APIResponse* response);
+  /// In a child that was forked for the call, when that has ended; with the method's rights, where
+  /// they are not given back.
+  virtual void CallEnded();
 
  private:
   int CopyBody(Pipe& output, int fd);
@@ -67,8 +75,10 @@ class WEBAPI_API ExecHandler {
   [[noreturn]] void RunChild(Pipe& result) noexcept;
   void ReceiveResult(Pipe& result, int child);
 
+  class Runner;  // asks for uploads here
+
   const ExecParam* param_;
-  APIRunner runner_;
+  std::unique_ptr<APIRunner> runner_;
   Json::Value request_;
   Json::Value result_;
   int outputError_ = 0;

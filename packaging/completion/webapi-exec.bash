@@ -3,7 +3,7 @@
 
 _webapi_exec() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local options="--api --method --version --user --param --json --output --batch"
+  local options="--api --method --version --user --param --json --upload --output --batch"
   options+=" --follow --task --list --help"
   local words="" api="" i
   case $previous in
@@ -23,7 +23,7 @@ _webapi_exec() {
       mapfile -t COMPREPLY < <(compgen -f -- "$current")
       return
       ;;
-    --version | --param | --task) return ;;
+    --version | --param | --upload | --task) return ;;
     *) words=$options ;;
   esac
   mapfile -t COMPREPLY < <(compgen -W "$words" -- "$current")

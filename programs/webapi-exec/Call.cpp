@@ -3,12 +3,14 @@
 #include <pwd.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <cstring>
 
 #include "programs/webapi-exec/Accounts.h"
-#include "programs/webapi-exec/transfer/DownloadCall.h"
 #include "programs/webapi-exec/transfer/OutputFile.h"
+#include "programs/webapi-exec/transfer/TransferCall.h"
+#include "programs/webapi-exec/transfer/UploadBody.h"
 #include "webapi/ExecParam.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/platform/Core.h"
@@ -49,9 +51,13 @@ std::string checkUser(const std::string& user) {
   return geteuid() == 0 || uid == geteuid() ? "" : "only root may call as another user";
 }
 
-/// The call's request: for what is not there yet.
-Json::Value requestOf(const OutputFile& output) {
+/// The call's request: with a form, for what is not there yet.
+Json::Value requestOf(const UploadBody& upload, const OutputFile& output) {
   Json::Value request(Json::objectValue);
+  if (!upload.IsEmpty()) {
+    request["CONTENT_TYPE"] = upload.Type();
+    request["CONTENT_LENGTH"] = std::to_string(upload.Length());
+  }
   if (output.There() > 0) {
     request["HTTP_RANGE"] = "bytes=" + std::to_string(output.There()) + "-";
     request["HTTP_IF_RANGE"] = output.Mark();
@@ -72,6 +78,11 @@ std::string makeCall(const Options& options, Json::Value& answer) {
   if (!wrong.empty()) {
     return wrong;
   }
+  UploadBody upload;
+  const std::string unreadable = upload.Open(options.uploads);
+  if (!unreadable.empty()) {
+    return unreadable;
+  }
   // What a downloading method prints is never mixed with the answer.
   OutputFile output;
   const int closed = output.Open(options.output);
@@ -84,10 +95,13 @@ std::string makeCall(const Options& options, Json::Value& answer) {
       .SetAPI(isBatch ? kBatchAPI : options.api)
       .SetVersion(options.version != 0 ? options.version : 1)
       .SetMethod(isBatch ? kBatchMethod : options.method)
-      .SetEnv(requestOf(output))
+      .SetEnv(requestOf(upload, output))
       .SetRunner(user)
       .SetOutputFd(output.Descriptor());
-  DownloadCall call(param, output, !options.output.empty());
+  TransferCall call(param, output, !options.output.empty());
+  if (!upload.IsEmpty() && !upload.Start()) {
+    return std::string("the files cannot be sent: ") + strerror(errno);
+  }
   answer = call.Process();
   int error = call.GetOutputError();
   const bool isWhole =

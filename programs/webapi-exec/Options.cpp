@@ -25,6 +25,7 @@ const char kHelp[] =
     "                        wire: 5 is a number, true a boolean, '\"5\"' and five are texts\n"
     "    --json FILE         object of parameters, \"-\" for standard input; --param counts "
     "before\n"
+    "    --upload NAME=FILE  sends a file as the field NAME of a form\n"
     "    --output FILE       gets the download, else it is dropped; one that broke off goes on\n"
     "webapi-exec --follow --api API --method METHOD [OPTION...]\n"
     "webapi-exec --follow --task ID [--user NAME]\n"
@@ -57,6 +58,7 @@ enum Option {
   kUser,
   kParam,
   kJson,
+  kUpload,
   kOutput,
   kBatch,
   kFollow,
@@ -71,6 +73,7 @@ constexpr option kOptions[] = {{"help", no_argument, nullptr, kHelpOption},
                                {"user", required_argument, nullptr, kUser},
                                {"param", required_argument, nullptr, kParam},
                                {"json", required_argument, nullptr, kJson},
+                               {"upload", required_argument, nullptr, kUpload},
                                {"output", required_argument, nullptr, kOutput},
                                {"batch", required_argument, nullptr, kBatch},
                                {"follow", no_argument, nullptr, kFollow},
@@ -135,12 +138,13 @@ std::string check(const Options& options, bool hasJson) {
   const bool names = !options.api.empty() || !options.method.empty() || options.version != 0;
   if (!options.task.empty() || (options.follow && (options.list || !options.batch.empty()))) {
     const bool others = options.list || names || hasJson || !options.params.empty() ||
-                        !options.output.empty() || !options.batch.empty();
+                        !options.output.empty() || !options.batch.empty() ||
+                        !options.uploads.empty();
     return options.follow && !others ? ""
                                      : "--follow goes with one call, or with --task and --user";
   }
   if (!options.batch.empty()) {
-    return options.list || names || hasJson || !options.output.empty()
+    return options.list || names || hasJson || !options.output.empty() || !options.uploads.empty()
                ? "--batch goes with --user and --param alone"
                : "";
   }
@@ -150,6 +154,16 @@ std::string check(const Options& options, bool hasJson) {
                : "--list goes with --api, and --version with that";
   }
   return options.api.empty() || options.method.empty() ? "--api and --method are needed" : "";
+}
+
+std::string readUpload(const std::string& text,
+                       std::vector<std::pair<std::string, std::string>>& uploads) {
+  const size_t equals = text.find('=');
+  if (equals == std::string::npos || equals == 0 || equals + 1 == text.size()) {
+    return "--upload takes NAME=FILE";
+  }
+  uploads.emplace_back(text.substr(0, equals), text.substr(equals + 1));
+  return "";
 }
 
 std::string takeWord(const std::string& argument, const char* rule, std::string& word) {
@@ -181,6 +195,8 @@ std::string take(int option, const std::string& argument, Options& options, std:
       return readParam(argument, options.params);
     case kJson:
       return takeWord(argument, "--json takes a file", json);
+    case kUpload:
+      return readUpload(argument, options.uploads);
     case kOutput:
       return takeWord(argument, "--output takes a file", options.output);
     case kBatch:

@@ -3,6 +3,8 @@
 #include <json/json.h>
 
 #include <string>
+#include <utility>
+#include <vector>
 
 namespace QELO::ExecProgram {
 
@@ -25,6 +27,7 @@ struct Options {
   std::string method;
   std::string user;
   Json::Value params{Json::objectValue};
+  std::vector<std::pair<std::string, std::string>> uploads;  ///< fields and files
   std::string output;   ///< file for what the method prints, "" for none
   std::string batch;    ///< file of calls, "" for a single call
   Json::Value calls;    ///< the batch's calls

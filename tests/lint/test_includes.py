@@ -30,7 +30,7 @@ ALLOWED = {
     "platform": FLOOR | SEAM | {"webapi/json"},
     "programs/server": FLOOR | SEAM,
     "programs": FLOOR | SEAM | {"webapi/json", "webapi/model", "webapi/runner", "webapi/batch",
-                                "webapi/entry", "programs/server"},
+                                "webapi/transfer", "webapi/entry", "programs/server"},
     "apis": {"webapi/model", "webapi/runner", "webapi/batch", "webapi/transfer", "webapi/entry"},
 }
 # Exported headers whose file of the same name is none: the folder that they belong to.

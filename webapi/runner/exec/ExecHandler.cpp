@@ -24,6 +24,8 @@
 #include "webapi/model/request/CallerSession.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
+#include "webapi/platform/Upload.h"
+#include "webapi/runner/execution/MethodAccount.h"
 #include "webapi/runner/execution/StandardStreams.h"
 #include "webapi/runner/execution/WorkingDirectory.h"
 
@@ -91,13 +93,40 @@ void tellRequest(const Json::Value& environment) {
   }
 }
 
+/// Temporary files of the upload shall belong to whom the method will run as.
+void setUploadOwner(APIRunner& runner, APIRequest& request) {
+  uid_t uid = 0;
+  gid_t gid = 0;
+  const std::string account = MethodAccount(
+      request,
+      runner.GetMethod(request.GetAPIClass(), request.GetAPIVersion(), request.GetAPIMethod()));
+  if (!account.empty() && QELOUserGetUGID(account.c_str(), &uid, &gid) == 0) {
+    QeloCgiUploadOwnerSet(uid, gid);
+  }
+}
+
 }  // namespace
 
-ExecHandler::ExecHandler(const ExecParam& param) : param_(&param) {}
+class ExecHandler::Runner : public APIRunner {
+ public:
+  explicit Runner(ExecHandler& handler) : handler_(handler) {}
+
+ protected:
+  bool HandleUpload(APIRequest* request, APIResponse* response) override {
+    setUploadOwner(*this, *request);
+    return handler_.HandleUpload(*this, request, response);
+  }
+
+ private:
+  ExecHandler& handler_;
+};
+
+ExecHandler::ExecHandler(const ExecParam& param)
+    : param_(&param), runner_(std::make_unique<Runner>(*this)) {}
 
 ExecHandler::~ExecHandler() {
   const StandardStreams shut(true, true);  // destructors of API libraries are foreign code
-  runner_.CloseLib();
+  runner_->CloseLib();
 }
 
 Json::Value ExecHandler::Process() {
@@ -114,8 +143,8 @@ Json::Value ExecHandler::Process() {
     return result_;
   }
   APIRequest request(request_);
-  if (runner_.GetMethodAttr(&request, "grantable") ||
-      runner_.GetMethodAttr(&request, "grantByDefault")) {
+  if (runner_->GetMethodAttr(&request, "grantable") ||
+      runner_->GetMethodAttr(&request, "grantByDefault")) {
     Run(false);
   } else {
     RunFork();
@@ -150,8 +179,8 @@ void ExecHandler::Run(bool inChild) {
   const std::string user = param_->GetRunner();
   setenv(kUserVariable, user.c_str(), 1);
   setenv(kCallerVariable, user.c_str(), 1);
-  runner_.Run(request_);
-  result_ = runner_.GetResponse();
+  runner_->Run(request_);
+  result_ = runner_->GetResponse();
   if (restore) {
     // Both from the one variable: outside of calls the two are the same user.
     setenv(kUserVariable, former.c_str(), 1);
@@ -198,6 +227,12 @@ void ExecHandler::OutputBegins(const std::string&) {}
 
 void ExecHandler::OutputGrows(size_t) {}
 
+void ExecHandler::CallEnded() {}
+
+bool ExecHandler::HandleUpload(APIRunner&, APIRequest*, APIResponse*) {
+  return true;
+}
+
 /// Copies what stands behind the header block of CGI output. The block's end must come within one
 /// read, or all is dropped.
 /// @return 0, or the errno of the write that failed
@@ -231,6 +266,7 @@ void ExecHandler::RunChild(Pipe& result) noexcept {
   result.WriteOnly(-1);
   takeAnswerPipe(result);
   Run(true);
+  CallEnded();
   std::cout.flush();
   fflush(stdout);
   letGoOfOutput();
