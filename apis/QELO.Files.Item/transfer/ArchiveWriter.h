@@ -8,7 +8,7 @@
 namespace files {
 
 /// Writes an archive into memory, piece by piece, for somebody to take away. Served by a library of
-/// its own, which is loaded by who makes an archive: it brings two dozen others along.
+/// its own, which is loaded by who makes an archive: it brings a dozen others along.
 ///
 /// An operation that fails is told by false; the archive cannot be gone on with then.
 class ArchiveWriter {

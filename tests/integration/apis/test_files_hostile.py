@@ -179,3 +179,36 @@ def test_FolderThatGoesAwayDuringTheCall_IsNotFound(alice, home):
         ends.set()
         thread.join()
     assert codes <= {0, 404, 405}
+
+
+@needs_root
+def test_FullDisk_IsToldAndLeavesNothing(alice, home, root):
+    """By processes that see a disk of 1 MiB in the place of a shared folder."""
+    if subprocess.run(["unshare", "-m", "true"], check=False).returncode != 0:
+        pytest.skip("mounts of one's own are not allowed here")
+    put(home / "large", os.urandom(2 << 20))
+    share = root / "srv" / "common"
+    script = (f'mount -t tmpfs -o size=1m,mode=0777 none "{share}" && "{ENTRY}" && '
+              f'test -z "$(ls -A "{share}")"')
+
+    def call(method, body=b"", **variables):
+        query = urlencode({"api": API, "version": 1, "_sid": alice.sid, "method": method,
+                           **variables.pop("query")})
+        result = subprocess.run(
+            ["unshare", "-m", "sh", "-c", script], input=body, capture_output=True, check=True,
+            timeout=30, env={"REQUEST_METHOD": "POST", "REMOTE_ADDR": "127.0.0.1",
+                             "QUERY_STRING": query, "CONTENT_LENGTH": str(len(body)),
+                             "PATH": os.environ["PATH"], **variables})
+        return answer_of(result.stdout)["error"]
+
+    query = {"path": "/own/large", "to": "/common"}
+    errors = call("copy", REQUEST_METHOD="GET", query=query)["errors"]
+    assert (errors["path"], errors["reason"]) == ("/own/large", "full")
+    form = (b'--x\r\nContent-Disposition: form-data; name="f"; filename="file"\r\n\r\n'
+            + os.urandom(2 << 20) + b"\r\n--x--\r\n")
+    error = call("upload", form, CONTENT_TYPE="multipart/form-data; boundary=x",
+                 query={"path": "/common"})
+    assert error == {"code": 413, "errors": {"path": "/common/file", "reason": "full"}}
+    error = call("tus", HTTP_TUS_RESUMABLE="1.0.0", HTTP_UPLOAD_LENGTH=str(2 << 20),
+                 query={"path": "/common", "name": "file"})
+    assert error["errors"]["reason"] == "full"
