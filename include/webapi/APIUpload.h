@@ -40,6 +40,7 @@ class WEBAPI_API APIUpload {
   /// Results. They are the "upload_err" of error 108.
   enum Result : int {
     DONE = 1,
+    PARTIAL = 2,        ///< a slice has arrived, and more of its file is to come
     BROKEN_OFF = -1,    ///< the body ended early, stalled or could not be read
     NO_DIRECTORY = -2,  ///< no temporary directory has room for it
     MALFORMED = -3,     ///< the body is no form, or one that is not whole
@@ -48,7 +49,9 @@ class WEBAPI_API APIUpload {
     NOTHING_LEFT = -6,  ///< the request announces no body, or all of it has been read
     NO_SPACE = -7,      ///< the disk, or the account's part of it, was full before all was written
     NO_FILE = -8,       ///< GetUploadFile() without a file that follows
-    NO_MEMORY = -9      ///< without memory, or the fields are more than a request may have
+    NO_MEMORY = -9,     ///< without memory, or the fields are more than a request may have
+    WRONG_SLICE = -10,  ///< a slice that does not follow what has arrived, or is nobody's
+    BUSY = -11          ///< another request adds to the file of the slice
   };
 
   /// @param request  outlives this; null: nothing can be loaded

@@ -1,5 +1,6 @@
 // The loaders of the seam, over the one upload of the process.
 
+#include <strings.h>
 #include <unistd.h>
 
 #include <cstdio>
@@ -12,6 +13,7 @@
 #include <vector>
 
 #include "platform/multipart/Limits.h"
+#include "platform/multipart/PartialFile.h"
 #include "platform/multipart/Upload.h"
 #include "webapi/base/FileIdentity.h"
 #include "webapi/base/NullDevice.h"
@@ -25,7 +27,10 @@ namespace {
 struct State {
   std::unique_ptr<Upload> upload;
   std::optional<FileOwner> owner;
-  QELO::FileIdentity input;  ///< where standard input leads to while it is this upload's
+  std::optional<uid_t> caller;
+  std::optional<Slice> slice;  ///< that was loaded
+  uint64_t received = 0;       ///< of its file
+  QELO::FileIdentity input;    ///< where standard input leads to while it is this upload's
 };
 
 State& state() {
@@ -47,6 +52,8 @@ Upload& upload() {
     own.upload = std::make_unique<Upload>(Body(STDIN_FILENO, length, UploadLimits::kIdle),
                                           variable("CONTENT_TYPE"));
     own.input = QELO::FileIdentity(STDIN_FILENO);
+    own.slice.reset();
+    own.received = 0;
   }
   return *own.upload;
 }
@@ -120,9 +127,78 @@ int keepAll(Upload& current, const std::vector<LoadedFile>& loaded, QLIBSZHASH**
   return current.Result();
 }
 
+bool isSlice() {
+  return strcasecmp(variable("HTTP_X_TYPE_NAME").c_str(), "SLICEUPLOAD") == 0;
+}
+
+/// Adds the file that was found to the one that it is a slice of.
+/// @param whole  receives that one, when this was the rest of it
+int addSlice(Upload& current, const Slice& slice, const char* directory,
+             std::unique_ptr<TemporaryFile>& whole) {
+  std::unique_ptr<PartialFile> file;
+  if (const int fault =
+          PartialFile::Open(*state().caller, slice, directory, state().received, file);
+      fault != 0) {
+    return current.Fail(fault);
+  }
+  current.ReadInto([&](std::string_view bytes) { return file->Write(bytes); });
+  state().received = file->Received();
+  if (current.Result() == QELO_UPLOAD_DONE && file->IsWhole()) {
+    whole = file->Finish(state().owner);
+    return whole != nullptr ? current.Result() : current.Fail(QELO_UPLOAD_NO_FILE);
+  }
+  return current.Result();
+}
+
+/// Loads a body that has one slice, or none: then it asks how much there is.
+int loadSlice(Upload& current, const char* directory, QLIBSZHASH** parameters,
+              std::vector<LoadedFile>& loaded) {
+  const std::optional<Slice> slice = readSlice();
+  if (!slice || !state().caller) {
+    return current.Fail(QELO_UPLOAD_WRONG_SLICE);
+  }
+  state().slice = slice;
+  if (current.ReadFields(intoHash(parameters)) != QELO_UPLOAD_DONE) {
+    return current.Result();
+  }
+  std::unique_ptr<TemporaryFile> whole;
+  if (current.PendingFile() == nullptr) {
+    std::unique_ptr<PartialFile> file;
+    const int fault = PartialFile::Open(*state().caller, *slice, nullptr, state().received, file);
+    return fault != 0 ? current.Fail(fault) : QELO_UPLOAD_PARTIAL;
+  }
+  const PartHeader part = *current.PendingFile();
+  if (addSlice(current, *slice, directory, whole) != QELO_UPLOAD_DONE ||
+      current.ReadFields(intoHash(parameters)) != QELO_UPLOAD_DONE) {
+    return current.Result();
+  }
+  if (current.PendingFile() != nullptr) {
+    return current.Fail(QELO_UPLOAD_MALFORMED);
+  }
+  if (whole == nullptr) {
+    return QELO_UPLOAD_PARTIAL;
+  }
+  loaded.push_back({part.field, part.fileName});
+  current.Adopt(std::move(whole));
+  return current.Result();
+}
+
 }  // namespace
 
 extern "C" {
+
+void QeloCgiUploadCallerSet(uid_t uid) {
+  state().caller = uid;
+}
+
+int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size) {
+  if (!state().slice) {
+    return 0;
+  }
+  *received = state().received;
+  *size = state().slice->size;
+  return 1;
+}
 
 void QeloCgiUploadOwnerSet(uid_t uid, gid_t gid) {
   state().owner = FileOwner{uid, gid};
@@ -131,11 +207,13 @@ void QeloCgiUploadOwnerSet(uid_t uid, gid_t gid) {
 int QeloCgiLoadUploadAll(QLIBSZHASH** parameters, QLIBSZHASH** files, const char* directory, int) {
   Upload& current = upload();
   std::vector<LoadedFile> loaded;
-  if (loadAll(current, directory, parameters, loaded) == QELO_UPLOAD_DONE) {
-    keepAll(current, loaded, parameters, files);
+  int result = isSlice() ? loadSlice(current, directory, parameters, loaded)
+                         : loadAll(current, directory, parameters, loaded);
+  if (result == QELO_UPLOAD_DONE) {
+    result = keepAll(current, loaded, parameters, files);
   }
   closeReceived(current);
-  return current.Result();
+  return result;
 }
 
 int QeloCgiLoadUploadNumParams(QeloCgiContext* context, int, int, unsigned long long positions[2],

@@ -141,6 +141,26 @@ std::unique_ptr<TemporaryFile> TemporaryFile::Create(std::shared_ptr<const Tempo
   return made;
 }
 
+std::unique_ptr<TemporaryFile> TemporaryFile::Adopt(std::shared_ptr<const TemporaryFolder> folder,
+                                                    UniqueFd file, const std::string& name,
+                                                    const std::optional<FileOwner>& owner) {
+  const int directory = folder->Descriptor();
+  const std::string own = makeName();
+  if (own.empty() || flock(file.Get(), LOCK_EX | LOCK_NB) != 0 || !give(file.Get(), owner)) {
+    return nullptr;
+  }
+  std::unique_ptr<TemporaryFile> made(new TemporaryFile(std::move(folder), std::move(file)));
+  LastWords::Add(directory, own);
+  if (renameat(directory, name.c_str(), directory, own.c_str()) != 0) {
+    const int error = errno;
+    LastWords::Remove(directory, own);
+    errno = error;
+    return nullptr;
+  }
+  made->name_ = own;
+  return made;
+}
+
 TemporaryFile::TemporaryFile(std::shared_ptr<const TemporaryFolder> folder, UniqueFd file)
     : folder_(std::move(folder)), file_(std::move(file)), maker_(getpid()) {}
 

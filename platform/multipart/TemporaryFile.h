@@ -50,6 +50,11 @@ class TemporaryFile {
   /// @return null, with errno, when it cannot be made
   static std::unique_ptr<TemporaryFile> Create(std::shared_ptr<const TemporaryFolder> folder,
                                                const std::optional<FileOwner>& owner);
+  /// Makes one of a file that has a name in the folder, which it changes.
+  /// @return null, with errno; the file is then as it was, or its owner's
+  static std::unique_ptr<TemporaryFile> Adopt(std::shared_ptr<const TemporaryFolder> folder,
+                                              UniqueFd file, const std::string& name,
+                                              const std::optional<FileOwner>& owner);
   TemporaryFile(const TemporaryFile&) = delete;
   TemporaryFile& operator=(const TemporaryFile&) = delete;
   ~TemporaryFile();

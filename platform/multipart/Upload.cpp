@@ -140,6 +140,15 @@ int Upload::ReadFile(const char* directory, const std::optional<FileOwner>& owne
   return result_;
 }
 
+int Upload::ReadInto(const PartReader::Sink& sink) {
+  if (result_ != QELO_UPLOAD_DONE || !hasFile_) {
+    return result_;
+  }
+  hasFile_ = false;
+  const int fault = reader_->ReadContent(sink);
+  return fault != 0 ? Fail(fault) : result_;
+}
+
 int Upload::KeepFiles(std::vector<std::string>& paths) {
   for (const std::unique_ptr<TemporaryFile>& file : files_) {
     if (file->Path().empty() && !file->Keep()) {

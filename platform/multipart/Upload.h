@@ -38,6 +38,10 @@ class Upload {
   /// @param keep  gives it its name at once; else KeepFiles() does
   int ReadFile(const char* directory, const std::optional<FileOwner>& owner, bool keep,
                std::string& path);
+  /// Receives the file that was found into something else.
+  int ReadInto(const PartReader::Sink& sink);
+  /// Adds a file that was made of it.
+  void Adopt(std::unique_ptr<TemporaryFile> file) { files_.push_back(std::move(file)); }
   /// Gives the files that have none their names.
   /// @param paths  receives all files' paths, in the order in which they came
   int KeepFiles(std::vector<std::string>& paths);

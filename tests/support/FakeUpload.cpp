@@ -40,6 +40,16 @@ void QeloCgiUploadOwnerSet(uid_t uid, gid_t gid) {
   fake().group = gid;
 }
 
+void QeloCgiUploadCallerSet(uid_t uid) {
+  fake().caller = uid;
+}
+
+int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size) {
+  *received = fake().sliceReceived;
+  *size = fake().sliceSize;
+  return fake().sliceSize != 0 ? 1 : 0;
+}
+
 int QeloCgiLoadUploadAll(QLIBSZHASH** parameters, QLIBSZHASH** files, const char* directory, int) {
   note("QeloCgiLoadUploadAll");
   fake().directory = directory;

@@ -20,6 +20,10 @@ struct FakeUpload {
   unsigned long long positions[2] = {};
   bool callsBack = false;  ///< the progress function is called with 1 of 2
 
+  uid_t caller = static_cast<uid_t>(-1);
+  unsigned long long sliceReceived = 0;
+  unsigned long long sliceSize = 0;  ///< 0: no slice was loaded
+
   std::string directory;  ///< where files were to go
   uid_t owner = static_cast<uid_t>(-1);
   gid_t group = static_cast<gid_t>(-1);

@@ -23,12 +23,15 @@ extern "C" {
 /// Results of the loaders. The caller's own are -2, -6 and -8.
 enum QeloUploadResult {
   QELO_UPLOAD_DONE = 1,
+  QELO_UPLOAD_PARTIAL = 2,      ///< a slice has been received, and more of its file is to come
   QELO_UPLOAD_BROKEN_OFF = -1,  ///< the body ended early, stalled or could not be read
   QELO_UPLOAD_MALFORMED = -3,   ///< it is no form, or one that is not whole
   QELO_UPLOAD_TOO_LARGE = -4,   ///< a field, a header or their number is beyond its limit
   QELO_UPLOAD_NO_FILE = -5,     ///< a temporary file could not be made or written
   QELO_UPLOAD_NO_SPACE = -7,    ///< the disk, or the owner's part of it, is full
-  QELO_UPLOAD_NO_MEMORY = -9
+  QELO_UPLOAD_NO_MEMORY = -9,
+  QELO_UPLOAD_WRONG_SLICE = -10,  ///< it says not what it is, or does not follow what has come
+  QELO_UPLOAD_BUSY = -11          ///< another request has the file of the slice
 };
 
 /// How far an upload has come. All zero before the first loader is called.
@@ -45,7 +48,15 @@ typedef void (*QeloCgiUploadProgress)(unsigned long long done, unsigned long lon
 /// Who temporary files shall belong to from now on, instead of the effective user.
 WEBAPI_API void QeloCgiUploadOwnerSet(uid_t uid, gid_t gid);
 
-/// Loads the whole body.
+/// Whose slices the request has: a file is put together from the slices of one caller. Without it
+/// slices are refused.
+WEBAPI_API void QeloCgiUploadCallerSet(uid_t uid);
+/// Of a request with a slice, how much of its file there is.
+/// @return 1, and 0 when none was loaded
+WEBAPI_API int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size);
+
+/// Loads the whole body. Where the CGI variable HTTP_X_TYPE_NAME is "SLICEUPLOAD", in any case, the
+/// body's file is a slice of one that comes in several requests: `files` has it when it is whole.
 /// @param parameters  receives the ordinary fields, and a file's name under its field
 /// @param files       receives the path of each file under its field; a field's second file is
 /// under

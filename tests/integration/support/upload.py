@@ -39,12 +39,12 @@ def uploading(describe, level=2):
         {"keep": takes}, {"leave": takes}, {"die": takes}, {"wait": takes}]})
 
 
-def post(client, form, method="take", **parameters):
+def post(client, form, method="take", headers=None, **parameters):
     """Sends a form; `method` None: the call stands in it."""
     body = form if isinstance(form, bytes) else form.body()
     query = {} if method is None else {"api": API, "version": 1, "method": method, **parameters}
     target = "/webapi/entry.cgi" + (f"?{urlencode(query)}" if query else "")
-    return client.request("POST", target, body=body, headers={"Content-Type": TYPE})
+    return client.request("POST", target, body=body, headers={"Content-Type": TYPE, **(headers or {})})
 
 
 def files_of(answer):

@@ -20,6 +20,8 @@
 namespace QELO {
 namespace {
 
+constexpr unsigned int kNobody = 0xFFFFFFFF;
+
 /// The files shall belong to whom the method will run as.
 void setOwner(APIRequest& request, const Json::Value& attributes) {
   uid_t uid = 0;
@@ -46,6 +48,35 @@ void takeFields(Json::Value&& params, APIRequest& request) {
   request.InitParam(std::move(checked), false);
 }
 
+/// What became of an upload that the method is not called for: a failure, or a slice of a file that
+/// more of is to come.
+void answerUnfinished(int result, APIResponse& response) {
+  Json::Value told(Json::objectValue);
+  unsigned long long received = 0;
+  unsigned long long size = 0;
+  if (QeloCgiUploadSliceGet(&received, &size) == 1) {
+    told["received"] = Json::UInt64{received};
+    told["size"] = Json::UInt64{size};
+  }
+  if (result == APIUpload::PARTIAL) {
+    response.SetSuccess(told);
+    return;
+  }
+  told["upload_err"] = result;
+  response.SetError(WEBAPI_ERR_UPLOAD_FAILED, told);
+}
+
+/// A file in slices is put together for one caller alone.
+void setCaller(const APIRequest& request) {
+  if (!request.IsSliceUploadRequest()) {
+    return;
+  }
+  const unsigned int uid = request.GetLoginUID();
+  if (uid != kNobody) {
+    QeloCgiUploadCallerSet(uid);
+  }
+}
+
 }  // namespace
 
 bool WebEntry::HandleUpload(APIRequest* request, APIResponse* response) {
@@ -58,14 +89,13 @@ bool WebEntry::HandleUpload(APIRequest* request, APIResponse* response) {
   }
   setOwner(*request,
            GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod()));
+  setCaller(*request);
   Json::Value params(Json::objectValue);
   Json::Value& fields = params[Literal("postParam")];
   fields = Json::Value(Json::objectValue);
   const int result = APIUpload(request).GetUploadAll(fields, &temporaryFiles_);
   if (result != APIUpload::DONE) {
-    Json::Value errors(Json::objectValue);
-    errors["upload_err"] = result;
-    response->SetError(WEBAPI_ERR_UPLOAD_FAILED, errors);
+    answerUnfinished(result, *response);
     return false;
   }
   takeFields(std::move(params), *request);

@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <memory>
 #include <utility>
 
@@ -16,7 +17,23 @@ namespace {
 constexpr char kFilesAttribute[] = "_upload_files";
 /// Bytes that must be free beyond what comes: it comes into a file system that others write to.
 constexpr unsigned long long kMargin = 5ULL << 20;
+/// More than any disk has free.
+constexpr uint64_t kMostBytes = 1ULL << 62;
 constexpr int kHashSize = 256;
+
+/// A length that a client announces may be any number.
+unsigned long long withMargin(uint64_t length) {
+  return std::min(length, kMostBytes) + kMargin;
+}
+
+/// Of a file that comes in slices, the bytes that are still to come.
+uint64_t restOfSlices(const APIRequest& request) {
+  if (!request.IsSliceUploadRequest()) {
+    return 0;
+  }
+  const uint64_t size = JsonHelper::asUInt64(request.GetEnv("HTTP_X_FILE_SIZE", 0), 0);
+  return size - std::min(size, JsonHelper::asUInt64(request.GetEnv("HTTP_X_SLICE_OFFSET", 0), 0));
+}
 
 struct FreeHash {
   void operator()(QLIBSZHASH* hash) const { QLIBCSzHashFree(hash); }
@@ -49,7 +66,7 @@ int APIUploadPrivate::GetUploadAll(Json::Value& params, Json::Value* tmpFiles) {
     return APIUpload::NOTHING_LEFT;
   }
   std::string directory;
-  if (!ChooseTemporaryDirectory(length + kMargin, directory)) {
+  if (!ChooseTemporaryDirectory(withMargin(std::max(length, restOfSlices(*request_))), directory)) {
     return APIUpload::NO_DIRECTORY;
   }
   Hash parameters(QLIBCSzHashAlloc(kHashSize));
@@ -116,7 +133,7 @@ int APIUploadPrivate::GetUploadFile(Json::Value& params) {
     return state_.result = APIUpload::NOTHING_LEFT;
   }
   std::string directory;
-  if (!ChooseTemporaryDirectory(state_.left + kMargin, directory)) {
+  if (!ChooseTemporaryDirectory(withMargin(state_.left), directory)) {
     return state_.result = APIUpload::NO_DIRECTORY;
   }
   const std::string field = field_;

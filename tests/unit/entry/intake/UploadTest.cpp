@@ -138,6 +138,37 @@ TEST_F(UploadIntake, ResumableUploadThatNamesItsCallInTheBodyIsReadAsAnyOther) {
   EXPECT_TRUE(Serve().Json()["success"].asBool());
 }
 
+TEST_F(UploadIntake, SliceAfterWhichMoreIsToComeIsAnsweredWithoutTheMethod) {
+  platform->upload.all = 2;
+  platform->upload.sliceReceived = 5'000'000'000;
+  platform->upload.sliceSize = 6'000'000'000;
+  EXPECT_EQ(Upload(kTaken).Json(),
+            Parse(R"({"success": true, "data": {"received": 5000000000, "size": 6000000000}})"));
+}
+
+TEST_F(UploadIntake, SliceThatIsRefusedTellsHowMuchThereIs) {
+  platform->upload.all = -10;
+  platform->upload.sliceReceived = 7;
+  platform->upload.sliceSize = 9;
+  EXPECT_EQ(Upload(kTaken).Json(), Parse(R"({"success": false, "error": {"code": 108, "errors":
+                      {"upload_err": -10, "received": 7, "size": 9}}})"));
+}
+
+TEST_F(UploadIntake, SliceIsItsCallers) {
+  Upload(kTaken);
+  EXPECT_EQ(platform->upload.caller, static_cast<uid_t>(-1));
+  Set("HTTP_X_TYPE_NAME", "SLICEUPLOAD");
+  Upload(kTaken);  // nobody is logged in
+  EXPECT_EQ(platform->upload.caller, static_cast<uid_t>(-1));
+  platform->authorized = 1;
+  platform->authorizedUser = "alice";
+  Set("HTTP_COOKIE", "id=S");
+  Describe(R"({"authLevel": 1, "allowUser": ["normal.local"]})", kTaken);
+  Post("--x\r\nbody");
+  Serve();
+  EXPECT_EQ(platform->upload.caller, 1000U);
+}
+
 TEST_F(UploadIntake, UploadToAMethodThatTakesNoneSets115) {
   EXPECT_EQ(Upload(R"({"grantByDefault": true})").Code(), 115);
 }

@@ -45,6 +45,28 @@ TEST_F(WholeUpload, LengthBeyond32BitsIsTaken) {
   EXPECT_EQ(APIUpload(&large).GetUploadAll(params, &files), 1);
 }
 
+TEST_F(WholeUpload, LengthBeyondAnyDiskHasNoRoom) {
+  APIRequest vast(Environment("18446744073709551615"));
+  EXPECT_EQ(APIUpload(&vast).GetUploadAll(params, &files), -2);
+}
+
+TEST_F(WholeUpload, SliceNeedsRoomForTheRestOfItsFile) {
+  Json::Value record = Environment("1000");
+  record["environ"]["HTTP_X_TYPE_NAME"] = "SLICEUPLOAD";
+  record["environ"]["HTTP_X_FILE_SIZE"] = "9000";
+  record["environ"]["HTTP_X_SLICE_OFFSET"] = "2000";
+  APIRequest slice(record);
+  host.freeBytes[Paths::kRoot] = 0;
+  host.freeBytes[Paths::kTmp] = 7000 + kMargin - 1;
+  EXPECT_EQ(APIUpload(&slice).GetUploadAll(params, &files), -2);
+  host.freeBytes[Paths::kTmp] += 1;
+  EXPECT_EQ(APIUpload(&slice).GetUploadAll(params, &files), 1);
+  record["environ"]["HTTP_X_SLICE_OFFSET"] = "9001";
+  APIRequest beyond(record);
+  host.freeBytes[Paths::kTmp] = 1000 + kMargin;
+  EXPECT_EQ(APIUpload(&beyond).GetUploadAll(params, &files), 1);
+}
+
 TEST_F(WholeUpload, WithoutMemoryForAHashIsLogged) {
   for (const int hashes : {0, 1}) {
     SyslogCapture::Clear();
