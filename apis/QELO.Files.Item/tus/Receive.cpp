@@ -1,10 +1,13 @@
 // The body of a request as it arrives, into the unfinished file.
 
+#include <fcntl.h>
 #include <poll.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
+#include <charconv>
+#include <limits>
 #include <memory>
 
 #include "calls/Call.h"
@@ -43,16 +46,35 @@ int writeAll(int file, const char* data, size_t size, uint64_t at) {
   return 0;
 }
 
+/// Where the body comes by a pipe, it may hold as much as is read at once, which saves the server
+/// and this process three of four turns.
+void widenPipe() {
+  fcntl(STDIN_FILENO, F_SETPIPE_SZ, static_cast<int>(kPiece));
+}
+
+/// The bytes of the request's body; without an end where the server does not know them.
+uint64_t announcedLength(const std::string& header) {
+  uint64_t length = std::numeric_limits<uint64_t>::max();
+  std::from_chars(header.data(), header.data() + header.size(), length);
+  return length;
+}
+
 /// Writes what comes behind the file's first `length` bytes, up to `end`.
-/// @param isMore  whether the client sent more than that
+/// @param left    bytes that come
+/// @param isMore  whether the client sent more than up to the end
 /// @return 0 or errno
-int receive(int file, uint64_t end, Digest* digest, uint64_t& length, bool& isMore) {
+int receive(int file, uint64_t end, uint64_t left, Digest* digest, uint64_t& length, bool& isMore) {
   const std::unique_ptr<char[]> buffer(new char[kPiece]);
   isMore = false;
-  while (true) {
-    const size_t room = std::min<uint64_t>(kPiece, end - length + 1);  // one more shows more
-    const ssize_t count = readSome(buffer.get(), room);
-    const size_t taken = std::min<uint64_t>(static_cast<uint64_t>(count), end - length);
+  widenPipe();
+  while (left > 0 && !isMore) {
+    // One more than there may be shows whether there is more.
+    const size_t room = std::min({uint64_t{kPiece}, end - length + 1, left});
+    const auto count = static_cast<uint64_t>(readSome(buffer.get(), room));
+    const uint64_t taken = std::min(count, end - length);
+    if (count == 0) {
+      break;
+    }
     if (const int error = writeAll(file, buffer.get(), taken, length); error != 0) {
       return error;
     }
@@ -60,18 +82,19 @@ int receive(int file, uint64_t end, Digest* digest, uint64_t& length, bool& isMo
       digest->Add(buffer.get(), taken);
     }
     length += taken;
-    isMore = static_cast<size_t>(count) > taken;
-    if (count == 0 || isMore) {
-      return 0;
-    }
+    left -= count;
+    isMore = count > taken;
   }
+  return 0;
 }
 
 }  // namespace
 
 bool Exchange::Receive(const UploadState& state, const UploadData& data, uint64_t& length) {
   bool isMore = false;
-  if (const int error = receive(data.Get(), state.length, nullptr, length, isMore); error != 0) {
+  const uint64_t left = announcedLength(Header("CONTENT_LENGTH"));
+  if (const int error = receive(data.Get(), state.length, left, nullptr, length, isMore);
+      error != 0) {
     return Refuse(reasonOf(error), state.path.Text());
   }
   if (isMore) {
@@ -99,7 +122,8 @@ bool Exchange::ReceiveChecked(UploadState& state, const UploadData& data, uint64
     return Refuse(Reason::kFailed, state.path.Text());
   }
   bool isMore = false;
-  const int error = receive(data.Get(), state.length, digest.get(), length, isMore);
+  const uint64_t left = announcedLength(Header("CONTENT_LENGTH"));
+  const int error = receive(data.Get(), state.length, left, digest.get(), length, isMore);
   const bool isRight = error == 0 && !isMore && digest->Finish() == expected;
   if (!isRight) {
     if (!Settle(state, data)) {

@@ -3,22 +3,18 @@
 import base64
 import fcntl
 import hashlib
-import http.client
 import json
 import os
-import socket
+import subprocess
 import time
-from urllib.parse import urlencode
 
 import pytest
 
 from client import Client
 from conftest import ENTRY
-from files import API, Visitor, bob, common, give, give_folder, home, put  # noqa: F401  (fixtures)
+from files import Visitor, bob, common, give, give_folder, home, put  # noqa: F401  (fixtures)
+from tus import BODY, Uploader, wait_for_offset
 from webserver import WebServer
-
-BODY = "application/offset+octet-stream"
-
 
 @pytest.fixture(scope="module")
 def streaming(root, tmp_path_factory):
@@ -38,70 +34,12 @@ def alice(streaming, home):  # noqa: F811
     return visitor
 
 
-class Uploader:
-    """What a client of the protocol does."""
-
-    def __init__(self, user, folder="/own", query=None):
-        self.user = user
-        self.endpoint = "/webapi/entry.cgi?" + urlencode(
-            {"api": API, "version": 1, "method": "tus", "_sid": user.sid,
-             "path": json.dumps(folder), **(query or {})})
-        self.location = None
-
-    def request(self, verb, target=None, body=b"", **headers):
-        headers = {"Tus-Resumable": "1.0.0",
-                   **{name.replace("_", "-"): value for name, value in headers.items()}}
-        connection = http.client.HTTPConnection("127.0.0.1", self.user.client.port, timeout=30)
-        try:
-            connection.request(verb, target or self.location, body=body,
-                               headers={name: value for name, value in headers.items() if value})
-            response = connection.getresponse()
-            response.content = response.read()
-            return response
-        finally:
-            connection.close()
-
-    def create(self, name, length, **headers):
-        metadata = "filetype dGV4dA==,filename " + base64.b64encode(name.encode()).decode()
-        answer = self.request("POST", self.endpoint, Upload_Length=str(length),
-                              Upload_Metadata=metadata, **headers)
-        self.location = answer.headers["Location"]
-        return answer
-
-    def patch(self, offset, data, **headers):
-        return self.request("PATCH", body=data, **{
-            "Upload_Offset": str(offset), "Content_Type": BODY, **headers})
-
-    def offset(self):
-        answer = self.request("HEAD")
-        assert answer.status == 200, answer.status
-        return int(answer.headers["Upload-Offset"])
-
-    def break_off(self, offset, data, announced, **headers):
-        """Sends the beginning of a body, and hangs up."""
-        more = "".join(f"{name.replace('_', '-')}: {value}\r\n" for name, value in headers.items())
-        head = (f"PATCH {self.location} HTTP/1.1\r\nHost: localhost\r\nTus-Resumable: 1.0.0\r\n"
-                f"Content-Type: {BODY}\r\nUpload-Offset: {offset}\r\n"
-                f"{more}Content-Length: {announced}\r\n\r\n")
-        with socket.create_connection(("127.0.0.1", self.user.client.port)) as connection:
-            connection.sendall(head.encode() + data)
-            time.sleep(0.3)
-
-
 def unfinished(folder):
     return [name for name in os.listdir(folder) if name.startswith(".qelo-part-")]
 
 
 def states(home):  # noqa: F811
     return sorted((home / ".webapi" / "uploads").glob("*.json"))
-
-
-def wait_for_offset(upload):
-    """The offset when the request that was broken off has ended."""
-    deadline = time.monotonic() + 10
-    while (answer := upload.request("HEAD")).status == 423 and time.monotonic() < deadline:
-        time.sleep(0.05)
-    return int(answer.headers["Upload-Offset"])
 
 
 def test_Options_TellsWhatThereIs(alice):
@@ -376,6 +314,22 @@ def test_UnfinishedUploads_HaveALimit(alice, home):
     assert Uploader(alice).create("more", 10).status == 429
     assert upload.request("DELETE").status == 204
     assert Uploader(alice).create("more", 10).status == 201
+
+
+def test_BodyOfTheAnnouncedLength_IsNotWaitedBehind(alice, home):
+    """The server may keep the pipe open that the body comes by."""
+    upload = Uploader(alice)
+    upload.create("file", 100)
+    variables = {"REQUEST_METHOD": "PATCH", "REMOTE_ADDR": "127.0.0.1", "CONTENT_TYPE": BODY,
+                 "QUERY_STRING": upload.location.split("?", 1)[1], "CONTENT_LENGTH": "5",
+                 "HTTP_TUS_RESUMABLE": "1.0.0", "HTTP_UPLOAD_OFFSET": "0"}
+    with subprocess.Popen([ENTRY], stdin=subprocess.PIPE, stdout=subprocess.PIPE,
+                          env=variables) as process:
+        process.stdin.write(b"12345")
+        process.stdin.flush()
+        answer = process.stdout.read()
+    assert b"Upload-Offset: 5" in answer
+    assert upload.offset() == 5
 
 
 def test_BodyLeftUnread_LosesNoAnswer(alice):
