@@ -36,6 +36,8 @@ class Listener {
   ~Listener();
 
   int Descriptor() const { return socket_.Get(); }
+  /// Whether it was made here, and not handed.
+  bool IsOurs() const { return inode_ != 0; }
   /// The socket's path; "" for one of another kind.
   const std::string& Path() const { return path_; }
 

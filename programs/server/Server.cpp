@@ -88,7 +88,7 @@ bool Server::Listen(Listener listener) {
 
 void Server::StopListening(const std::string& path) {
   for (auto it = listeners_.begin(); it != listeners_.end();) {
-    if (it->Path() == path) {
+    if (it->IsOurs() && it->Path() == path) {
       Unwatch(it->Descriptor());
       it = listeners_.erase(it);
     } else {
@@ -177,19 +177,21 @@ void Server::Stop() {
   }
   // What has connected already was promised an answer.
   for (const Listener& listener : listeners_) {
-    Accept(listener);
+    while (Accept(listener)) {
+    }
   }
   listeners_.clear();
 }
 
-void Server::Accept(const Listener& listener) {
+/// @return whether there may be more
+bool Server::Accept(const Listener& listener) {
   for (int i = 0; i < kAcceptedAtOnce; ++i) {
     const int accepted = accept4(listener.Descriptor(), nullptr, nullptr, SOCK_CLOEXEC);
     if (accepted < 0) {
       if (errno == EMFILE || errno == ENFILE || errno == ENOMEM) {
         poll(nullptr, 0, kShortageMilliseconds);  // they wait for those that end
       }
-      return;
+      return false;
     }
     auto connection = std::make_unique<Connection>();
     connection->socket = UniqueFd(accepted);
@@ -200,6 +202,7 @@ void Server::Accept(const Listener& listener) {
       Arrive(std::move(connection));
     }
   }
+  return true;
 }
 
 void Server::Arrive(Held connection) {

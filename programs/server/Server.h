@@ -34,7 +34,7 @@ class Server {
   bool Open();
   /// Listens there as well.
   bool Listen(Listener listener);
-  /// Listens there no more.
+  /// Listens there no more, unless that socket was handed by somebody else.
   void StopListening(const std::string& path);
   std::vector<std::string> Paths() const;
 
@@ -47,7 +47,7 @@ class Server {
   bool Watch(int descriptor);
   void Unwatch(int descriptor);
   void HandleSignals();
-  void Accept(const Listener& listener);
+  bool Accept(const Listener& listener);
   void Arrive(Held connection);
   void Enqueue(Held connection);
   void Start(Held connection);

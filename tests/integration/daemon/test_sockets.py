@@ -1,6 +1,6 @@
 """Where the API daemon listens."""
 
-import os
+import signal
 import socket
 import subprocess
 
@@ -66,13 +66,17 @@ def test_SocketsOfTheServiceManager_AreServed(root, describe, tmp_path):
     with socket.socket(socket.AF_UNIX) as listener:
         listener.bind(str(path))
         listener.listen()
-        os.dup2(listener.fileno(), 3)
         program = Service(tmp_path, "qeloapid").program
         process = subprocess.Popen(
-            ["sh", "-c", 'LISTEN_PID=$$ exec "$0"', program], pass_fds=[3],
+            ["bash", "-c", 'exec 3<&"$1"; LISTEN_PID=$$ exec "$0"', program, str(listener.fileno())],
+            pass_fds=[listener.fileno()],
             env={"LISTEN_FDS": "1", "PATH": "/bin:/usr/bin"}, stdin=subprocess.DEVNULL)
         try:
             assert call(ENTRIES, "echo", a=1)["data"]["a"] == 1
+            describe(ENTRIES, "entries.so", methods={"1": ["echo"]})
+            process.send_signal(signal.SIGHUP)
+            describe(ENTRIES, "entries.so", socket=str(path), methods={"1": ["echo"]})
+            assert call(ENTRIES, "echo", a=1)["data"]["a"] == 1, "it is not the daemon's to close"
         finally:
             process.terminate()
             process.wait(timeout=10)

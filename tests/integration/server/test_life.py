@@ -3,6 +3,7 @@
 import os
 import shutil
 import signal
+import socket
 import stat
 import subprocess
 import time
@@ -151,3 +152,23 @@ def test_WrongOptions_AreRefused(root, options):
     done = subprocess.run([BUILD / "programs" / "webapi-server", *options], capture_output=True,
                           text=True, timeout=10, check=False)
     assert done.returncode in (1, 2) and "usage: webapi-server" in done.stderr
+
+
+def test_SocketsOfTheServiceManager_AreServedAndLeft(start, tmp_path):
+    path = tmp_path / "handed.sock"
+    server = ForkServer(tmp_path)
+    server.path = path
+    with socket.socket(socket.AF_UNIX) as listener:
+        listener.bind(str(path))
+        listener.listen()
+        process = subprocess.Popen(
+            ["bash", "-c", 'exec 3<&"$1"; LISTEN_PID=$$ exec "$0"', server.program,
+             str(listener.fileno())],
+            pass_fds=[listener.fileno()], env={"LISTEN_FDS": "1", "PATH": "/bin:/usr/bin"},
+            stdin=subprocess.DEVNULL)
+        try:
+            assert server.call(ECHO)["data"]["a"] == 1
+        finally:
+            process.terminate()
+            assert process.wait(timeout=10) == 0
+    assert path.exists()

@@ -146,7 +146,9 @@ def test_AnswerThatHasBegun_EndsWithoutAnother(start):
 
 
 def test_Soak_LosesNoAnswerAndLeavesNothing(start):
-    """Good requests among slow senders, hang-ups and headers that are too long."""
+    """Good requests among slow senders, hang-ups and headers that are too long. Longer and with more
+    clients by WEBAPI_SOAK_SECONDS and WEBAPI_SOAK_CLIENTS."""
+    clients = int(os.environ.get("WEBAPI_SOAK_CLIENTS", "40"))
     server = start("--requests", 8, "--header-limit", 2)
     assert server.call(QUERY + "echo&n=0")["success"]
     descriptors = len(os.listdir(f"/proc/{server.process.pid}/fd"))
@@ -178,8 +180,8 @@ def test_Soak_LosesNoAnswerAndLeavesNothing(start):
                 pass
             time.sleep(0.02)
 
-    threads = [threading.Thread(target=ask, args=(n,)) for n in range(16)]
-    threads += [threading.Thread(target=annoy, args=(n,)) for n in range(24)]
+    threads = [threading.Thread(target=ask, args=(n,)) for n in range(clients * 2 // 5)]
+    threads += [threading.Thread(target=annoy, args=(n,)) for n in range(clients * 3 // 5)]
     for thread in threads:
         thread.start()
     for thread in threads:
