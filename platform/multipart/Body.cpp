@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "webapi/base/TakenBody.h"
 #include "webapi/platform/Upload.h"
 
 namespace QELO::Platform {
@@ -38,6 +39,7 @@ int64_t Body::Read(char* buffer, size_t size) {
     const ssize_t count = TEMP_FAILURE_RETRY(read(descriptor_, buffer, wanted));
     if (count > 0) {
       left_ -= static_cast<uint64_t>(count);
+      TakenBodyBytes() += descriptor_ == STDIN_FILENO ? count : 0;
       return count;
     }
     if (count == 0 || errno != EAGAIN) {

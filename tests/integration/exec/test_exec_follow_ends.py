@@ -42,6 +42,7 @@ def test_KilledProcess_IsAFailure(work, follow):
 
 def test_TaskThatSomebodyElseStops_IsAFailure(work, follow):
     terminal = follow(*work(counts(1, 4)).arguments())
+    terminal.wait_until(shown(25))
     assert task("stop", terminal.task_id())["success"]
     status, output = terminal.finish()
     assert (status, json.loads(output)["data"]["files"]) == (1, {"done": 1, "total": 4})

@@ -168,3 +168,18 @@ def test_VolumeOfTheSettings_ComesFirst(root, client):
         settings.write_text(before)
         (volume / "@tmp").rmdir()
         volume.rmdir()
+
+
+@pytest.mark.parametrize("method", ["take", "defer"])
+@pytest.mark.parametrize("epilogue", [b"", b"x" * 100_000], ids=["bare", "epilogue"])
+def test_BodyThatHasArrived_IsNotWaitedFor(method, epilogue):
+    body = Form().file("f", "x", bytes(1_000_000)).body() + epilogue
+    process = start(len(body), method)
+    begin = time.monotonic()
+    process.stdin.write(body)
+    process.stdin.flush()  # and not closed: the server leaves that to the end
+    answer = answer_of(process.stdout.read())
+    process.wait(timeout=10)
+    process.stdin.close()
+    assert answer["success"]
+    assert time.monotonic() - begin < 1.5

@@ -43,7 +43,7 @@ UnreadBody UnreadBody::OfRequest() {
 
 void UnreadBody::DropSome() {
   char chunk[kChunkSize];
-  const size_t size = static_cast<size_t>(std::min<int64_t>(left_, sizeof chunk));
+  const size_t size = static_cast<size_t>(std::min<int64_t>(Left(), sizeof chunk));
   const ssize_t count = TEMP_FAILURE_RETRY(read(descriptor_, chunk, size));
   if (count > 0) {
     left_ -= count;

@@ -4,6 +4,7 @@
 #include <cstdint>
 
 #include "webapi/base/FileIdentity.h"
+#include "webapi/base/TakenBody.h"
 
 namespace QELO {
 
@@ -28,7 +29,7 @@ class UnreadBody {
 
   /// Whether there may be more. Not when the descriptor leads elsewhere by now: the body has been
   /// taken, or foreign code has closed it.
-  bool IsOpen() const { return left_ > 0 && body_.IsAt(descriptor_); }
+  bool IsOpen() const { return Left() > 0 && body_.IsAt(descriptor_); }
   int Descriptor() const { return descriptor_; }
 
   /// Drops what has come. REQUIRES: IsOpen(), and that reading does not wait
@@ -37,9 +38,13 @@ class UnreadBody {
   void Drop();
 
  private:
+  /// Most bytes that may still be dropped.
+  int64_t Left() const { return left_ - (TakenBodyBytes() - taken_); }
+
   int descriptor_;
   FileIdentity body_;
-  int64_t left_;  ///< most bytes that may still be dropped
+  int64_t left_;  ///< but for what others have taken since
+  int64_t taken_ = TakenBodyBytes();
 };
 
 }  // namespace QELO

@@ -8,6 +8,7 @@
 #include <chrono>
 
 #include "tests/support/CgiFixture.h"
+#include "webapi/base/TakenBody.h"
 
 namespace QELO {
 namespace {
@@ -44,6 +45,21 @@ TEST_F(Unread, IsDroppedToTheAnnouncedLengthAndNotWaitedForBeyond) {
   EXPECT_TRUE(body.IsOpen());
   body.Drop();
   EXPECT_FALSE(body.IsOpen());
+  close(writer);
+  writer = -1;
+  EXPECT_EQ(RestOfInput(), "rest");
+}
+
+TEST_F(Unread, IsWhatOthersHaveLeft) {
+  GivePipe();
+  Send("12345rest");
+  UnreadBody body(STDIN_FILENO, 5);
+  char taken[3];
+  ASSERT_EQ(read(STDIN_FILENO, taken, sizeof taken), 3);
+  TakenBodyBytes() += 3;
+  body.Drop();
+  EXPECT_FALSE(body.IsOpen());
+  EXPECT_TRUE(UnreadBody(STDIN_FILENO, 1).IsOpen());  // a body of its own
   close(writer);
   writer = -1;
   EXPECT_EQ(RestOfInput(), "rest");

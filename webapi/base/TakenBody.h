@@ -1,0 +1,12 @@
+#pragma once
+
+#include <cstdint>
+
+namespace QELO {
+
+/// How many bytes of its request's body the process has taken from standard input. Who reads some
+/// adds them, so that dropping the rest stops where the body does: a web server may leave the input
+/// open.
+int64_t& TakenBodyBytes();
+
+}  // namespace QELO
