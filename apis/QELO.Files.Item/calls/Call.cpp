@@ -10,6 +10,8 @@ using QELO::APIRequest;
 
 /// The member of the description that names the configuration.
 constexpr char kSharesMember[] = "shares";
+/// The member of the description that names the directory of the libraries beside this one.
+constexpr char kLibrariesMember[] = "libraries";
 
 constexpr size_t kShownPath = 1024;  ///< bytes of a refused path that the answer repeats
 
@@ -27,6 +29,10 @@ Call::Call(QELO::APIRequest* request, QELO::APIResponse* response)
       response_(response),
       shares_(QELO::JsonHelper::asString(request->GetAPIInfo(kSharesMember)),
               request->GetLoginUserName(), request->IsAdmin()) {}
+
+std::string Call::LibraryDirectory() const {
+  return QELO::JsonHelper::asString(request_->GetAPIInfo(kLibrariesMember));
+}
 
 bool Call::ReadPath(const char* name, VirtualPath& path) {
   const auto text = request_->GetAndCheckString(name);

@@ -20,6 +20,8 @@ class Call {
   QELO::APIRequest& Request() const { return *request_; }
   QELO::APIResponse& Response() const { return *response_; }
   const Shares& SharedFolders() const { return shares_; }
+  /// Where the libraries beside this one are.
+  std::string LibraryDirectory() const;
 
   /// The parameter `name`, a path. @return false when it was refused, which is the answer
   bool ReadPath(const char* name, VirtualPath& path);

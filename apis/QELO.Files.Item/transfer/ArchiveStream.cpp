@@ -21,9 +21,9 @@ constexpr char kLibrary[] = "QELO.Files.Archive.so";
 ArchiveStream::ArchiveStream(const Shares& shares, std::vector<VirtualPath> items)
     : shares_(shares), items_(std::move(items)) {}
 
-std::FILE* ArchiveStream::Open() {
+std::FILE* ArchiveStream::Open(const std::string& libraries) {
   const auto make =
-      reinterpret_cast<MakeArchiveWriter>(findInLibrary(kLibrary, kMakeArchiveWriter));
+      reinterpret_cast<MakeArchiveWriter>(findInLibrary(libraries, kLibrary, kMakeArchiveWriter));
   writer_.reset(make != nullptr ? make(&out_) : nullptr);
   if (writer_ == nullptr) {
     return nullptr;

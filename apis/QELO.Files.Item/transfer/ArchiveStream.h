@@ -24,7 +24,8 @@ class ArchiveStream {
 
   /// A stream to read the archive from, the caller's to close before this goes; null when the
   /// library that writes archives is not there.
-  std::FILE* Open();
+  /// @param libraries  the directory of that library
+  std::FILE* Open(const std::string& libraries);
 
  private:
   /// A folder that the walk is in.

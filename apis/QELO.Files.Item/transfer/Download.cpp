@@ -51,7 +51,7 @@ std::string archiveName(const std::vector<VirtualPath>& paths) {
 
 void sendArchive(Call& call, const std::vector<VirtualPath>& paths) {
   ArchiveStream archive(call.SharedFolders(), paths);
-  const Stream stream(archive.Open());
+  const Stream stream(archive.Open(call.LibraryDirectory()));
   if (stream == nullptr) {
     call.Refuse(Reason::kFailed, paths.front());
     return;

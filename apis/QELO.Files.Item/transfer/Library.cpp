@@ -2,18 +2,13 @@
 
 #include <dlfcn.h>
 
-#include <string>
-
 namespace files {
 
-void* findInLibrary(const char* file, const char* function) {
-  Dl_info self{};
-  if (dladdr(reinterpret_cast<void*>(findInLibrary), &self) == 0 || self.dli_fname == nullptr) {
+void* findInLibrary(const std::string& directory, const char* file, const char* function) {
+  if (!directory.starts_with('/')) {
     return nullptr;
   }
-  std::string path = self.dli_fname;
-  path.replace(path.rfind('/') + 1, std::string::npos, file);
-  void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+  void* library = dlopen((directory + "/" + file).c_str(), RTLD_NOW | RTLD_LOCAL);
   return library == nullptr ? nullptr : dlsym(library, function);
 }
 

@@ -109,7 +109,8 @@ bool Exchange::ReceiveChecked(UploadState& state, const UploadData& data, uint64
   const std::string header = Header("HTTP_UPLOAD_CHECKSUM");
   const size_t blank = std::min(header.find(' '), header.size());
   std::string expected;
-  const auto make = reinterpret_cast<MakeDigest>(findInLibrary(kDigestLibrary, kMakeDigest));
+  const auto make = reinterpret_cast<MakeDigest>(
+      findInLibrary(call_.LibraryDirectory(), kDigestLibrary, kMakeDigest));
   const std::unique_ptr<Digest> digest(make != nullptr ? make(header.substr(0, blank).c_str())
                                                        : nullptr);
   if (digest == nullptr || blank == header.size() ||
