@@ -1,5 +1,6 @@
 #include "platform/multipart/PartReader.h"
 
+#include <algorithm>
 #include <cstring>
 #include <utility>
 
@@ -66,49 +67,39 @@ int PartReader::PassOn(size_t end, const Sink& sink) {
   return bytes.empty() ? 0 : sink(bytes);
 }
 
-/// Takes the boundary line off the front of what is held, where the mark stands.
-int PartReader::TakeMark(const Sink& sink, bool& isTaken) {
-  size_t length = 0;
-  Mark mark = MarkAt(begin_, length);
-  while (mark == Mark::kCut) {
-    if (const int fault = Fill(); fault != 0) {
-      return fault;
-    }
-    mark = MarkAt(begin_, length);
-  }
-  isTaken = mark != Mark::kNone;
-  if (!isTaken) {
-    return PassOn(begin_ + mark_.size(), sink);  // a line that begins like one
-  }
-  isOver_ = mark == Mark::kEnd;
-  begin_ += length;
-  return 0;
-}
-
-/// Passes on all up to the next boundary line, and takes that.
+/// Passes on all up to the next boundary line, and takes that. What only begins like one is
+/// content.
 int PartReader::ReadMark(const Sink& sink) {
-  for (bool isTaken = false; !isTaken;) {
-    const std::string_view held = Held();
-    const void* found = memmem(held.data(), held.size(), mark_.data(), mark_.size());
-    int fault = 0;
+  for (size_t from = begin_;;) {
+    const void* found = memmem(buffer_.get() + from, end_ - from, mark_.data(), mark_.size());
+    size_t next = 0;  // up to where there is nothing but content
     if (found != nullptr) {
-      fault = PassOn(static_cast<size_t>(static_cast<const char*>(found) - buffer_.get()), sink);
-      fault = fault == 0 ? TakeMark(sink, isTaken) : fault;
+      next = Offset(found);
+      size_t length = 0;
+      const Mark mark = MarkAt(next, length);
+      if (mark == Mark::kNone) {
+        from = next + mark_.size();
+        continue;
+      }
+      if (mark != Mark::kCut) {
+        const int fault = PassOn(next, sink);
+        isOver_ = mark == Mark::kEnd;
+        begin_ = next + length;
+        return fault;
+      }
     } else {
       // What may be the front of a mark is kept until more has come.
-      const size_t tail = std::min(held.size(), mark_.size() - 1);
-      const void* front = memchr(held.data() + held.size() - tail, '\r', tail);
-      const size_t end = front == nullptr
-                             ? end_
-                             : static_cast<size_t>(static_cast<const char*>(front) - buffer_.get());
-      fault = PassOn(end, sink);
-      fault = fault == 0 ? Fill() : fault;
+      const size_t tail = std::max(from, end_ - std::min(end_, mark_.size() - 1));
+      const void* front = memchr(buffer_.get() + tail, '\r', end_ - tail);
+      next = front == nullptr ? end_ : Offset(front);
     }
+    int fault = PassOn(next, sink);
+    fault = fault == 0 ? Fill() : fault;
     if (fault != 0) {
       return fault;
     }
+    from = begin_;
   }
-  return 0;
 }
 
 int PartReader::Next(PartHeader& header, bool& isEnd) {

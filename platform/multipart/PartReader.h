@@ -45,9 +45,11 @@ class PartReader {
 
   Mark MarkAt(size_t at, size_t& length) const;
   int ReadMark(const Sink& sink);
-  int TakeMark(const Sink& sink, bool& isTaken);
   int PassOn(size_t end, const Sink& sink);
   int Fill();
+  size_t Offset(const void* place) const {
+    return static_cast<size_t>(static_cast<const char*>(place) - buffer_.get());
+  }
   std::string_view Held() const { return {buffer_.get() + begin_, end_ - begin_}; }
 
   const std::string mark_;  ///< a line end, "--" and the boundary

@@ -24,7 +24,6 @@ class WebServer:
     """A lighttpd that serves one entry.cgi from a directory of its own until it is stopped."""
 
     template = "lighttpd.conf.in"
-    takes_any_body = True  # and leaves its refusal to the program
 
     def __init__(self, directory, entry, extra="", pid=None):
         self.directory = Path(directory)
@@ -137,7 +136,6 @@ class Nginx(WebServer):
     """nginx, and fcgiwrap with some processes."""
 
     template = "nginx.conf.in"
-    takes_any_body = False
     processes = 4
 
     def command(self):
@@ -172,7 +170,6 @@ class ApacheCgi(WebServer):
     """Apache with a process a connection."""
 
     template = "apache2.conf.in"
-    takes_any_body = False
     definitions = ()
 
     def command(self):

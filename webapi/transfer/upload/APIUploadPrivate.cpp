@@ -119,7 +119,7 @@ int APIUploadPrivate::GetUploadParam(Json::Value& params) {
   }
   const int loaded = QeloCgiLoadUploadParams(&parameters_, progress_, &state_, part_, sizeof part_,
                                              field_, sizeof field_, file_, sizeof file_);
-  if (loaded > 0 && TakeParameters(params) && HasFile()) {
+  if (loaded > 0 && TakeParameters(params) && field_[0] != '\0' && file_[0] != '\0') {
     params[field_] = file_;
   }
   return state_.result;

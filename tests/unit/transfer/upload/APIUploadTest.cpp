@@ -158,6 +158,15 @@ TEST_F(DeferredUpload, NameOfAFileStaysAText) {
   EXPECT_EQ(params, Parse(R"({"f": "[1]"})"));
 }
 
+TEST_F(DeferredUpload, NameOfAFileWithoutItsHeaderIsToldAndTheFileIsNone) {
+  FindFile();
+  fake.part = "";
+  APIUpload upload(&request);
+  EXPECT_EQ(upload.GetUploadParam(params), 1);
+  EXPECT_EQ(params, Parse(R"({"f": "a.txt"})"));
+  EXPECT_EQ(upload.GetUploadFile(params), -8);
+}
+
 TEST_F(DeferredUpload, NoFileFollowsWithoutFieldOrName) {
   for (std::string FakeUpload::*missing :
        {&FakeUpload::part, &FakeUpload::field, &FakeUpload::name}) {
