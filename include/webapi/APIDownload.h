@@ -15,8 +15,9 @@ class APIResponse;
 
 /// Sends a file or a stream as the answer to a request, in place of a JSON body.
 ///
-/// The method's description needs "allowDownload". A method answers errors as any other until one
-/// of the Output() operations has printed something; that turns the framework's own output off.
+/// The method's description needs "allowDownload"; without it nothing is sent (EPERM, logged). A
+/// method answers errors as any other until one of the Output() operations has printed something;
+/// that turns the framework's own output off.
 class WEBAPI_API APIDownload {
  public:
   /// What Output() gives beside 0, with which the answer has gone out whole, "not changed" and

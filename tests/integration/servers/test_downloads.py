@@ -1,5 +1,6 @@
 """Files arrive whole, in parts and by condition, behind each web server."""
 
+import errno
 import json
 import os
 import random
@@ -9,7 +10,7 @@ from urllib.parse import quote
 
 import pytest
 
-from downloads import downloads, folder, sending  # noqa: F401  (fixtures)
+from downloads import API, downloads, folder, sending  # noqa: F401  (fixtures)
 from marks import wait_for
 from servers import server  # noqa: F401  (a fixture)
 
@@ -153,6 +154,12 @@ def test_FileThatCannotBeRead_IsAnErrorInJson(downloads):
         assert json.loads(got.body) == {"success": False, "error": {"code": 400, "errors": error}}
         assert got["Content-Type"].startswith("application/json")
         assert got["Content-Disposition"] is None
+
+
+def test_MethodWithoutTheAttribute_SendsNothing(downloads, describe):
+    describe(API, "sending.so", methods={"1": ["file"]})
+    got = downloads.file(downloads.put("file", b"x"))
+    assert json.loads(got.body)["error"] == {"code": 400, "errors": errno.EPERM}
 
 
 @pytest.mark.parametrize("method", ["file", "endless"])

@@ -59,6 +59,15 @@ StandardStreams::~StandardStreams() {
   cppStreams_.Restore();
 }
 
+bool StandardStreams::IsOutputShut() {
+  for (const StandardStreams* guard = innermost_; guard != nullptr; guard = guard->outer_) {
+    if (guard->shutsOutput_) {
+      return true;
+    }
+  }
+  return false;
+}
+
 void StandardStreams::LetGo() {
   for (StandardStreams* guard = innermost_; guard != nullptr; guard = guard->outer_) {
     guard->input_.LetGo();

@@ -27,6 +27,9 @@ class StandardStreams {
   /// Whether all that was to be shut is. Otherwise no foreign code may run.
   bool IsShut() const { return isShut_; }
 
+  /// Whether standard output is shut off from whoever runs now.
+  static bool IsOutputShut();
+
   /// For a forked child that outlives the request and never returns to the guard's owner: closes
   /// the former descriptors, whose last holder the web server waits for.
   static void LetGo();

@@ -1,8 +1,12 @@
 #include "webapi/transfer/download/APIDownloadPrivate.h"
 
+#include <cerrno>
+
 #include "webapi/APIDownload.h"
 #include "webapi/APIResponse.h"
+#include "webapi/base/Log.h"
 #include "webapi/model/response/HeaderLines.h"
+#include "webapi/runner/execution/StandardStreams.h"
 
 namespace QELO {
 namespace {
@@ -29,6 +33,15 @@ APIDownloadPrivate::~APIDownloadPrivate() {
   }
 }
 
+bool APIDownloadPrivate::MaySend() {
+  if (!StandardStreams::IsOutputShut()) {
+    return true;
+  }
+  WEBAPI_LOG(kSource, "nothing is sent: the method's description lacks allowDownload");
+  errno = EPERM;
+  return false;
+}
+
 void APIDownloadPrivate::PrintHeader() {
   for (const std::string& line : HeaderLines(*response_, kSource)) {
     outputer_.AddHeader(line);
@@ -39,6 +52,9 @@ void APIDownloadPrivate::PrintHeader() {
 }
 
 int APIDownloadPrivate::Output(const std::string& path) {
+  if (!MaySend()) {
+    return HTTPFileOutputer::kNothingSent;
+  }
   PrintHeader();
   if (mimeType_.empty()) {
     mimeType_ = HTTPFileOutputer::GetMimeType(path);
@@ -47,6 +63,9 @@ int APIDownloadPrivate::Output(const std::string& path) {
 }
 
 int APIDownloadPrivate::Output(std::FILE* stream) {
+  if (!MaySend()) {
+    return HTTPFileOutputer::kNothingSent;
+  }
   PrintHeader();
   if (mimeType_.empty()) {
     mimeType_ = kTypeOfStreams;

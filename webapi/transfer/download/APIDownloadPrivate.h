@@ -27,6 +27,9 @@ class APIDownloadPrivate {
   int Output(std::FILE* stream);
 
  private:
+  /// Whether what is sent would reach somebody; it is logged when it would not.
+  /// @return false with errno EPERM
+  static bool MaySend();
   /// Gives the response's header lines to the outputer, which prints them before its own.
   void PrintHeader();
   /// What an output that gave `result` leaves to do.

@@ -6,6 +6,7 @@
 #include "tests/support/SyslogCapture.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
+#include "webapi/runner/execution/StandardStreams.h"
 
 namespace QELO {
 namespace {
@@ -161,6 +162,24 @@ TEST_F(Download, OutputThatPrintedNothingLeavesTheAnswerToTheMethod) {
   EXPECT_EQ(errno, ENOENT);
   EXPECT_TRUE(response_.IsEnableOutput());
   EXPECT_FALSE(response_.HasHeader("Content-Disposition"));
+}
+
+TEST_F(Download, IsRefusedWhereTheClientIsNotAtTheOutput) {
+  const StandardStreams shut(false, true);
+  const StandardStreams inner(true, false);
+  for (const bool isStream : {false, true}) {
+    APIDownload download(&response_);
+    EXPECT_EQ(isStream ? download.Output(stdin) : download.Output("f"), APIDownload::kNothingSent);
+    EXPECT_EQ(errno, EPERM);
+  }
+  EXPECT_TRUE(response_.IsEnableOutput());
+  EXPECT_EQ(platform_->calls, Calls{});
+  EXPECT_EQ(SyslogCapture::Count("nothing is sent: the method's description lacks"), 2);
+}
+
+TEST_F(Download, IsSentWhereTheInputAloneIsShut) {
+  const StandardStreams streams(true, false);
+  EXPECT_EQ(APIDownload(&response_).Output("f"), 0);
 }
 
 TEST_F(Download, FileNameIsAHeaderOfTheOutput) {
