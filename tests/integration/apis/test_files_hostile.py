@@ -142,15 +142,15 @@ def test_PipesAndDevices_AreShownAndNeverOpened(alice, home):
 @needs_root
 def test_MountsInTheFolder_AreNotEntered(alice, home, outside):
     give_folder(home / "mnt")
-    query = {"api": API, "version": 1, "_sid": alice.sid}
+    query = {"api": API, "version": 1, "_sid": alice.sid, "to": "/common"}
 
     def call(method, path):
         """From a process that sees a mount which nobody else sees."""
         variables = {"REQUEST_METHOD": "GET", "REMOTE_ADDR": "127.0.0.1",
                      "QUERY_STRING": urlencode({**query, "method": method, "path": path})}
         script = f'mount --bind "{outside}" "{home}/mnt" && exec "{ENTRY}"'
-        result = subprocess.run(["unshare", "-m", "sh", "-c", script], env={**variables, "PATH": os.environ["PATH"]},
-                                capture_output=True, check=True, timeout=30)
+        result = subprocess.run(["unshare", "-m", "sh", "-c", script], capture_output=True, check=True,
+                                timeout=30, env={**variables, "PATH": os.environ["PATH"]})
         return answer_of(result.stdout)
 
     if subprocess.run(["unshare", "-m", "true"], check=False).returncode != 0:
@@ -161,6 +161,8 @@ def test_MountsInTheFolder_AreNotEntered(alice, home, outside):
     assert call("stat", "/own/mnt")["data"]["items"] == [
         {"name": "mnt", "path": "/own/mnt", "type": "mount"}]
     assert "secret" not in json.dumps(call("list", "/own"))
+    for method in ("copy", "move", "remove", "download"):
+        assert call(method, "/own/mnt")["error"]["errors"]["reason"] == "mount"
 
 
 def test_FolderThatGoesAwayDuringTheCall_IsNotFound(alice, home):

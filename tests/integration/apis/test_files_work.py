@@ -243,7 +243,10 @@ def halted(tasks, large):
     def start(**parameters):
         before = processes()
         full_id = tasks("copy", path=large, to="/common", **parameters)
-        (pid,) = processes() - before
+        deadline = time.monotonic() + 5
+        while len(new := processes() - before) > 1 and time.monotonic() < deadline:
+            time.sleep(0.001)  # the call's own process is about to end
+        (pid,) = new
         os.kill(pid, signal.SIGSTOP)
         pids.append(pid)
         return full_id, pid
