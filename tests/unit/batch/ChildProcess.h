@@ -15,14 +15,14 @@
 
 namespace QELO {
 
-/// An id that no account has.
-inline constexpr uid_t kOrdinaryId = 54321;
-
-/// Gives up root for good. @return whether the process is an ordinary user's now
+/// Gives up root for good, for an id that most likely no account has, and no process of another run
+/// of the tests: limits of processes count them by their user. @return whether it is done
 inline bool becomeOrdinary() {
+  constexpr uid_t kFirstId = 20'000;
+  constexpr uid_t kIds = 40'000;  // a container may have no more than 65,536
+  const uid_t id = kFirstId + static_cast<uid_t>(getpid()) % kIds;
   return geteuid() != 0 ||
-         (setgroups(0, nullptr) == 0 && setresgid(kOrdinaryId, kOrdinaryId, kOrdinaryId) == 0 &&
-          setresuid(kOrdinaryId, kOrdinaryId, kOrdinaryId) == 0);
+         (setgroups(0, nullptr) == 0 && setresgid(id, id, id) == 0 && setresuid(id, id, id) == 0);
 }
 
 /// Takes a capability below 32 from the process for good.
