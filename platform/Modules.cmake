@@ -29,6 +29,7 @@ if(NOT PAM_LIBRARY AND NOT WEBAPI_ROOT_PREFIX)
   message(FATAL_ERROR "The host's passwords are checked with PAM: libpam is missing")
 endif()
 find_package(SQLite3 REQUIRED)
+find_library(MD_LIBRARY md REQUIRED)  # hashes of access tokens: libcrypto takes half a call's time
 find_package(OpenSSL REQUIRED COMPONENTS Crypto)
 find_package(CURL REQUIRED)
 
@@ -41,10 +42,11 @@ endif()
 
 # The token database is the administrators' program's too.
 function(webapi_token_store twin)
-  add_library(webapi_token_store${twin} STATIC tokens/module/TokenStore.cpp base/Secrets.cpp)
+  add_library(webapi_token_store${twin} STATIC tokens/module/TokenStore.cpp
+              tokens/module/TokenSchema.cpp base/Secrets.cpp)
   target_include_directories(webapi_token_store${twin} PUBLIC ${PROJECT_SOURCE_DIR}/include
                                                               ${PROJECT_SOURCE_DIR})
-  target_link_libraries(webapi_token_store${twin} PUBLIC SQLite::SQLite3 OpenSSL::Crypto)
+  target_link_libraries(webapi_token_store${twin} PUBLIC SQLite::SQLite3 ${MD_LIBRARY})
 endfunction()
 webapi_token_store("")
 if(WEBAPI_TESTS)
@@ -53,8 +55,9 @@ if(WEBAPI_TESTS)
 endif()
 
 webapi_platform_module(tokens
-  SOURCES tokens/module/TokenModule.cpp tokens/module/TokenStore.cpp base/Secrets.cpp
-  LIBRARIES SQLite::SQLite3 OpenSSL::Crypto)
+  SOURCES tokens/module/TokenModule.cpp tokens/module/TokenStore.cpp tokens/module/TokenSchema.cpp
+          base/Secrets.cpp
+  LIBRARIES SQLite::SQLite3 ${MD_LIBRARY})
 webapi_platform_module(tasks
   SOURCES tasks/module/TaskModule.cpp tasks/module/StoreConnection.cpp
           tasks/module/StoreDirectory.cpp tasks/module/TaskClearing.cpp

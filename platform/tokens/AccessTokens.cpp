@@ -2,34 +2,47 @@
 #include <string_view>
 
 #include "platform/accounts/Accounts.h"
+#include "platform/base/IpAddress.h"
 #include "platform/base/ModuleLoader.h"
 #include "platform/base/Paths.h"
 #include "platform/base/Secrets.h"
 #include "platform/base/TextBuffer.h"
 #include "platform/ciphers/module/CipherModule.h"
+#include "platform/tokens/ReadOnlyMethod.h"
+#include "platform/tokens/UidOf.h"
 #include "platform/tokens/module/TokenModule.h"
 #include "webapi/base/Log.h"
 #include "webapi/base/Number.h"
+#include "webapi/platform/Cgi.h"
 #include "webapi/platform/Token.h"
 
 namespace QELO::Platform {
 namespace {
 
-uid_t uidOf(const char* user) {
-  Account account;
-  return findAccount(user, account) == Lookup::kFound ? account.uid : static_cast<uid_t>(-1);
-}
+constexpr int kAddressSize = 65;
 
 /// Whether the account is still the one that the token was made for, and may use it. A service's
 /// token is for an account that nobody logs in to.
-bool isUsable(const char* user, uid_t uid, bool isService) {
+bool isUsable(const TokenStore::Owner& owner) {
   Account account;
-  if (findAccount(user, account) != Lookup::kFound || account.uid != uid) {
+  if (findAccount(owner.user, account) != Lookup::kFound || account.uid != owner.uid) {
     return false;
   }
   const Usability usability = usabilityOf(account);
-  return isService ? usability != Usability::kExpired && usability != Usability::kUnknown
-                   : usability == Usability::kGood;
+  return owner.isService ? usability != Usability::kExpired && usability != Usability::kUnknown
+                         : usability == Usability::kGood;
+}
+
+/// An address that is not known is none of those that the token is for.
+bool mayComeFromHere(const std::string& network) {
+  if (network.empty()) {
+    return true;
+  }
+  char text[kAddressSize] = {};
+  IpAddress address;
+  bool valid = false;
+  return QeloCgiGetRemoteIP(text, kAddressSize) == 0 && IpAddress::Parse(text, address) &&
+         address.IsIn(network, valid) && valid;
 }
 
 /// The key of an access token, which its owner can derive too and nobody else: from the token's
@@ -39,8 +52,7 @@ bool keyOf(int64_t id, std::string& text) {
   const auto findHash = reinterpret_cast<TokenHash>(findInModule(kTokenModule, kTokenHash));
   const auto derive = reinterpret_cast<DeriveKeyText>(findInModule(kCipherModule, kDeriveKeyText));
   return findHash != nullptr && derive != nullptr &&
-         findHash(QELO::Paths::kTokenDatabase, id, uidOf, hash) == kTokenGranted &&
-         derive(hash, &text);
+         findHash(Paths::kTokenDatabase, uidOf, id, hash) == kTokenGranted && derive(hash, &text);
 }
 
 }  // namespace
@@ -59,22 +71,26 @@ extern "C" int QeloAccessTokenGrant(const char* token, const char* api, const ch
   if (grant == nullptr) {
     return kTokenFailed;
   }
-  char error[256] = "";
-  uid_t uid = 0;
-  int isService = 0;
-  const int result = grant(QELO::Paths::kTokenDatabase, token, api, method, uidOf, user, size, &uid,
-                           &isService, error, static_cast<int>(sizeof error));
+  const auto accept = [&](const TokenStore::Entry& entry) {
+    if (!isUsable(entry.owner)) {
+      return TokenStore::Grant::kUnknown;
+    }
+    return mayComeFromHere(entry.address) && (!entry.readOnly || isReadOnlyMethod(api, method)) &&
+                   entry.owner.user.size() < static_cast<size_t>(size)
+               ? TokenStore::Grant::kGranted
+               : TokenStore::Grant::kOtherCall;
+  };
+  TokenStore::Entry entry;
+  std::string error;
+  const int result =
+      grant(QELO::Paths::kTokenDatabase, uidOf, token, api, method, accept, entry, error);
   if (result == kTokenFailed) {
     WEBAPI_LOG(kSource, "cannot check an access token [%s]", QELO::LogText(error).c_str());
   }
-  if (result != kTokenGranted) {
-    return result;
+  if (result == kTokenGranted) {
+    fillBuffer(entry.owner.user, user, size);
   }
-  if (!isUsable(user, uid, isService != 0)) {
-    fillBuffer("", user, size);
-    return kTokenUnknown;
-  }
-  return kTokenGranted;
+  return result;
 }
 
 // What clients send along is the number of an access token, which is no secret.

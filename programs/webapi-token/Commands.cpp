@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <map>
 
+#include "platform/base/IpAddress.h"
 #include "platform/base/Paths.h"
 #include "platform/tokens/module/TokenStore.h"
 #include "webapi/JsonHelper.h"
@@ -32,9 +33,15 @@ constexpr char kHelp[] =
     "tid=TOKEN,\n"
     "instead of a login. The commands need root's rights.\n"
     "\n"
-    "webapi-token create --user USER [--api API] [--method METHOD] [--days N] [--service]\n"
+    "webapi-token create --user USER [--api API] [--method METHOD] [--days N] [--name NAME]\n"
+    "                    [--address NETWORK] [--read-only] [--service]\n"
     "    Makes a token and prints it, this once: only a hash of it is kept.\n"
-    "    --api, --method  the one API or method that it is for; \"*\", the default: all\n"
+    "    --api, --method  the API or method that it is for; \"QELO.Host.*\": all that begin so; "
+    "\"*\",\n"
+    "                     the default: all\n"
+    "    --name           what it is for, as the list shows it\n"
+    "    --address        the address or network, as 192.0.2.0/24, that it may be used from\n"
+    "    --read-only      for methods alone whose description says \"readOnly\"\n"
     "    --days           how long it is good, 90 when not given; 0: for ever\n"
     "    --service        for an account that nobody logs in to; such a token stays good while "
     "the\n"
@@ -96,8 +103,22 @@ std::string timeText(int64_t seconds) {
   return seconds == 0 ? "never" : text;
 }
 
+/// A name, its beginning and a "*", or "*".
 bool isPattern(const std::string& text) {
-  return text == "*" || (!text.empty() && text.find_first_of("* \t\r\n") == std::string::npos);
+  const std::string name = text.substr(0, text.size() - (text.ends_with('*') ? 1 : 0));
+  return !text.empty() && name.find_first_of("* \t\r\n") == std::string::npos;
+}
+
+/// The list is taken apart by tabs and lines.
+bool isName(const std::string& text) {
+  return std::none_of(text.begin(), text.end(),
+                      [](unsigned char c) { return c < 0x20 || c == 0x7F; });
+}
+
+bool isNetwork(const std::string& text) {
+  bool valid = false;
+  Platform::IpAddress().IsIn(text, valid);
+  return text.empty() || valid;
 }
 
 /// Reads "--name value" pairs. @return what is wrong, or ""
@@ -153,8 +174,10 @@ std::string readOwner(TokenStore::Owner& owner) {
 /// Reads what the new token is to be. @return what is wrong with the call, or ""
 std::string readEntry(std::vector<std::string> arguments, TokenStore::Entry& entry) {
   std::map<std::string, std::string> options = {
-      {"--user", ""}, {"--api", "*"}, {"--method", "*"}, {"--days", std::to_string(kDefaultDays)}};
+      {"--user", ""}, {"--api", "*"},   {"--method", "*"}, {"--days", std::to_string(kDefaultDays)},
+      {"--name", ""}, {"--address", ""}};
   entry.owner.isService = takeFlag(arguments, "--service");
+  entry.readOnly = takeFlag(arguments, "--read-only");
   const std::string wrong = readOptions(arguments, options);
   int days = 0;
   if (!wrong.empty()) {
@@ -164,14 +187,21 @@ std::string readEntry(std::vector<std::string> arguments, TokenStore::Entry& ent
     return "--user is missing";
   }
   if (!isPattern(options["--api"]) || !isPattern(options["--method"])) {
-    return "--api and --method take a whole name, or \"*\" for all";
+    return "--api and --method take a whole name, its beginning and \"*\", or \"*\" for all";
+  }
+  if (!isName(options["--name"])) {
+    return "--name takes a line of text";
+  }
+  if (!isNetwork(options["--address"])) {
+    return "--address takes an address or a network";
   }
   if (!parse(options["--days"], 0, kMostDays, days)) {
     return "--days takes a number from 0 to " + std::to_string(kMostDays);
   }
   entry.owner.user = options["--user"];
-  entry.api = options["--api"];
-  entry.method = options["--method"];
+  entry.scopes = {{options["--api"], options["--method"]}};
+  entry.name = options["--name"];
+  entry.address = options["--address"];
   entry.expires = days == 0 ? 0 : time(nullptr) + days * kDaySeconds;
   return "";
 }
@@ -186,9 +216,10 @@ ExitCode create(const std::vector<std::string>& arguments, const Streams& stream
   if (!refusal.empty()) {
     return failed(streams, refusal);
   }
-  if (entry.api != "*" && !isDescribed(entry.api)) {
+  const std::string& api = entry.scopes[0].api;
+  if (!api.ends_with('*') && !isDescribed(api)) {
     fprintf(streams.messages, "webapi-token: there is no API %s; the token is made all the same\n",
-            entry.api.c_str());
+            api.c_str());
   }
   QELOFSMkdirP(Paths::kStateDir, 1, 0, static_cast<uid_t>(-1), static_cast<gid_t>(-1),
                kStateDirMode);
@@ -204,19 +235,33 @@ ExitCode create(const std::vector<std::string>& arguments, const Streams& stream
   return kDone;
 }
 
+void printEntry(const TokenStore::Entry& entry, const Streams& streams) {
+  std::string apis;
+  std::string methods;
+  for (const TokenStore::Scope& scope : entry.scopes) {
+    apis += (apis.empty() ? "" : ",") + scope.api;
+    methods += (methods.empty() ? "" : ",") + scope.method;
+  }
+  const std::string limits = std::string(entry.readOnly ? "read-only" : "") +
+                             (entry.readOnly && !entry.address.empty() ? " " : "") + entry.address;
+  fprintf(streams.output, "%lld\t%s\t%s\t%s\t%s\t%s\t%s\t%s\t%s\n",
+          static_cast<long long>(entry.id),
+          (entry.owner.user + (entry.owner.isService ? " (service)" : "")).c_str(), apis.c_str(),
+          methods.c_str(), timeText(entry.created).c_str(), timeText(entry.expires).c_str(),
+          timeText(entry.used).c_str(), limits.c_str(), entry.name.c_str());
+}
+
 ExitCode list(const Streams& streams) {
   TokenStore store;
   std::vector<TokenStore::Entry> entries;
   const bool opened = store.Open(Paths::kTokenDatabase, false, uidOf);
-  if ((!opened && !store.Missing()) || (opened && !store.List(entries))) {
+  if ((!opened && !store.Missing()) || (opened && !store.List(nullptr, entries))) {
     return failed(streams, databaseError(store));
   }
-  fprintf(streams.output, "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\n");
+  fprintf(streams.output,
+          "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\tLAST USE (UTC)\tLIMITS\tNAME\n");
   for (const TokenStore::Entry& entry : entries) {
-    fprintf(streams.output, "%lld\t%s\t%s\t%s\t%s\t%s\n", static_cast<long long>(entry.id),
-            (entry.owner.user + (entry.owner.isService ? " (service)" : "")).c_str(),
-            entry.api.c_str(), entry.method.c_str(), timeText(entry.created).c_str(),
-            timeText(entry.expires).c_str());
+    printEntry(entry, streams);
   }
   return kDone;
 }
@@ -229,7 +274,7 @@ ExitCode revoke(const std::string& number, const Streams& streams) {
   TokenStore store;
   bool found = false;
   const bool opened = store.Open(Paths::kTokenDatabase, false, uidOf);
-  if ((!opened && !store.Missing()) || (opened && !store.Revoke(id, found))) {
+  if ((!opened && !store.Missing()) || (opened && !store.Revoke(id, nullptr, found))) {
     return failed(streams, databaseError(store));
   }
   return found ? kDone : failed(streams, "there is no token " + number);

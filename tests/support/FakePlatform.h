@@ -60,6 +60,7 @@ struct FakePlatform {
   int tokenGrant = -1;
   std::string tokenUser;
   int aesKeyResult = -1;
+  int tokenWork = 0;  ///< what becomes of making, listing and revoking tokens
   std::function<bool(const std::string&, const std::string&, std::string&)> decryptAES;
 
   std::string keptVariable;  ///< the one that a setting adds to the environment

@@ -1,7 +1,7 @@
 #include "platform/tokens/module/TokenStore.h"
 
 #include <fcntl.h>
-#include <openssl/sha.h>
+#include <sha2.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
 #include <time.h>
@@ -11,6 +11,7 @@
 #include <memory>
 
 #include "platform/base/Secrets.h"
+#include "platform/tokens/module/TokenSchema.h"
 #include "webapi/base/OwnFile.h"
 #include "webapi/base/UniqueFd.h"
 
@@ -18,14 +19,6 @@ namespace QELO::Platform {
 namespace {
 
 constexpr int kBusyMs = 2000;
-constexpr int kVersion = 1;
-constexpr char kFirstTables[] =
-    "CREATE TABLE IF NOT EXISTS tokens("
-    "id INTEGER PRIMARY KEY AUTOINCREMENT, hash BLOB NOT NULL UNIQUE, user TEXT NOT NULL,"
-    "api TEXT NOT NULL, method TEXT NOT NULL, created INTEGER NOT NULL, expires INTEGER NOT NULL)";
-constexpr char kOwnerColumns[] =
-    "ALTER TABLE tokens ADD COLUMN uid INTEGER NOT NULL DEFAULT 4294967295;"
-    "ALTER TABLE tokens ADD COLUMN service INTEGER NOT NULL DEFAULT 0";
 
 struct Finalize {
   void operator()(sqlite3_stmt* statement) const { sqlite3_finalize(statement); }
@@ -38,9 +31,20 @@ void bindText(const Statement& statement, int index, const std::string& text) {
 }
 
 void bindHash(const Statement& statement, int index, const std::string& token) {
-  unsigned char hash[SHA256_DIGEST_LENGTH];
-  SHA256(reinterpret_cast<const unsigned char*>(token.data()), token.size(), hash);
+  uint8_t hash[SHA256_DIGEST_LENGTH];
+  SHA2_CTX context;
+  SHA256Init(&context);
+  SHA256Update(&context, reinterpret_cast<const uint8_t*>(token.data()), token.size());
+  SHA256Final(hash, &context);
   sqlite3_bind_blob(statement.get(), index, hash, sizeof hash, SQLITE_TRANSIENT);
+}
+
+/// Null stands for whoever it is.
+void bindOwner(const Statement& statement, int first, const TokenStore::Owner* owner) {
+  if (owner != nullptr) {
+    bindText(statement, first, owner->user);
+    sqlite3_bind_int64(statement.get(), first + 1, owner->uid);
+  }
 }
 
 std::string columnText(const Statement& statement, int column) {
@@ -48,14 +52,33 @@ std::string columnText(const Statement& statement, int column) {
   return text != nullptr ? reinterpret_cast<const char*>(text) : "";
 }
 
-TokenStore::Owner columnOwner(const Statement& statement, int first) {
-  return {columnText(statement, first),
-          static_cast<uid_t>(sqlite3_column_int64(statement.get(), first + 1)),
-          sqlite3_column_int(statement.get(), first + 2) != 0};
+/// The columns that each look-up names, in this order, and the entry that they make.
+#define TOKEN_COLUMNS \
+  "t.id, user, uid, service, name, readonly, address, created, expires, used, api, method"
+
+TokenStore::Entry columnEntry(const Statement& statement) {
+  sqlite3_stmt* row = statement.get();
+  TokenStore::Entry entry;
+  entry.id = sqlite3_column_int64(row, 0);
+  entry.owner = {columnText(statement, 1), static_cast<uid_t>(sqlite3_column_int64(row, 2)),
+                 sqlite3_column_int(row, 3) != 0};
+  entry.name = columnText(statement, 4);
+  entry.readOnly = sqlite3_column_int(row, 5) != 0;
+  entry.address = columnText(statement, 6);
+  entry.created = sqlite3_column_int64(row, 7);
+  entry.expires = sqlite3_column_int64(row, 8);
+  entry.used = sqlite3_column_int64(row, 9);
+  return entry;
+}
+
+TokenStore::Scope columnScope(const Statement& statement) {
+  return {columnText(statement, 10), columnText(statement, 11)};
 }
 
 bool fits(const std::string& pattern, const std::string& name) {
-  return pattern == "*" || pattern == name;
+  return !pattern.empty() && pattern.back() == '*'
+             ? name.compare(0, pattern.size() - 1, pattern, 0, pattern.size() - 1) == 0
+             : pattern == name;
 }
 
 }  // namespace
@@ -87,71 +110,7 @@ bool TokenStore::Open(const char* path, bool create, FindUid findUid) {
   sqlite3_busy_timeout(database_, kBusyMs);
   int keep = 1;  // else every process that comes and goes makes and removes the companion files
   sqlite3_file_control(database_, "main", SQLITE_FCNTL_PERSIST_WAL, &keep);
-  int version = 0;
-  if (!ReadVersion(version)) {
-    return false;
-  }
-  if (version > kVersion) {
-    error_ = "made by a later version of this program";
-    return false;
-  }
-  return version == kVersion || Upgrade(create, findUid);
-}
-
-bool TokenStore::ReadVersion(int& version) {
-  sqlite3_stmt* prepared = nullptr;
-  if (!Prepare("PRAGMA user_version", prepared)) {
-    return false;
-  }
-  const Statement statement(prepared);
-  if (sqlite3_step(prepared) != SQLITE_ROW) {
-    return Fail();
-  }
-  version = sqlite3_column_int(prepared, 0);
-  return true;
-}
-
-bool TokenStore::Upgrade(bool create, FindUid findUid) {
-  int version = 0;
-  if ((create && !Execute("PRAGMA journal_mode=WAL")) || !Execute("BEGIN IMMEDIATE")) {
-    return false;
-  }
-  // Another process may have done it while this one waited.
-  const bool done =
-      ReadVersion(version) &&
-      (version == kVersion || ((!create || Execute(kFirstTables)) && Execute(kOwnerColumns) &&
-                               AddOwners(findUid) && Execute("PRAGMA user_version=1")));
-  if (done && Execute("COMMIT")) {
-    return true;
-  }
-  const std::string reason = error_;
-  Execute("ROLLBACK");
-  error_ = reason;
-  return false;
-}
-
-bool TokenStore::AddOwners(FindUid findUid) {
-  sqlite3_stmt* users = nullptr;
-  sqlite3_stmt* update = nullptr;
-  if (!Prepare("SELECT DISTINCT user FROM tokens", users)) {
-    return false;
-  }
-  const Statement reading(users);
-  if (!Prepare("UPDATE tokens SET uid = ?1 WHERE user = ?2", update)) {
-    return false;
-  }
-  const Statement writing(update);
-  int step = sqlite3_step(users);
-  for (; step == SQLITE_ROW; step = sqlite3_step(users)) {
-    const std::string user = columnText(reading, 0);
-    sqlite3_bind_int64(update, 1, findUid(user.c_str()));
-    bindText(writing, 2, user);
-    if (sqlite3_step(update) != SQLITE_DONE) {
-      return Fail();
-    }
-    sqlite3_reset(update);
-  }
-  return step == SQLITE_DONE || Fail();
+  return TokenSchema(database_).Bring(create, findUid, error_);
 }
 
 bool TokenStore::Create(Entry& entry, std::string& token) {
@@ -161,8 +120,9 @@ bool TokenStore::Create(Entry& entry, std::string& token) {
     error_ = strerror(errno);
     return false;
   }
-  if (!Prepare("INSERT INTO tokens(hash, user, api, method, created, expires, uid, service)"
-               " VALUES(?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8)",
+  if (!Execute("BEGIN IMMEDIATE") ||
+      !Prepare("INSERT INTO tokens(hash, user, uid, service, name, readonly, address, created,"
+               " expires) VALUES(?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9)",
                prepared)) {
     return false;
   }
@@ -170,42 +130,84 @@ bool TokenStore::Create(Entry& entry, std::string& token) {
   entry.created = time(nullptr);
   bindHash(statement, 1, secret);
   bindText(statement, 2, entry.owner.user);
-  bindText(statement, 3, entry.api);
-  bindText(statement, 4, entry.method);
-  sqlite3_bind_int64(prepared, 5, entry.created);
-  sqlite3_bind_int64(prepared, 6, entry.expires);
-  sqlite3_bind_int64(prepared, 7, entry.owner.uid);
-  sqlite3_bind_int(prepared, 8, entry.owner.isService ? 1 : 0);
+  sqlite3_bind_int64(prepared, 3, entry.owner.uid);
+  sqlite3_bind_int(prepared, 4, entry.owner.isService ? 1 : 0);
+  bindText(statement, 5, entry.name);
+  sqlite3_bind_int(prepared, 6, entry.readOnly ? 1 : 0);
+  bindText(statement, 7, entry.address);
+  sqlite3_bind_int64(prepared, 8, entry.created);
+  sqlite3_bind_int64(prepared, 9, entry.expires);
   if (sqlite3_step(prepared) != SQLITE_DONE) {
     return Fail();
   }
   entry.id = sqlite3_last_insert_rowid(database_);
   token = secret;
+  return AddScopes(entry) && Execute("COMMIT");
+}
+
+bool TokenStore::AddScopes(const Entry& entry) {
+  for (const Scope& scope : entry.scopes) {
+    sqlite3_stmt* prepared = nullptr;
+    if (!Prepare("INSERT OR IGNORE INTO scopes(token, api, method) VALUES(?1, ?2, ?3)", prepared)) {
+      return false;
+    }
+    const Statement statement(prepared);
+    sqlite3_bind_int64(prepared, 1, entry.id);
+    bindText(statement, 2, scope.api);
+    bindText(statement, 3, scope.method);
+    if (sqlite3_step(prepared) != SQLITE_DONE) {
+      return Fail();
+    }
+  }
   return true;
 }
 
 TokenStore::Grant TokenStore::Check(const std::string& token, const std::string& api,
-                                    const std::string& method, int64_t now, Owner& owner) {
+                                    const std::string& method, int64_t now, const Accept& accept,
+                                    Entry& entry) {
   sqlite3_stmt* prepared = nullptr;
-  if (!Prepare("SELECT api, method, expires, user, uid, service FROM tokens WHERE hash = ?1",
+  if (!Prepare("SELECT " TOKEN_COLUMNS
+               " FROM tokens t LEFT JOIN scopes ON token = t.id WHERE hash = ?1",
                prepared)) {
     return Grant::kFailed;
   }
-  const Statement statement(prepared);
+  Statement statement(prepared);
   bindHash(statement, 1, token);
-  const int step = sqlite3_step(prepared);
+  int step = sqlite3_step(prepared);
   if (step != SQLITE_ROW) {
     return step == SQLITE_DONE || Fail() ? Grant::kUnknown : Grant::kFailed;
   }
-  const int64_t expires = sqlite3_column_int64(prepared, 2);
-  if (expires != 0 && expires <= now) {
+  const Entry found = columnEntry(statement);
+  if (found.expires != 0 && found.expires <= now) {
     return Grant::kExpired;
   }
-  if (!fits(columnText(statement, 0), api) || !fits(columnText(statement, 1), method)) {
-    return Grant::kOtherCall;
+  bool isFor = false;
+  for (; step == SQLITE_ROW && !isFor; step = sqlite3_step(prepared)) {
+    const Scope scope = columnScope(statement);
+    isFor = fits(scope.api, api) && fits(scope.method, method);
   }
-  owner = columnOwner(statement, 3);
-  return Grant::kGranted;
+  statement.reset();
+  const Grant grant = isFor ? accept(found) : Grant::kOtherCall;
+  if (grant == Grant::kGranted) {
+    entry = found;
+    if (now - found.used >= kUsePause) {
+      NoteUse(found.id, now);
+    }
+  }
+  return grant;
+}
+
+/// Left out when somebody else writes: a call does not wait for it.
+void TokenStore::NoteUse(int64_t id, int64_t now) {
+  sqlite3_stmt* prepared = nullptr;
+  sqlite3_busy_timeout(database_, 0);
+  if (Prepare("UPDATE tokens SET used = ?2 WHERE id = ?1", prepared)) {
+    const Statement statement(prepared);
+    sqlite3_bind_int64(prepared, 1, id);
+    sqlite3_bind_int64(prepared, 2, now);
+    sqlite3_step(prepared);
+  }
+  sqlite3_busy_timeout(database_, kBusyMs);
 }
 
 bool TokenStore::FindHash(int64_t id, int64_t now, unsigned char* hash) {
@@ -225,35 +227,41 @@ bool TokenStore::FindHash(int64_t id, int64_t now, unsigned char* hash) {
   return true;
 }
 
-bool TokenStore::List(std::vector<Entry>& entries) {
+bool TokenStore::List(const Owner* owner, std::vector<Entry>& entries) {
   sqlite3_stmt* prepared = nullptr;
-  if (!Prepare(
-          "SELECT id, api, method, created, expires, user, uid, service FROM tokens ORDER BY id",
-          prepared)) {
+  if (!Prepare("SELECT " TOKEN_COLUMNS " FROM tokens t LEFT JOIN scopes ON token = t.id"
+               " WHERE ?1 IS NULL OR (user = ?1 AND uid = ?2) ORDER BY t.id, api, method",
+               prepared)) {
     return false;
   }
   const Statement statement(prepared);
+  bindOwner(statement, 1, owner);
   int step = sqlite3_step(prepared);
   for (; step == SQLITE_ROW; step = sqlite3_step(prepared)) {
-    entries.push_back({sqlite3_column_int64(prepared, 0), columnOwner(statement, 5),
-                       columnText(statement, 1), columnText(statement, 2),
-                       sqlite3_column_int64(prepared, 3), sqlite3_column_int64(prepared, 4)});
+    if (entries.empty() || entries.back().id != sqlite3_column_int64(prepared, 0)) {
+      entries.push_back(columnEntry(statement));
+    }
+    entries.back().scopes.push_back(columnScope(statement));
   }
   return step == SQLITE_DONE || Fail();
 }
 
-bool TokenStore::Revoke(int64_t id, bool& found) {
+bool TokenStore::Revoke(int64_t id, const Owner* owner, bool& found) {
   sqlite3_stmt* prepared = nullptr;
-  if (!Prepare("DELETE FROM tokens WHERE id = ?1", prepared)) {
+  if (!Execute("BEGIN IMMEDIATE") ||
+      !Prepare("DELETE FROM tokens WHERE id = ?3 AND (?1 IS NULL OR (user = ?1 AND uid = ?2))",
+               prepared)) {
     return false;
   }
   const Statement statement(prepared);
-  sqlite3_bind_int64(prepared, 1, id);
+  bindOwner(statement, 1, owner);
+  sqlite3_bind_int64(prepared, 3, id);
   if (sqlite3_step(prepared) != SQLITE_DONE) {
     return Fail();
   }
   found = sqlite3_changes(database_) > 0;
-  return true;
+  return Execute("DELETE FROM scopes WHERE token NOT IN (SELECT id FROM tokens)") &&
+         Execute("COMMIT");
 }
 
 bool TokenStore::Prepare(const char* sql, sqlite3_stmt*& statement) {

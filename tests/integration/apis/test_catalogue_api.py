@@ -49,7 +49,7 @@ def test_List_TellsAllowUserOnlyWhereItIsAsked(client, alice, describe):
 
 
 def test_List_WithPrefix_ShowsOnlyThose(client, alice):
-    assert set(listed(client, alice, prefix="QELO.Acc")) == {"QELO.Access.Session"}
+    assert set(listed(client, alice, prefix="QELO.Access.S")) == {"QELO.Access.Session"}
     assert set(listed(client, alice, prefix="NoSuch")) == set()
 
 

@@ -236,7 +236,7 @@ class TokenCiphers : public Ciphers {
     TokenStore store;
     TokenStore::Entry entry;
     entry.owner = {"alice", 1002, false};
-    entry.api = entry.method = "*";
+    entry.scopes = {{"*", "*"}};
     entry.expires = expires;
     std::string token;
     EXPECT_TRUE(store.Open(Path("var/lib/webapi/tokens.db").c_str(), true,

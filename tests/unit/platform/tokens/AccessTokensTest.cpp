@@ -2,77 +2,15 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <filesystem>
 
-#include "platform/tokens/module/TokenStore.h"
 #include "tests/support/SyslogCapture.h"
-#include "tests/unit/platform/PrivateRoot.h"
-#include "webapi/platform/Token.h"
+#include "tests/unit/platform/tokens/Fixture.h"
 
 namespace {
 
-using QELO::Platform::TokenStore;
-
-class AccessTokens : public PrivateRoot {
- protected:
-  static std::string Database() { return Path("var/lib/webapi/tokens.db"); }
-
-  /// The id that the script gives an account.
-  static uid_t UidOf(const std::string& user) {
-    return !IsRoot() ? geteuid() : user == "alice" ? 1002 : user == "bob" ? 1003 : 7000;
-  }
-
-  static std::string CreateForService(const std::string& user) {
-    return Create(user, "*", "*", 0, nullptr, true);
-  }
-
-  static std::string Create(const std::string& user = "alice", const std::string& api = "*",
-                            const std::string& method = "*", int64_t expires = 0,
-                            int64_t* id = nullptr, bool isService = false) {
-    TokenStore store;
-    TokenStore::Entry entry;
-    entry.owner = {user, user == "system" && IsRoot() ? 900 : UidOf(user), isService};
-    entry.api = api;
-    entry.method = method;
-    entry.expires = expires;
-    std::string token;
-    EXPECT_TRUE(store.Open(Database().c_str(), true, NoUid)) << store.Error();
-    EXPECT_TRUE(store.Create(entry, token)) << store.Error();
-    if (id != nullptr) {
-      *id = entry.id;
-    }
-    return token;
-  }
-
-  static uid_t NoUid(const char*) { return TokenStore::kNobody; }
-
-  /// Runs SQL in the database as another program would.
-  static void Execute(const std::string& sql) {
-    sqlite3* database = nullptr;
-    ASSERT_EQ(sqlite3_open(Database().c_str(), &database), SQLITE_OK);
-    EXPECT_EQ(sqlite3_exec(database, sql.c_str(), nullptr, nullptr, nullptr), SQLITE_OK)
-        << sqlite3_errmsg(database);
-    sqlite3_close(database);
-  }
-
-  /// Takes the database back to its first version, which kept no ids of users.
-  static void MakeOld() {
-    Execute(
-        "ALTER TABLE tokens DROP COLUMN uid; ALTER TABLE tokens DROP COLUMN service;"
-        "PRAGMA user_version=0");
-  }
-
-  int Grant(const std::string& token, const char* api = "QELO.X", const char* method = "get",
-            int size = 64) {
-    user_[0] = 'x';
-    user_[1] = '\0';
-    const int result = QeloAccessTokenGrant(token.c_str(), api, method, user_, size);
-    EXPECT_EQ(result >= 0, user_[0] != '\0') << user_;
-    return result;
-  }
-
-  char user_[64] = "";
-};
+using AccessTokens = TokenTest;
 
 TEST_F(AccessTokens, TokenStandsForItsUser) {
   EXPECT_EQ(Grant(Create()), 1);
@@ -197,9 +135,18 @@ TEST_F(AccessTokens, ProcessesBringADatabaseUpToDateAtTheSameTime) {
   }
 }
 
+TEST_F(AccessTokens, DatabaseOfTheSecondVersionKeepsItsScopes) {
+  const std::string token = Create("alice", "QELO.X", "get");
+  const std::string other = Create("bob");
+  MakeSecond();
+  EXPECT_EQ(Grant(token), 1);
+  EXPECT_EQ(Grant(token, "QELO.X", "set"), -3);
+  EXPECT_EQ(Grant(other, "QELO.Y", "set"), 1);
+}
+
 TEST_F(AccessTokens, DatabaseOfALaterVersionCannotBeAsked) {
   const std::string token = Create();
-  Execute("PRAGMA user_version=2");
+  Execute("PRAGMA user_version=3");
   EXPECT_EQ(Grant(token), -4);
   EXPECT_EQ(SyslogCapture::Count("made by a later version"), 1);
 }
@@ -215,10 +162,10 @@ TEST_F(AccessTokens, RevokedTokenIsRefused) {
   TokenStore store;
   ASSERT_TRUE(store.Open(Database().c_str(), false, NoUid));
   bool found = false;
-  EXPECT_TRUE(store.Revoke(id, found));
+  EXPECT_TRUE(store.Revoke(id, nullptr, found));
   EXPECT_TRUE(found);
   EXPECT_EQ(Grant(token), -1);
-  EXPECT_TRUE(store.Revoke(id, found));
+  EXPECT_TRUE(store.Revoke(id, nullptr, found));
   EXPECT_FALSE(found);
 }
 

@@ -9,7 +9,8 @@
 
 namespace {
 
-constexpr char kHeadings[] = "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\n";
+constexpr char kHeadings[] =
+    "ID\tUSER\tAPI\tMETHOD\tMADE (UTC)\tGOOD UNTIL (UTC)\tLAST USE (UTC)\tLIMITS\tNAME\n";
 constexpr uid_t kOrdinaryUser = 65534;
 
 class TokenProgram : public PrivateRoot {
@@ -70,6 +71,24 @@ TEST_F(TokenProgram, CreateTakesPatternsAndDays) {
   EXPECT_EQ(QeloAccessTokenGrant(token.c_str(), "QELO.X", "set", user, 64), -3);
 }
 
+TEST_F(TokenProgram, CreateTakesLimitsAndAName) {
+  EXPECT_EQ(Run({"create", "--user", "bob", "--api", "QELO.Host.*", "--name", "for a script",
+                 "--address", "192.0.2.0/24", "--read-only"}),
+            0);
+  EXPECT_EQ(messages_.find("Token 1 "), 0U) << messages_;
+  Write("usr/qelo/qeloman/webapi/QELO.Host.lib",
+        R"({"QELO.Host.X": {"methods": {"1": [{"get": {"readOnly": true}}, "set"]}}})", 0644);
+  const std::string token = output_.substr(0, 43);
+  char user[64];
+  EXPECT_EQ(QeloAccessTokenGrant(token.c_str(), "QELO.Host.X", "get", user, 64), 1);
+  EXPECT_EQ(QeloAccessTokenGrant(token.c_str(), "QELO.Host.X", "set", user, 64), -3);
+  EXPECT_EQ(Run({"list"}), 0);
+  EXPECT_NE(output_.find("\tread-only 192.0.2.0/24\tfor a script\n"), std::string::npos) << output_;
+  EXPECT_EQ(output_.find("\tnever\t"), std::string::npos) << output_;  // the token has been used
+  EXPECT_EQ(Run({"create", "--user", "bob", "--name", "a\nb"}), 2);
+  EXPECT_EQ(Run({"create", "--user", "bob", "--address", "192.0.2.0/33"}), 2);
+}
+
 TEST_F(TokenProgram, CreateMakesTheDirectory) {
   std::filesystem::remove_all(Path("var/lib"));
   EXPECT_EQ(Run({"create", "--user", "alice"}), 0);
@@ -92,7 +111,7 @@ TEST_F(TokenProgram, CreateSaysWhatIsWrongAndMakesNothing) {
               std::string::npos)
         << days;
   }
-  for (const char* name : {"", "QELO.*", "a b"}) {
+  for (const char* name : {"", "*.X", "QELO.*.X", "**", "a b"}) {
     EXPECT_NE(wrong({"--user", "alice", "--api", name}).find("take a whole name"),
               std::string::npos);
     EXPECT_NE(wrong({"--user", "alice", "--method", name}).find("take a whole name"),
@@ -179,7 +198,7 @@ TEST_F(TokenProgram, ListShowsEverythingButTheTokens) {
   EXPECT_EQ(output_.find(kHeadings), 0U) << output_;
   EXPECT_NE(output_.find("\n1\talice\t*\t*\t2"), std::string::npos) << output_;
   EXPECT_NE(output_.find("\n2\tbob\tQELO.X\t*\t2"), std::string::npos) << output_;
-  EXPECT_NE(output_.find("\tnever\n"), std::string::npos) << output_;
+  EXPECT_NE(output_.find("\tnever\tnever\t\t\n"), std::string::npos) << output_;
   EXPECT_EQ(output_.find(token), std::string::npos);
 }
 
