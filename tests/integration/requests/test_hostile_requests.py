@@ -87,10 +87,23 @@ class Bystander(threading.Thread):
         return usual
 
 
+def unchunked(body):
+    """A body that the server passed on piece by piece; an end that is missing is an error."""
+    whole = b""
+    while True:
+        size, _, rest = body.partition(b"\r\n")
+        if int(size, 16) == 0:
+            return whole
+        whole += rest[:int(size, 16)]
+        body = rest[int(size, 16) + 2:]
+
+
 def is_whole(answer):
     """Whether it is an answer of the web API, or the server's own refusal."""
     start, _, body = answer.partition(b"\r\n\r\n")
     status = start.split(b" ", 2)[1]
+    if b"\r\ntransfer-encoding: chunked" in start.lower():
+        body = unchunked(body)
     if status == b"200":
         return json.loads(body)["success"] in (True, False)
     return status[:1] == b"4" or status in (b"501", b"505")

@@ -146,6 +146,28 @@ TEST(PartReader, ContentAroundTheBufferSizes) {
   }
 }
 
+TEST(PartReader, LinesThatBeginLikeABoundaryAreHandedOutTogether) {
+  std::string content;
+  for (int line = 0; line < 100; ++line) {
+    content += "\r\n--Bx";
+  }
+  const std::string body = Form::File("f", "x", content) + Form::End();
+  bool isGiven = false;
+  PartReader reader("B", [&](char* into, size_t) -> int64_t {
+    return isGiven ? 0 : (isGiven = true, static_cast<int64_t>(body.copy(into, body.size())));
+  });
+  PartHeader header;
+  bool isEnd = false;
+  ASSERT_EQ(reader.Next(header, isEnd), 0);
+  int pieces = 0;
+  EXPECT_EQ(reader.ReadContent([&](std::string_view bytes) {
+    pieces += bytes == content ? 1 : 100;
+    return 0;
+  }),
+            0);
+  EXPECT_EQ(pieces, 1);
+}
+
 TEST(PartReader, FailureOfTheSourceIsTheResult) {
   PartReader reader("B", [](char*, size_t) { return int64_t{QELO_UPLOAD_BROKEN_OFF}; });
   PartHeader header;
