@@ -1,7 +1,5 @@
 #include "programs/server/Server.h"
 
-#include <fcntl.h>
-#include <limits.h>
 #include <poll.h>
 #include <sys/epoll.h>
 #include <sys/resource.h>
@@ -14,6 +12,7 @@
 #include <cstdio>
 #include <utility>
 
+#include "programs/server/OpenFiles.h"
 #include "programs/server/ServiceManager.h"
 #include "webapi/base/Log.h"
 
@@ -21,7 +20,6 @@ namespace QELO {
 namespace {
 
 constexpr char kSource[] = "Server.cpp";
-constexpr int kFirstOther = 3;       ///< descriptor behind the standard ones
 constexpr rlim_t kOtherFiles = 128;  ///< descriptors that the server has beside its connections
 constexpr int kEventsAtOnce = 64;
 constexpr int kAcceptedAtOnce = 64;  ///< of one listener before the others have their turn
@@ -30,26 +28,6 @@ constexpr std::chrono::milliseconds kSweepPause{100};
 constexpr std::chrono::seconds kLeavingLimit{2};  ///< for who was refused to take that in
 constexpr std::chrono::seconds kRefusalPause{5};  ///< between two log lines on refusals
 constexpr size_t kDropped = 65536;                ///< bytes that are dropped by one read
-
-/// As far as the system lets it.
-void raiseFileLimit(rlim_t needed) {
-  rlimit limit{};
-  if (getrlimit(RLIMIT_NOFILE, &limit) == 0 && limit.rlim_cur < needed) {
-    limit.rlim_cur = std::min(needed, limit.rlim_max);
-    setrlimit(RLIMIT_NOFILE, &limit);
-  }
-}
-
-/// Leaves a forked child this one descriptor beside the standard ones.
-void keepAlone(UniqueFd& descriptor) {
-  closelog();  // else its number would be another's, and still be written to
-  if (descriptor.Get() != kFirstOther &&
-      dup3(descriptor.Get(), kFirstOther, O_CLOEXEC) == kFirstOther) {
-    descriptor.Release();
-    descriptor = UniqueFd(kFirstOther);
-  }
-  close_range(kFirstOther + 1, UINT_MAX, 0);
-}
 
 bool isGone(int descriptor) {
   pollfd state{descriptor, 0, 0};
@@ -61,7 +39,7 @@ bool isGone(int descriptor) {
 Server::Server(Service& service, const ServerLimits& limits) : service_(service), limits_(limits) {}
 
 bool Server::Open() {
-  raiseFileLimit(kOtherFiles + limits_.atOnce + limits_.queued + 2 * limits_.arriving);
+  RaiseFileLimit(kOtherFiles + limits_.atOnce + limits_.queued + 2 * limits_.arriving);
   events_ = UniqueFd(epoll_create1(EPOLL_CLOEXEC));
   return events_ && signals_.Open() && Watch(signals_.Descriptor());
 }
@@ -230,12 +208,31 @@ void Server::Arrive(Held connection) {
 void Server::Enqueue(Held connection) {
   if (jobs_.Count() < limits_.atOnce && waiting_.empty()) {
     Start(std::move(connection));
-  } else if (waiting_.size() < limits_.queued) {
+  } else if (waiting_.size() < limits_.queued || DropGone()) {
     connection->deadline = ServerClock::now() + limits_.turn;
     waiting_.push_back(std::move(connection));
   } else {
     Refuse(std::move(connection), Service::Refusal::kBusy);
   }
+}
+
+/// Clients that have gone keep nobody out of the queue.
+/// @return whether there is room
+bool Server::DropGone() {
+  std::vector<pollfd> states;
+  for (const Held& connection : waiting_) {
+    states.push_back({connection->socket.Get(), 0, 0});
+  }
+  if (poll(states.data(), states.size(), 0) > 0) {
+    std::deque<Held> present;
+    for (size_t i = 0; i < states.size(); ++i) {
+      if ((states[i].revents & (POLLHUP | POLLERR)) == 0) {
+        present.push_back(std::move(waiting_[i]));
+      }
+    }
+    waiting_.swap(present);
+  }
+  return waiting_.size() < limits_.queued;
 }
 
 void Server::StartWaiting() {
@@ -271,7 +268,7 @@ void Server::Start(Held connection) {
 void Server::RunChild(Held connection, Note& note) {
   setsid();
   SignalQueue::Reset();
-  keepAlone(connection->socket);
+  KeepAlone(connection->socket);
   const int status = service_.Serve(*connection, note);
   std::fflush(nullptr);
   _exit(status);

@@ -51,6 +51,7 @@ class Server {
   void Arrive(Held connection);
   void Enqueue(Held connection);
   void Start(Held connection);
+  bool DropGone();
   void StartWaiting();
   [[noreturn]] void RunChild(Held connection, Note& note);
   void Refuse(Held connection, Service::Refusal reason);
