@@ -5,24 +5,14 @@
 #include "webapi/APIRequest.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
-#include "webapi/base/MemoryBound.h"
-#include "webapi/base/OwnFile.h"
 #include "webapi/runner/execution/Fence.h"
-#include "webapi/runner/library/PreloadedLibraries.h"
+#include "webapi/runner/library/LoadLibrary.h"
 
 namespace QELO {
 namespace {
 
 constexpr char kTableFunction[] = "GetAPITable";
 constexpr char kCheckTableFunction[] = "GetAPICheckTable";
-
-/// Nothing of the loader can be unwound: an exception of a library's constructor ends the process
-/// here. It would not everywhere if dlopen() were called by its name, since that is declared not to
-/// throw and what then happens is up to the optimiser.
-void* load(const std::string& path) noexcept {
-  void* (*volatile open)(const char*, int) = dlopen;
-  return open(path.c_str(), RTLD_LAZY);
-}
 
 }  // namespace
 
@@ -58,20 +48,11 @@ bool LibraryCache::CacheLib(APIRequest* request, void** handle) {
     *handle = cached->second;
     return true;
   }
-  // A name without a directory is looked for where the system keeps its own.
-  if (path.find('/') != std::string::npos && OthersMayChange(path)) {
-    WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", LogText(path).c_str(),
-               "others may write it or its directory");
-    return false;
-  }
-  MemoryBound::Lift();  // a library takes the memory that it needs
-  void* opened = PreloadedLibraries::Find(path);
-  if (opened == nullptr) {
-    opened = load(path);
-  }
+  std::string error;
+  void* opened = LoadLibrary(path, error);
   if (opened == nullptr) {
     WEBAPI_LOG("APIRunner.cpp", "cannot open library: %s. error = %s", LogText(path).c_str(),
-               LogText(dlerror()).c_str());
+               LogText(error).c_str());
     return false;
   }
   libraries_[path] = opened;
