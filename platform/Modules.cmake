@@ -68,10 +68,19 @@ webapi_platform_module(ciphers SOURCES ciphers/module/CipherModule.cpp LIBRARIES
 webapi_platform_module(relay SOURCES relay/module/RelayModule.cpp relay/module/Transfer.cpp
                        LIBRARIES CURL::libcurl)
 
-if(WEBAPI_ROOT_PREFIX)
-  set(password_module module_password_crypt)
-else()
-  set(password_module module_password_pam)
+# As a shared library it would cost each call by a link half a millisecond.
+find_library(CRYPTO_ARCHIVE libcrypto.a REQUIRED)
+webapi_platform_module(sharing
+  SOURCES sharing/module/SharingModule.cpp sharing/module/SqliteLinkStore.cpp
+          sharing/module/SqliteSchema.cpp sharing/module/SqliteVisits.cpp
+          sharing/module/SecretHash.cpp
+  LIBRARIES JsonCpp::JsonCpp SQLite::SQLite3 ${CRYPTO_ARCHIVE} -Wl,--exclude-libs,libcrypto.a)
+
+# Sharing links have passwords of their own; those of accounts are PAM's on the host.
+set(password_modules module_password_crypt)
+if(NOT WEBAPI_ROOT_PREFIX)
+  list(APPEND password_modules module_password_pam)
 endif()
-install(TARGETS ${password_module} module_tokens module_tasks module_relay module_ciphers
+install(TARGETS ${password_modules} module_tokens module_tasks module_relay module_ciphers
+        module_sharing
         LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/modules)

@@ -15,6 +15,7 @@ inline constexpr char kLoginDir[] = WEBAPI_ROOT_PREFIX "/run/webapi/logins";
 inline constexpr char kStateDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi";
 inline constexpr char kTokenDatabase[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/tokens.db";
 inline constexpr char kSliceDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/uploads";
+inline constexpr char kSharingDatabase[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/sharing.db";
 inline constexpr char kTaskDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/tasks";
 inline constexpr char kGroupPreferenceDir[] = WEBAPI_ROOT_PREFIX "/var/lib/webapi/groups";
 inline constexpr char kAppPrivileges[] = WEBAPI_ROOT_PREFIX "/etc/webapi/appprivs.json";

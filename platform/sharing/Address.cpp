@@ -23,33 +23,4 @@ bool GetSharingURL(const std::string& host, int port, bool isHttps, const std::s
   return true;
 }
 
-namespace db {
-
-// No sharing links are kept here: the database cannot be asked, and nothing is found.
-SharingDB& SharingDB::Instance() {
-  static SharingDB instance;
-  return instance;
-}
-
-bool SharingDB::IsGood() const {
-  return false;
-}
-
-EntryDB::EntryDB(SharingDB&) {}
-SessionDB::SessionDB(SharingDB&) {}
-TokenDB::TokenDB(SharingDB&) {}
-
-bool EntryDB::GetByHash(const std::string&, record::Entry&) {
-  return false;
-}
-
-bool SessionDB::GetBySessionId(const std::string&, record::Session&) {
-  return false;
-}
-
-bool TokenDB::GetBySessionEntry(const record::Session&, const record::Entry&, record::Token&) {
-  return false;
-}
-
-}  // namespace db
 }  // namespace QELO::sharing

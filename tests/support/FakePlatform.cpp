@@ -16,7 +16,6 @@
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Credential.h"
 #include "webapi/platform/Session.h"
-#include "webapi/platform/Sharing.h"
 #include "webapi/platform/Token.h"
 #include "webapi/platform/WebServer.h"
 
@@ -316,7 +315,8 @@ bool ResetCredentialsByName(const char* name, bool keepPrivilege) {
 
 bool InitCredentialsByExecutable(const char* path, bool keepPrivilege) {
   note("InitCredentialsByExecutable", path, keepPrivilege ? "keep" : "drop");
-  return fake().credentialResult;
+  return fake().executableCredentials ? fake().executableCredentials(path, keepPrivilege)
+                                      : fake().credentialResult;
 }
 
 bool QELO::CredRequestUtil::GetDecryptAESString(const std::string& key, const std::string& cipher,
@@ -324,49 +324,6 @@ bool QELO::CredRequestUtil::GetDecryptAESString(const std::string& key, const st
   note("GetDecryptAESString", key, cipher);
   return fake().decryptAES && fake().decryptAES(key, cipher, plain);
 }
-
-namespace QELO::sharing {
-
-bool GetSharingURL(const std::string& host, int port, bool isHttps, const std::string& path,
-                   const std::string& rewriteApp, std::string& url, _tag_SHARING_URL_TYPE& type) {
-  note("GetSharingURL", host, std::to_string(port), isHttps ? "https" : "http", path, rewriteApp);
-  url = fake().sharingUrlKnown ? "sharing:" + host + path + rewriteApp : "";
-  type = rewriteApp.empty() ? SHARING_URL_HOST : SHARING_URL_REWRITE;
-  return fake().sharingUrlKnown;
-}
-
-namespace db {
-
-SharingDB& SharingDB::Instance() {
-  static SharingDB instance;
-  return instance;
-}
-
-bool SharingDB::IsGood() const {
-  return fake().sharingGood;
-}
-
-EntryDB::EntryDB(SharingDB&) {}
-SessionDB::SessionDB(SharingDB&) {}
-TokenDB::TokenDB(SharingDB&) {}
-
-bool EntryDB::GetByHash(const std::string& hash, record::Entry&) {
-  note("EntryDB::GetByHash", hash);
-  return false;
-}
-
-bool SessionDB::GetBySessionId(const std::string& id, record::Session&) {
-  note("SessionDB::GetBySessionId", id);
-  return false;
-}
-
-bool TokenDB::GetBySessionEntry(const record::Session&, const record::Entry&, record::Token&) {
-  note("TokenDB::GetBySessionEntry");
-  return false;
-}
-
-}  // namespace db
-}  // namespace QELO::sharing
 
 namespace qelow3 {
 

@@ -4,10 +4,12 @@
 
 #include <functional>
 #include <map>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "tests/support/FakeUpload.h"
+#include "webapi/platform/Sharing.h"
 
 /// The host's operations as unit tests want them: each answers what its field says, and the calls
 /// that matter are recorded. Linked in place of the embedded platform.
@@ -84,6 +86,12 @@ struct FakePlatform {
   // Sharing
   bool sharingGood = false;
   bool sharingUrlKnown = true;  ///< false: the look-up fails, with an empty address
+  std::optional<QELO::sharing::record::Entry> sharingEntry;  ///< none: is not found
+  std::optional<QELO::sharing::record::Session> sharingSession;
+  int sharingAuthorized = -2;
+  /// What a switch to the credentials of a file does; unset: nothing, with credentialResult.
+  std::function<bool(const std::string& path, bool keepPrivilege)> executableCredentials;
+  std::map<uid_t, std::string> users;  ///< by id, for QELOUserGetByUID
 
   // Calls of other hosts: the index that queueing gives, what becomes of them.
   int relayIndex = 0;

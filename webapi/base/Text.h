@@ -12,6 +12,21 @@ constexpr bool IsAlphanumeric(char c) {
   return IsDigit(c) || (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z');
 }
 
+/// Whether a text can be the name of an application, and so a part of a file's: 1 to 64 letters,
+/// digits, "_", "-" and ".", the first none of the last.
+constexpr bool IsProjectName(std::string_view text) {
+  constexpr size_t kLongest = 64;
+  if (text.empty() || text.size() > kLongest || text.front() == '.') {
+    return false;
+  }
+  for (const char c : text) {
+    if (!IsAlphanumeric(c) && c != '_' && c != '-' && c != '.') {
+      return false;
+    }
+  }
+  return true;
+}
+
 /// The text without the blanks around it.
 constexpr std::string_view Trim(std::string_view text, std::string_view blanks = " \t") {
   const size_t first = text.find_first_not_of(blanks);

@@ -61,6 +61,17 @@ WEBAPI_API pid_t QLIBCProcForkEx(int flags);
 
 /// The ids of a user. @return 0 on success
 WEBAPI_API int QELOUserGetUGID(const char* name, uid_t* uid, gid_t* gid);
+/// A user of the system.
+struct QeloUser {
+  char* name;
+  uid_t uid;
+  gid_t gid;
+};
+/// Looks up a user by id; of several with the same id the first of the account database.
+/// @param user  receives the user, which QELOUserFree() frees; null on failure
+/// @return 0 on success
+WEBAPI_API int QELOUserGetByUID(uid_t uid, QeloUser** user);
+WEBAPI_API void QELOUserFree(QeloUser* user);  ///< null: nothing
 /// Whether what a user was given before, a session or a token, may still be used.
 /// @return "good"; else why not: "not for logins", "locked", "expired", or "not readable" when the
 ///         accounts cannot be read; null when there is no such user. The text is static.

@@ -16,6 +16,7 @@ inline constexpr char kSystemInfoDefaults[] = WEBAPI_ROOT_PREFIX "/etc.defaults/
 inline constexpr char kRoot[] = WEBAPI_ROOT_PREFIX "/";
 inline constexpr char kTmp[] = WEBAPI_ROOT_PREFIX "/tmp";
 inline constexpr char kVarTmp[] = WEBAPI_ROOT_PREFIX "/var/tmp";
+inline constexpr char kSharingCheckDir[] = WEBAPI_ROOT_PREFIX "/usr/lib/sharing/permission_lib/";
 inline constexpr char kCounterDir[] = WEBAPI_ROOT_PREFIX "/var/spool/webapi";
 
 }  // namespace QELO::Paths

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "platform/tasks/module/Statement.h"
+#include "platform/base/module/Statement.h"
 #include "platform/tasks/module/TaskDatabase.h"
 
 namespace QELO::Platform {

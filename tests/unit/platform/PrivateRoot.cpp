@@ -40,7 +40,8 @@ const std::string& pristineRoot() {
     fs::remove_all(root);
     EXPECT_EQ(run(std::string(PRIVATE_ROOT_SCRIPT) + " '" + root + "' > /dev/null"), 0);
     fs::create_directory(root + "/modules");
-    for (const char* module : {"ciphers.so", "password_crypt.so", "relay.so", "tokens.so"}) {
+    for (const char* module :
+         {"ciphers.so", "password_crypt.so", "relay.so", "sharing.so", "tokens.so"}) {
       fs::copy_file(fs::path(kBuiltModuleDir) / module, fs::path(root) / "modules" / module);
     }
     return root;

@@ -50,16 +50,5 @@ TEST(SharingURL, WithoutHostThereIsNone) {
   EXPECT_EQ(address.url, "");
 }
 
-TEST(SharingDatabase, IsNotServed) {
-  db::SharingDB& database = db::SharingDB::Instance();
-  EXPECT_FALSE(database.IsGood());
-  record::Entry entry;
-  record::Session session;
-  record::Token token;
-  EXPECT_FALSE(db::EntryDB(database).GetByHash("x", entry));
-  EXPECT_FALSE(db::SessionDB(database).GetBySessionId("x", session));
-  EXPECT_FALSE(db::TokenDB(database).GetBySessionEntry(session, entry, token));
-}
-
 }  // namespace
 }  // namespace QELO::sharing
