@@ -40,4 +40,21 @@ struct _tag_API_CHECK_TABLE {
   void* reserved[2];  ///< the library's own; not read by the framework
 };
 
+/// One check of an application's sharing check library, which vets calls that come by links of the
+/// application. The library exports, with a plain C name:
+///
+///     extern "C" QELO::_tag_API_SHARING_CHECK_TABLE* GetAPISharingCheckTable();
+///
+/// It stands in "/usr/lib/sharing/permission_lib/", named after the application with ".so" behind.
+/// The first entry that fits a call decides; a call that none fits is refused. The array ends with
+/// an entry whose `api` is null.
+struct _tag_API_SHARING_CHECK_TABLE {
+  const char* api;     ///< POSIX extended regular expression over the API's name; "*": any
+  int32_t version;     ///< API version; 0: any
+  const char* method;  ///< as `api`, over the method's name
+  /// Whether the visitor may make this call. Runs with the credentials of the library file's
+  /// owner.
+  bool (*check)(APIRequest*, APIResponse*);
+};
+
 }  // namespace QELO

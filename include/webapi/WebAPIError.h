@@ -26,7 +26,12 @@ enum _tag_WEBAPI_ERR : int {
   WEBAPI_ERR_PROCESS_NAME = 118,         ///< the process could not be named for the call
   WEBAPI_ERR_NOT_AUTHENTICATED = 119,    ///< no valid session or token
   WEBAPI_ERR_METHOD_MISSING = 121,       ///< the method is missing from the library's table
-  WEBAPI_ERR_SHARING_REFUSED = 126,      ///< sharing link refused
+  WEBAPI_ERR_SHARING_NO_SESSION = 122,   ///< not signed in to the sharing link
+  WEBAPI_ERR_SHARING_MISMATCH = 123,     ///< signed in, but to another sharing link
+  WEBAPI_ERR_SHARING_DENIED = 124,       ///< the sharing link has expired, or refuses the call
+  WEBAPI_ERR_SHARING_TIMEOUT = 125,      ///< the sharing link's session timed out
+  WEBAPI_ERR_SHARING_REFUSED = 126,      ///< no such sharing link, or the method takes none
+  WEBAPI_ERR_SHARING_APPLICATION = 127,  ///< the sharing link's application refuses the call
   WEBAPI_ERR_ADDRESS_MISMATCH = 150,     ///< another address than the session's
   WEBAPI_ERR_NO_APP_PRIVILEGE = 160,     ///< the application privilege is missing
 };

@@ -12,6 +12,7 @@ struct QeloCgiContext;
 
 namespace QELO {
 
+class LinkCheck;
 class PermissionCheck;
 
 /// The front of one CGI invocation: reads the request from the CGI environment and standard
@@ -45,7 +46,11 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// @return false with error 101 when the query or the body cannot be read, or 117 (for an access
   ///         token no error) when credentials cannot be put into the environment
   bool Initialize(const Json::Value& param) override;
-  /// Refuses every sharing link, with error 126: they are not served yet.
+  /// Whether the sharing link that the request came by allows the call: the method takes links, the
+  /// visitor may use this one, and the link's application lets the call pass. The session of
+  /// `request` is from then on that of the link's owner, where the link says so, else nobody's; its
+  /// result is in GetAuthResult().
+  /// @return false with 101, 122 to 127 or 150 set; with null arguments without
   bool CheckSharingPermission(APIRequest* request, APIResponse* response) override;
   /// Whether the API's "authLevel" asks for a check: all but 0 do, a missing one too.
   bool NeedPermission(APIRequest* request) override;
@@ -69,6 +74,26 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// @return 0, or the web-API error code: 105, 106, 119 or 150. Asked once for each of the two
   ///         allowances and kept for the life of the process.
   int CheckPermission(bool allowTimeout);
+
+  /// Makes the owner of the link the caller: session data of `request`, and QELO_WEBAPI_USERNAME.
+  void InitSharingSession(APIRequest* request);
+  /// Asks the sharing check library of the link's application, with the credentials of its file's
+  /// owner and standard streams shut.
+  /// @return false when it refuses the call, or cannot be asked (logged)
+  bool CheckSharingAppPermission(APIRequest* request, APIResponse* response);
+  /// Where that library stands; "" when the link's project cannot be the name of one.
+  std::string GetSharingCheckLibPath(APIRequest* request);
+  /// Opens the library, once for each path and for the life of the process, and asks for its table.
+  /// @return false, with the reason logged, without a table
+  bool OpenSharingCheckLib(APIRequest* request, _tag_API_SHARING_CHECK_TABLE** table);
+  bool GetSharingCheckTableFunc(void* handle, _tag_API_SHARING_CHECK_TABLE** table);
+  /// Finds the check for the request's call.
+  /// @param check  receives the check of the first entry that fits
+  bool GetSharingCheckFunc(APIRequest* request, _tag_API_SHARING_CHECK_TABLE* table,
+                           bool (**check)(APIRequest*, APIResponse*));
+  /// 0 when a POSIX extended regular expression matches somewhere in the subject, or is "*"; else
+  /// what the host's regcomp() or regexec() says.
+  static int RegexMatch(const char* pattern, const char* subject);
 
   /// Parameter intake. Each fills one JSON object with names and values.
   /// @return false when the input cannot be read; `params` or `section` then holds what had been
@@ -108,6 +133,7 @@ class WEBAPI_API WebEntry : public APIRunner {
 
  private:
   QeloCgiContext* Context();
+  LinkCheck& Links();
   bool GatherEnvironment();
   void Serve();
   bool RewriteCredentials();
@@ -118,6 +144,7 @@ class WEBAPI_API WebEntry : public APIRunner {
   Json::Value permission_;  ///< "permResult": authorisation results, by CheckPermission(bool)
   bool hasUpload_ = false;  ///< there may be temporary files
   std::unique_ptr<PermissionCheck> check_;  ///< over the members above
+  std::unique_ptr<LinkCheck> links_;        ///< likewise; made by the first call by a link
 };
 
 /// After-output callback that restarts the web server; the argument is not used. Throws when the

@@ -15,7 +15,7 @@ MACRO = re.compile(r"^#define (\w+)\(((?:.*\\\n)*.*)", re.MULTILINE)
 CONSTANT = re.compile(rf"\bconstexpr char (\w+)\[\] = ({LITERAL});")
 # A source that is a parameter: what callers hand in.
 HANDED_IN = {
-    "webapi/runner/execution/Fence.h": {"APIRunner.cpp", "APIPolling.cpp"},
+    "webapi/runner/execution/Fence.h": {"APIRunner.cpp", "APIPolling.cpp", "WebEntry"},
     "webapi/model/response/HeaderLines.cpp": {"APIDownload.cpp", "WebEntry.cpp"},
 }
 FACILITIES = {"LOG_AUTH": "auth", "LOG_AUTHPRIV": "authpriv"}

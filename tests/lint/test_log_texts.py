@@ -28,6 +28,7 @@ ALLOWED = {
     ("platform/tasks/StorePlace.cpp", "name.c_str()"): "a user's number",
     ("platform/tasks/StorePlace.cpp", "aside.c_str()"): "a user's number and a secret",
     ("webapi/entry/WebEntry.cpp", "name"): "one of four variables",
+    ("webapi/entry/sharing/HeldIds.cpp", "call"): "two literals",
     ("webapi/runner/execution/Credentials.cpp", "call"): "two literals",
     ("webapi/runner/execution/Credentials.cpp", "message"): "the system's word on an error",
     ("webapi/runner/execution/Fence.h", "what"): "literals",

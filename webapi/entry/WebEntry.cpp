@@ -19,6 +19,7 @@
 #include "webapi/entry/output/AnswerText.h"
 #include "webapi/entry/output/WriteAnswer.h"
 #include "webapi/entry/permission/PermissionCheck.h"
+#include "webapi/entry/sharing/LinkCheck.h"
 #include "webapi/json/Literal.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Sharing.h"

@@ -24,6 +24,7 @@ class Credentials {
   /// Whether the process has kept something of a method's credentials that it was to give back.
   /// Then nothing else may be called in it.
   static bool AreLost() { return areLost_; }
+  static void Lose() { areLost_ = true; }
 
   /// Makes root the effective group and user, where they are not.
   /// @return false, with errno, when that is refused
