@@ -1,9 +1,12 @@
 // The fake platform's sharing links, and what is asked beside them.
 
+#include "tests/support/FakeSharing.h"
+
 #include <cstdlib>
 #include <cstring>
 
 #include "tests/support/FakePlatform.h"
+#include "webapi/JsonHelper.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Sharing.h"
 
@@ -22,6 +25,11 @@ std::string textOf(const char* text) {
 }
 
 }  // namespace
+
+FakeSharing& FakeSharing::Get() {
+  static FakeSharing instance;
+  return instance;
+}
 
 namespace QELO::sharing {
 
@@ -71,6 +79,42 @@ bool TokenDB::GetBySessionEntry(const record::Session&, const record::Entry&, re
 }
 
 }  // namespace db
+
+namespace {
+
+LinkResult done(const std::string& call, Json::Value& answer) {
+  note(call);
+  answer = FakeSharing::Get().answer;
+  return FakeSharing::Get().result;
+}
+
+}  // namespace
+
+LinkResult CreateLink(const std::string& owner, const Json::Value& terms, Json::Value& link) {
+  return done("CreateLink(" + owner + ", " + JsonHelper::toString(terms) + ")", link);
+}
+
+LinkResult ListLinks(const std::string& owner, Json::Value& links) {
+  return done("ListLinks(" + owner + ")", links);
+}
+
+LinkResult ChangeLink(const std::string& owner, int64_t id, const Json::Value& terms,
+                      Json::Value& link) {
+  return done(
+      "ChangeLink(" + owner + ", " + std::to_string(id) + ", " + JsonHelper::toString(terms) + ")",
+      link);
+}
+
+LinkResult RemoveLink(const std::string& owner, int64_t id) {
+  Json::Value nothing;
+  return done("RemoveLink(" + owner + ", " + std::to_string(id) + ")", nothing);
+}
+
+LinkResult OpenLink(const std::string& id, const std::string& password, const std::string& address,
+                    Json::Value& visit) {
+  return done("OpenLink(" + id + ", " + password + ", " + address + ")", visit);
+}
+
 }  // namespace QELO::sharing
 
 extern "C" {

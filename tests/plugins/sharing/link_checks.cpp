@@ -1,6 +1,6 @@
 // A sharing check library: its check does what the parameter "check" says, right or wrong.
 //
-// Tests: ApplicationTest.cpp, LibraryTest.cpp, SharingCheckerTest.cpp
+// Tests: ApplicationTest.cpp, LibraryTest.cpp, SharingCheckerTest.cpp, sharing.py
 
 #include <unistd.h>
 
@@ -38,7 +38,7 @@ PLUGIN_EXPORT QELO::_tag_API_SHARING_CHECK_TABLE* GetAPISharingCheckTable() {
   static QELO::_tag_API_SHARING_CHECK_TABLE table[] = {
       {"^QELO[.]Test[.]Good$", 7, "*", nullptr},
       {"^QELO[.]Test[.]Good$", 0, "silent", nullptr},
-      {"^QELO[.]Test[.]Good$", 1, "^(echo|whoami)$", check},
+      {"^QELO[.]Test[.](Good|Open)$", 1, "^(echo|whoami|asRoot)$", check},
       {nullptr, 0, nullptr, nullptr}};
   return table;
 }

@@ -2,6 +2,8 @@
 
 #include <strings.h>
 
+#include <cstdlib>
+#include <cstring>
 #include <string>
 
 #include "webapi/APIRequest.h"
@@ -30,6 +32,12 @@ bool comesFromAnotherSite(const APIRequest& request) {
   }
   const std::string origin = JsonHelper::asString(request.GetEnv("HTTP_ORIGIN"));
   return !origin.empty() && strcasecmp(hostOf(origin).c_str(), request.GetURLHost("").c_str()) != 0;
+}
+
+bool isPost(const APIRequest& request) {
+  const char* whole = getenv("REQUEST_METHOD");
+  return request.GetRequestMethod() == APIRequest::METHOD_POST &&
+         (whole == nullptr || strcmp(whole, "POST") == 0);
 }
 
 }  // namespace QELO

@@ -9,4 +9,8 @@ class APIRequest;
 /// it the page's host, in Origin, must be the one that is called. Programs send neither.
 bool comesFromAnotherSite(const APIRequest& request);
 
+/// Whether the request was sent by POST. An entry of a compound request counts as one, so the
+/// method that brought the whole request is looked at too.
+bool isPost(const APIRequest& request);
+
 }  // namespace QELO

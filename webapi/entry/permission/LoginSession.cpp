@@ -53,13 +53,6 @@ void tell(const Outcome& outcome, const std::string& client, const std::string& 
   }
 }
 
-/// An entry of a compound request counts as a POST, whatever brought the whole request.
-bool isPost(const APIRequest& request) {
-  const char* whole = getenv("REQUEST_METHOD");
-  return request.GetRequestMethod() == APIRequest::METHOD_POST &&
-         (whole == nullptr || strcmp(whole, "POST") == 0);
-}
-
 /// What speaks against the attempt before its password is looked at; counts it.
 Outcome refusalOf(const APIRequest& request, const std::string& address, const std::string& account,
                   LoginSession::Ticket& ticket) {

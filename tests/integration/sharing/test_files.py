@@ -1,0 +1,91 @@
+"""A folder shared by a link: exactly that folder, for anybody who has the link."""
+
+import json
+import os
+import shutil
+
+import pytest
+
+from accounts import account
+from conftest import ROOT
+from sharing import Visitor, alice, stranger, visit  # noqa: F401
+
+API = "QELO.Files.Item"
+
+
+@pytest.fixture
+def folder(root):
+    """A folder of alice's with a file, beside one that is not shared."""
+    home = root / "home" / "alice"
+    made = []
+    for path, text in (("shared/a.txt", "shared"), ("shared/deep/b.txt", "deep"),
+                       ("shared-not/c.txt", "secret"), ("d.txt", "secret")):
+        file = home / path
+        file.parent.mkdir(parents=True, exist_ok=True)
+        file.write_text(text)
+        made.append(home / path.split("/")[0])
+    (home / "shared" / "out").symlink_to(home / "d.txt")
+    for path in (path for name in made for path in [name, *name.rglob("*")]):
+        os.chown(path, *account("alice"), follow_symlinks=False)
+    yield "/own/shared"
+    for path in set(made):
+        if path.is_dir():
+            shutil.rmtree(path)
+        else:
+            path.unlink()
+
+
+@pytest.fixture
+def visitor(alice, visit, folder):
+    return visit(alice.make(project="files", protect="owner", path=folder))
+
+
+def names(visitor, path):
+    data = visitor.call("list", API, path=path).data
+    return [item["name"] for item in data["items"]]
+
+
+def test_SharedFolder_IsListedAndDownloaded(visitor, folder):
+    assert sorted(names(visitor, folder)) == ["a.txt", "deep", "out"]
+    assert names(visitor, folder + "/deep") == ["b.txt"]
+    assert visitor.call("stat", API, path=folder + "/a.txt").code == 0
+    assert visitor.call("download", API, path=folder + "/a.txt").body == b"shared"
+    paths = json.dumps([folder + "/a.txt", folder + "/deep"])
+    assert visitor.call("download", API, path=paths).body.startswith(b"PK")
+
+
+@pytest.mark.parametrize("path", [
+    "/", "/own", "/own/d.txt", "/own/shared-not", "/own/shared-not/c.txt", "/own/shared/../d.txt",
+    "/own/shared/./../d.txt", "/own/shared//../d.txt", "own/shared", "", "/own/share", "/OWN/shared",
+    "/own/shared/..", '["/own/shared", "/own/d.txt"]', "[]", "[[]]", "5", "{}",
+])
+@pytest.mark.parametrize("method", ["list", "stat", "download"])
+def test_EverythingElse_IsRefused(visitor, method, path):
+    answer = visitor.call(method, API, path=path)
+    assert answer.code == 127, answer.body
+
+
+def test_LinkWithinTheFolder_LeadsNowhere(visitor, folder):
+    assert b"secret" not in visitor.call("download", API, path=folder + "/out").body
+
+
+@pytest.mark.parametrize("method", ["create_folder", "rename", "copy", "move", "remove"])
+def test_Changes_AreRefused(visitor, folder, method):
+    answer = visitor.call(method, API, path=folder + "/a.txt", name="x", to=folder)
+    assert answer.code == 126
+    assert (ROOT / "home/alice/shared/a.txt").read_text() == "shared"
+
+
+def test_LinkOfAnotherProject_SharesNoFiles(alice, visit, folder):
+    other = visit(alice.make(project="notes", protect="owner", path=folder))
+    assert other.call("list", API, path=folder).code == 127
+
+
+def test_LinkToOneFile_SharesThatFile(alice, visit, folder):
+    visitor = visit(alice.make(project="files", protect="owner", path=folder + "/a.txt"))
+    assert visitor.call("download", API, path=folder + "/a.txt").body == b"shared"
+    assert visitor.call("list", API, path=folder).code == 127
+
+
+def test_WithoutASession_NothingIsShared(visitor, folder):
+    assert Visitor(visitor.client, visitor.link).call("list", API, path=folder).code == 122
