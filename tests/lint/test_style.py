@@ -10,6 +10,8 @@ from sources import SOURCE, cpp_files, files, name, run, scripts
 
 MAX_LINES = {"product": 350, "tests": 400}
 MAX_FILES = 25  # of one folder; past that it is two subjects
+# What others include by its name, one header a public class, stays where it is.
+MAX_FILES_OF = {"include/webapi": 32}
 
 
 def test_Cpp_IsFormatted():
@@ -38,7 +40,7 @@ def test_Files_AreShort():
 
 def test_Folders_HoldOneSubject():
     folders = Counter(name(path.parent) for path in files("*") if path.name != ".gitignore")
-    assert {folder: count for folder, count in folders.items() if count > MAX_FILES} == {}
+    assert {folder: count for folder, count in folders.items() if count > MAX_FILES_OF.get(folder, MAX_FILES)} == {}
 
 
 def test_Headers_AreGuarded():
