@@ -12,8 +12,15 @@ namespace {
 /// A page that somebody has uploaded runs no script and is of no origin: what it says is not done
 /// in the name of who looks at it.
 constexpr char kPolicy[] = "default-src 'none'; style-src 'unsafe-inline'; sandbox";
+/// The type of what has none that could be sent.
+constexpr char kUnknownType[] = "application/octet-stream";
 /// Kept by the client alone, which asks each time whether it has changed.
 constexpr char kCaching[] = "private, no-cache";
+
+/// Whether the text ends no header line, so that nothing behind it becomes one.
+bool isHeaderText(const std::string& text) {
+  return !text.empty() && text.find_first_of(std::string_view("\r\n\0", 3)) == std::string::npos;
+}
 
 /// Whether the caller has asked for no other status than that of a content.
 bool isContentsStatus(const std::string& status) {
@@ -29,7 +36,10 @@ std::string contentRange(const Range& range, off_t size) {
 
 Answer::Answer(const Content& content, const std::vector<std::string>& lines,
                const std::string& type, const std::string& name)
-    : content_(content), head_(lines), type_(type), wantsHeadAlone_(isMethod("HEAD")) {
+    : content_(content),
+      head_(lines),
+      type_(isHeaderText(type) ? type : kUnknownType),
+      wantsHeadAlone_(isMethod("HEAD")) {
   AddDefaults(name);
   AddValidators();
 }

@@ -7,8 +7,8 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
-#include <vector>
 
 #include "webapi/base/Log.h"
 #include "webapi/base/TextFile.h"
@@ -73,7 +73,7 @@ bool Writer::SendFile(int file, off_t start, off_t length) {
 }
 
 bool Writer::CopyFile(int file, off_t start, off_t length) {
-  std::vector<char> chunk(kChunk);
+  std::array<char, kChunk> chunk;  // no memory is no reason to break off half-way
   while (length > 0) {
     const size_t wanted = static_cast<size_t>(std::min<off_t>(length, kChunk));
     const ssize_t count = TEMP_FAILURE_RETRY(pread(file, chunk.data(), wanted, start));
@@ -90,7 +90,7 @@ bool Writer::CopyFile(int file, off_t start, off_t length) {
 }
 
 bool Writer::SendStream(std::FILE* stream, off_t length) {
-  std::vector<char> chunk(kChunk);
+  std::array<char, kChunk> chunk;  // no memory is no reason to break off half-way
   while (length != 0) {
     const size_t wanted =
         length < 0 ? kChunk : static_cast<size_t>(std::min<off_t>(length, kChunk));

@@ -127,8 +127,11 @@ int keepAll(Upload& current, const std::vector<LoadedFile>& loaded, QLIBSZHASH**
   return current.Result();
 }
 
+/// Without a word of which slice of what it is, a file is a whole one.
 bool isSlice() {
-  return strcasecmp(variable("HTTP_X_TYPE_NAME").c_str(), "SLICEUPLOAD") == 0;
+  return strcasecmp(variable("HTTP_X_TYPE_NAME").c_str(), "SLICEUPLOAD") == 0 &&
+         !(variable("HTTP_X_UPLOAD_ID").empty() && variable("HTTP_X_FILE_SIZE").empty() &&
+           variable("HTTP_X_SLICE_OFFSET").empty());
 }
 
 /// Adds the file that was found to the one that it is a slice of.

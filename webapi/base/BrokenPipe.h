@@ -4,21 +4,26 @@
 
 namespace QELO {
 
-/// While it lives, writing to a client that has gone away fails instead of ending the process:
-/// work that was registered for after the answer must still run.
+/// While it lives, writing to somebody who has gone away fails instead of ending the process, which
+/// may have work left to do. The signal is handled as before afterwards, by its flags too.
 class BrokenPipe {
  public:
-  BrokenPipe() : former_(signal(SIGPIPE, SIG_IGN)) {}
+  BrokenPipe() {
+    struct sigaction ignored {};
+    ignored.sa_handler = SIG_IGN;
+    isSet_ = sigaction(SIGPIPE, &ignored, &former_) == 0;
+  }
   BrokenPipe(const BrokenPipe&) = delete;
   BrokenPipe& operator=(const BrokenPipe&) = delete;
   ~BrokenPipe() {
-    if (former_ != SIG_ERR) {
-      signal(SIGPIPE, former_);
+    if (isSet_) {
+      sigaction(SIGPIPE, &former_, nullptr);
     }
   }
 
  private:
-  void (*former_)(int);
+  struct sigaction former_ {};
+  bool isSet_;
 };
 
 }  // namespace QELO

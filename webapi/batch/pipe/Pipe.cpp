@@ -15,6 +15,7 @@
 #include <string>
 
 #include "webapi/JsonHelper.h"
+#include "webapi/base/BrokenPipe.h"
 #include "webapi/base/Log.h"
 
 namespace QELO {
@@ -23,23 +24,6 @@ namespace {
 constexpr char kSource[] = "APIUtilsPrivate.cpp";
 /// More the kernel neither writes nor reads at once.
 constexpr size_t kLargestText = 0x7ffff000;
-
-/// While it lives, writing to a pipe that nobody reads any more fails instead of ending the
-/// process, which may have work left to do.
-class ToleratedBrokenPipe {
- public:
-  ToleratedBrokenPipe() {
-    struct sigaction ignored {};
-    ignored.sa_handler = SIG_IGN;
-    sigaction(SIGPIPE, &ignored, &former_);
-  }
-  ToleratedBrokenPipe(const ToleratedBrokenPipe&) = delete;
-  ToleratedBrokenPipe& operator=(const ToleratedBrokenPipe&) = delete;
-  ~ToleratedBrokenPipe() { sigaction(SIGPIPE, &former_, nullptr); }
-
- private:
-  struct sigaction former_ {};
-};
 
 void closeEnd(int& end) {
   if (end >= 0) {
@@ -183,7 +167,7 @@ bool Pipe::WriteJson(const Json::Value& value) {
   if (!HasRoomFor(text.size())) {
     return false;
   }
-  const ToleratedBrokenPipe tolerated;
+  const BrokenPipe tolerated;
   const uint32_t length = static_cast<uint32_t>(text.size());
   if (TEMP_FAILURE_RETRY(write(writeEnd_, &length, sizeof length)) != sizeof length) {
     return false;

@@ -24,6 +24,7 @@ namespace {
 
 constexpr char kQueryString[] = "QUERY_STRING";
 constexpr char kResumableVersion[] = "HTTP_TUS_RESUMABLE";
+constexpr char kPieceType[] = "application/offset+octet-stream";
 constexpr char kUploadContentType[] = "text/plain; charset=\"UTF-8\"";
 constexpr char kEnvelope[] = "webapi";
 constexpr char kCipherToken[] = "__cIpHeRtOkEn";
@@ -43,6 +44,12 @@ Json::Value& sectionOf(Json::Value& params, const char* name) {
   return section;
 }
 
+/// Whether a client of resumable uploads sends a piece of a file, or nothing. A form is none.
+bool isResumable(const APIRequest& request) {
+  const std::string type = JsonHelper::asString(request.GetEnv("CONTENT_TYPE", ""));
+  return request.HasEnv(kResumableVersion) && (type.empty() || type == kPieceType);
+}
+
 bool namesCall(const Json::Value& section) {
   return JsonHelper::hasMember(section, "api") && JsonHelper::hasMember(section, "version") &&
          JsonHelper::hasMember(section, "method");
@@ -57,9 +64,8 @@ bool Intake::InitParam(Json::Value& params) {
   if (request_.GetRequestMethod() != APIRequest::METHOD_POST) {
     return true;
   }
-  // A client of resumable uploads sends a piece of a file, or nothing; the method reads that.
-  if (request_.HasEnv(kResumableVersion) && namesCall(JsonHelper::member(params, "getParam"))) {
-    return true;
+  if (isResumable(request_) && namesCall(JsonHelper::member(params, "getParam"))) {
+    return true;  // the method reads the piece
   }
   bool taken = false;
   if (request_.IsUploadRequest()) {

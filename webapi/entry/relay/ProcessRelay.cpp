@@ -7,6 +7,7 @@
 #include "webapi/WebEntry.h"
 #include "webapi/base/BrokenPipe.h"
 #include "webapi/entry/intake/RequestBody.h"
+#include "webapi/entry/intake/UnreadBody.h"
 #include "webapi/entry/output/WriteAnswer.h"
 #include "webapi/entry/permission/PermissionCheck.h"
 #include "webapi/entry/permission/Refusal.h"
@@ -49,7 +50,8 @@ bool WebEntry::ProcessRelay(APIRequest* request, APIResponse* response) {
   response->SetEnableOutput(false);
   const BrokenPipe tolerated;
   OutputHeader();
-  WriteAnswer(answer);
+  UnreadBody body = UnreadBody::OfRequest();
+  WriteAnswer(answer, body);
   if (request->IsUploadRequest()) {
     RequestBody::CloseStandardInput();  // its body is gone on its way
   }

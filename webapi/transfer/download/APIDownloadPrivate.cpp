@@ -74,9 +74,9 @@ int APIDownloadPrivate::Output(std::FILE* stream) {
 }
 
 int APIDownloadPrivate::Finish(int result) {
-  if (result != HTTPFileOutputer::kNothingSent) {
-    response_->SetEnableOutput(false);  // a JSON text would become the end of the file
-  }
+  // A JSON text would become the end of the file; and without the file it is the only answer, even
+  // where the method has turned it off beforehand.
+  response_->SetEnableOutput(result == HTTPFileOutputer::kNothingSent);
   return result;
 }
 

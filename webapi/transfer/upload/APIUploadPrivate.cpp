@@ -80,7 +80,7 @@ int APIUploadPrivate::GetUploadAll(Json::Value& params, Json::Value* tmpFiles) {
   const int result = QeloCgiLoadUploadAll(&loaded, &loadedFiles, directory.c_str(), 0);
   parameters.reset(loaded);
   files.reset(loadedFiles);
-  if (tmpFiles != nullptr) {
+  if (tmpFiles != nullptr && (tmpFiles->isNull() || tmpFiles->isArray())) {
     forEach(loadedFiles, [&](const char*, const char* path) { tmpFiles->append(path); });
   }
   if (result != APIUpload::DONE) {

@@ -126,7 +126,7 @@ TEST_F(UploadIntake, PieceOfAResumableUploadIsNoParameterAndMayBeEmpty) {
     Set("QUERY_STRING", "api=QELO.Test.Good&version=1&method=echo");
     const CgiAnswer answer = Serve();
     EXPECT_TRUE(answer.Json()["success"].asBool());
-    EXPECT_TRUE(answer.Json()["data"]["param"]["piece"].isNull());
+    EXPECT_TRUE(answer.Json()["data"]["piece"].isNull());
     EXPECT_EQ(RestOfInput(), body);
   }
 }
@@ -136,6 +136,17 @@ TEST_F(UploadIntake, ResumableUploadThatNamesItsCallInTheBodyIsReadAsAnyOther) {
   Post("api=QELO.Test.Good&version=1&method=echo");
   Set("HTTP_TUS_RESUMABLE", "1.0.0");
   EXPECT_TRUE(Serve().Json()["success"].asBool());
+}
+
+TEST_F(UploadIntake, FormOfAClientThatSpeaksOfResumableUploadsIsReadAsAnyOther) {
+  Describe(R"({"authLevel": 0})", R"({"grantByDefault": true})");
+  Post("a=1");
+  Set("CONTENT_TYPE", "application/x-www-form-urlencoded");
+  Set("HTTP_TUS_RESUMABLE", "1.0.0");
+  Set("QUERY_STRING", "api=QELO.Test.Good&version=1&method=echo");
+  const CgiAnswer answer = Serve();
+  EXPECT_TRUE(answer.Json()["success"].asBool());
+  EXPECT_EQ(answer.Json()["data"]["a"], 1);
 }
 
 TEST_F(UploadIntake, SliceAfterWhichMoreIsToComeIsAnsweredWithoutTheMethod) {

@@ -202,6 +202,17 @@ TEST_F(WholeFile, WaitsForAnOutputThatHasNoRoom) {
   EXPECT_GT(received, 4U << 20U);
 }
 
+TEST_F(WholeFile, TypeThatWouldBecomeAnotherHeaderIsNotSent) {
+  for (const std::string& type : {std::string("a/b\r\nSet-Cookie: c=d"), std::string("a/b\nX: y"),
+                                  std::string("a/b\0c", 5), std::string()}) {
+    const CgiAnswer answer =
+        PrintedBy([&] { result = HTTPFileOutputer().Output(Path("content"), type); });
+    EXPECT_EQ(Header(answer, "Content-Type"), "application/octet-stream");
+    EXPECT_EQ(Header(answer, "Set-Cookie"), "(none)");
+    EXPECT_EQ(Header(answer, "X"), "(none)");
+  }
+}
+
 TEST_F(WholeFile, ClientThatIsGoneEndsTheOutputAndNothingElse) {
   Put("file", std::string(1 << 20, 'x'));
   int ends[2];

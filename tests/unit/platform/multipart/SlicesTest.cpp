@@ -179,6 +179,11 @@ TEST_F(Slices, OfTwoCallersAreTwoFiles) {
   EXPECT_EQ(Uploaded(), "123456789");
 }
 
+TEST_F(Slices, FileOfWhichNothingIsSaidIsAWholeOne) {
+  EXPECT_EQ(Load(Form::File("f", "x", "1234") + Form::End()), QELO_UPLOAD_DONE);
+  EXPECT_EQ(Uploaded(), "1234");
+}
+
 TEST_F(Slices, HeadersThatMakeNoSenseAreRefused) {
   const std::string body = Form::File("f", "x", "1") + Form::End();
   for (const auto& [offset, size, id] :

@@ -182,6 +182,13 @@ TEST_F(Download, IsSentWhereTheInputAloneIsShut) {
   EXPECT_EQ(APIDownload(&response_).Output("f"), 0);
 }
 
+TEST_F(Download, OutputThatPrintedNothingIsAnsweredWhereTheMethodHadTurnedThatOff) {
+  platform_->fileOutput = APIDownload::kNothingSent;
+  response_.SetEnableOutput(false);
+  EXPECT_EQ(APIDownload(&response_).Output("f"), APIDownload::kNothingSent);
+  EXPECT_TRUE(response_.IsEnableOutput());
+}
+
 TEST_F(Download, FileNameIsAHeaderOfTheOutput) {
   APIDownload download(&response_);
   download.SetFileName("a");
