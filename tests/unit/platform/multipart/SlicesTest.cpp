@@ -34,11 +34,11 @@ class Slices : public PrivateRoot {
     QeloCgiUploadCallerSet(kAlice);
   }
   void TearDown() override {
+    Load("");  // the files of the upload before go
     for (const char* name : {"HTTP_X_TYPE_NAME", "HTTP_X_UPLOAD_ID", "HTTP_X_FILE_SIZE",
                              "HTTP_X_SLICE_OFFSET", "CONTENT_TYPE", "CONTENT_LENGTH"}) {
       unsetenv(name);
     }
-    Load("");  // the files of the upload before go
     dup2(former_, STDIN_FILENO);
     close(former_);
     QLIBCSzHashFree(fields);
