@@ -127,6 +127,11 @@ bool PreloadedLibraries::Load(const std::string& path) {
     WEBAPI_LOG("APIRunner.cpp", "not loaded ahead: %s [%m]", LogText(path).c_str());
     return false;
   }
+  const auto known = copies->find(path);
+  if (known != copies->end() && known->second.handle != nullptr &&
+      known->second.version == *version) {
+    return true;
+  }
   Copy copy{*version, nullptr, time(nullptr)};
   const std::string fault = load(path, copy);
   if (!fault.empty()) {

@@ -2,6 +2,8 @@
 
 #include <dlfcn.h>
 
+#include <iterator>
+
 #include "tests/unit/runner/RunnerFixture.h"
 
 namespace QELO {
@@ -36,6 +38,17 @@ TEST_F(Preloading, RunnerHasThePrivateCopyOnce) {
   ASSERT_TRUE(APIRunner::PreloadLibrary(path));
   EXPECT_EQ(FileOf(path).rfind("/proc/self/fd/", 0), 0u);
   EXPECT_EQ(FileOf(path), path);  // the first runner has closed it
+}
+
+TEST_F(Preloading, FileThatHasNotChangedIsNotCopiedAgain) {
+  const std::string path = PathTo("state");
+  const auto descriptors = [] {
+    return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
+  };
+  ASSERT_TRUE(APIRunner::PreloadLibrary(path));
+  const auto before = descriptors();
+  ASSERT_TRUE(APIRunner::PreloadLibrary(path));
+  EXPECT_EQ(descriptors(), before);
 }
 
 TEST_F(Preloading, FileThatIsAnotherByNowIsLoadedItself) {
