@@ -63,6 +63,8 @@ bool SqliteLinkStore::Open(const char* path, bool create) {
   sqlite3_busy_timeout(database_, kBusyMs);
   int keep = 1;  // else every process that comes and goes makes and removes the companion files
   sqlite3_file_control(database_, "main", SQLITE_FCNTL_PERSIST_WAL, &keep);
+  // Nor does each bring the log into the database, and onto the disk: those who write do.
+  sqlite3_db_config(database_, SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
   int64_t version = 0;
   if (!ReadVersion(version)) {
     return false;

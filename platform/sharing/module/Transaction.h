@@ -22,7 +22,16 @@ class SqliteLinkStore::Transaction {
   Transaction& operator=(const Transaction&) = delete;
 
   bool Begun() const { return begun_; }
-  bool Commit() { return Statement(store_.Prepare("COMMIT")).Run(); }
+  /// The log is emptied, unless others are at it: each process that opens the database reads it.
+  bool Commit() {
+    if (!Statement(store_.Prepare("COMMIT")).Run()) {
+      return false;
+    }
+    sqlite3_busy_timeout(store_.database_, 0);
+    sqlite3_wal_checkpoint_v2(store_.database_, nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr,
+                              nullptr);
+    return true;
+  }
 
  private:
   SqliteLinkStore& store_;
