@@ -185,6 +185,17 @@ TEST_F(AccessTokens, DatabaseKeepsNoTokenAndIsForItsOwnerAlone) {
   EXPECT_GE(files, 1);
 }
 
+TEST_F(AccessTokens, LogIsEmptyOnceNobodyHasItOpen) {
+  const std::string token = Create();
+  EXPECT_EQ(Status("var/lib/webapi/tokens.db-wal").st_size, 0);
+  EXPECT_EQ(Grant(token), 1);  // notes the use
+  EXPECT_EQ(Status("var/lib/webapi/tokens.db-wal").st_size, 0);
+  const timespec before = Status("var/lib/webapi/tokens.db").st_mtim;
+  EXPECT_EQ(Grant(token), 1);
+  const timespec after = Status("var/lib/webapi/tokens.db").st_mtim;
+  EXPECT_EQ(after.tv_sec * 1000000000 + after.tv_nsec, before.tv_sec * 1000000000 + before.tv_nsec);
+}
+
 TEST_F(AccessTokens, BrokenDatabaseCannotBeAsked) {
   Write("var/lib/webapi/tokens.db", std::string(8192, 'x'));
   EXPECT_EQ(Grant(std::string(43, 'a')), -4);
