@@ -109,3 +109,4 @@ install(FILES packaging/lighttpd.conf.in packaging/lighttpd.service.conf packagi
         DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY packaging/fail2ban DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)
+install(DIRECTORY examples DESTINATION ${CMAKE_INSTALL_DOCDIR} USE_SOURCE_PERMISSIONS)
