@@ -155,8 +155,9 @@ class CgiTest : public testing::Test {
   static void ClearEnvironment() {
     for (const char* name :
          {"REQUEST_METHOD", "QUERY_STRING", "CONTENT_LENGTH", "CONTENT_TYPE", "HTTP_COOKIE",
-          "HTTP_X_QELO_SHARING", "HTTP_X_TYPE_NAME", "HTTP_HOST", "QELO_REMOTE_IP",
-          "QELO_WEBAPI_USERNAME", "qeloAccessToken", "in_qeloapid"}) {
+          "HTTP_X_QELO_SHARING", "HTTP_X_TYPE_NAME", "HTTP_TUS_RESUMABLE", "HTTP_TRANSFER_ENCODING",
+          "HTTP_HOST", "QELO_REMOTE_IP", "QELO_WEBAPI_USERNAME", "qeloAccessToken",
+          "in_qeloapid"}) {
       unsetenv(name);
     }
   }
