@@ -27,6 +27,12 @@ def test_Scripts_PassShellcheck():
     assert result.returncode == 0, result.stdout
 
 
+def test_TestModules_HaveNamesOfTheirOwn():
+    # Two modules of one name cannot be collected together.
+    names = Counter(path.name for path in (SOURCE / "tests").rglob("test_*.py"))
+    assert [name for name, count in names.items() if count > 1] == []
+
+
 def test_Files_AreShort():
     checked = cpp_files() + files("*.py", "*.cmake", "CMakeLists.txt") + scripts()
     long = []

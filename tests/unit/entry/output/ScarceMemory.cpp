@@ -24,6 +24,10 @@ void* operator new(std::size_t size) {
   return block;
 }
 
+void* operator new(std::size_t size, const std::nothrow_t&) noexcept {
+  return size > largest ? nullptr : malloc(size > 0 ? size : 1);
+}
+
 void operator delete(void* block) noexcept {
   free(block);
 }
