@@ -1,7 +1,6 @@
 #include "platform/tokens/module/TokenStore.h"
 
 #include <fcntl.h>
-#include <sha2.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
 #include <time.h>
@@ -11,6 +10,7 @@
 #include <memory>
 
 #include "platform/base/Secrets.h"
+#include "platform/base/module/SecretHash.h"
 #include "platform/tokens/module/TokenSchema.h"
 #include "webapi/base/OwnFile.h"
 #include "webapi/base/UniqueFd.h"
@@ -19,6 +19,7 @@ namespace QELO::Platform {
 namespace {
 
 constexpr int kBusyMs = 2000;
+constexpr int kHashSize = 32;  ///< bytes of a secretHash()
 
 struct Finalize {
   void operator()(sqlite3_stmt* statement) const { sqlite3_finalize(statement); }
@@ -31,12 +32,9 @@ void bindText(const Statement& statement, int index, const std::string& text) {
 }
 
 void bindHash(const Statement& statement, int index, const std::string& token) {
-  uint8_t hash[SHA256_DIGEST_LENGTH];
-  SHA2_CTX context;
-  SHA256Init(&context);
-  SHA256Update(&context, reinterpret_cast<const uint8_t*>(token.data()), token.size());
-  SHA256Final(hash, &context);
-  sqlite3_bind_blob(statement.get(), index, hash, sizeof hash, SQLITE_TRANSIENT);
+  const std::string hash = secretHash(token);
+  sqlite3_bind_blob(statement.get(), index, hash.data(), static_cast<int>(hash.size()),
+                    SQLITE_TRANSIENT);
 }
 
 /// Null stands for whoever it is.
@@ -222,11 +220,10 @@ bool TokenStore::FindHash(int64_t id, int64_t now, unsigned char* hash) {
   const Statement statement(prepared);
   sqlite3_bind_int64(prepared, 1, id);
   sqlite3_bind_int64(prepared, 2, now);
-  if (sqlite3_step(prepared) != SQLITE_ROW ||
-      sqlite3_column_bytes(prepared, 0) != SHA256_DIGEST_LENGTH) {
+  if (sqlite3_step(prepared) != SQLITE_ROW || sqlite3_column_bytes(prepared, 0) != kHashSize) {
     return false;
   }
-  memcpy(hash, sqlite3_column_blob(prepared, 0), SHA256_DIGEST_LENGTH);
+  memcpy(hash, sqlite3_column_blob(prepared, 0), kHashSize);
   return true;
 }
 
