@@ -1,7 +1,7 @@
 #include "platform/sharing/module/SqliteLinkStore.h"
 
-#include "platform/base/module/Statement.h"
 #include "platform/base/module/SecretHash.h"
+#include "platform/base/module/Statement.h"
 #include "platform/sharing/module/Transaction.h"
 
 namespace QELO::Platform {

@@ -1,7 +1,7 @@
 // The database's sessions of visitors: made when a link is opened, ended when it changes or goes.
 
-#include "platform/base/module/Statement.h"
 #include "platform/base/module/SecretHash.h"
+#include "platform/base/module/Statement.h"
 #include "platform/sharing/module/SqliteLinkStore.h"
 #include "platform/sharing/module/Transaction.h"
 

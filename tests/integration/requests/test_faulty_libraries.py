@@ -125,7 +125,7 @@ def test_NullCheckTable_IsNoTable(client, describe):
 def test_EveryLibrary_IsUsedByATest():
     folder = Path(__file__).parents[2]
     users = [*folder.rglob("*Test.cpp"), *folder.rglob("*.h"), *folder.rglob("test_*.py"),
-             *folder.rglob("descriptions/*.lib")]
+             *folder.rglob("support/*.py"), *folder.rglob("descriptions/*.lib")]
     text = "".join(path.read_text() for path in users)
     libraries = [library.stem for library in PLUGINS.glob("*.so")]
     assert "crashing" in libraries
