@@ -43,7 +43,7 @@ endif()
 # The token database is the administrators' program's too.
 function(webapi_token_store twin)
   add_library(webapi_token_store${twin} STATIC tokens/module/TokenStore.cpp
-              tokens/module/TokenSchema.cpp base/Secrets.cpp base/module/SecretHash.cpp)
+              tokens/module/TokenSchema.cpp base/Secrets.cpp base/module/SecretHash.cpp base/module/OwnDatabase.cpp)
   target_include_directories(webapi_token_store${twin} PUBLIC ${PROJECT_SOURCE_DIR}/include
                                                               ${PROJECT_SOURCE_DIR})
   target_link_libraries(webapi_token_store${twin} PUBLIC SQLite::SQLite3 ${MD_LIBRARY})
@@ -56,7 +56,7 @@ endif()
 
 webapi_platform_module(tokens
   SOURCES tokens/module/TokenModule.cpp tokens/module/TokenStore.cpp tokens/module/TokenSchema.cpp
-          base/Secrets.cpp base/module/SecretHash.cpp
+          base/Secrets.cpp base/module/SecretHash.cpp base/module/OwnDatabase.cpp
   LIBRARIES SQLite::SQLite3 ${MD_LIBRARY})
 webapi_platform_module(tasks
   SOURCES tasks/module/TaskModule.cpp tasks/module/StoreConnection.cpp
@@ -71,7 +71,7 @@ webapi_platform_module(relay SOURCES relay/module/RelayModule.cpp relay/module/T
 webapi_platform_module(sharing
   SOURCES sharing/module/SharingModule.cpp sharing/module/SqliteLinkStore.cpp
           sharing/module/SqliteSchema.cpp sharing/module/SqliteVisits.cpp
-          base/module/SecretHash.cpp
+          base/module/SecretHash.cpp base/module/OwnDatabase.cpp
   LIBRARIES JsonCpp::JsonCpp SQLite::SQLite3 ${MD_LIBRARY})
 
 # Sharing links have passwords of their own; those of accounts are PAM's on the host.

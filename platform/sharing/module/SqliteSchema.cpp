@@ -6,10 +6,10 @@
 #include <cerrno>
 #include <cstring>
 
+#include "platform/base/module/OwnDatabase.h"
 #include "platform/base/module/Statement.h"
 #include "platform/sharing/module/SqliteLinkStore.h"
 #include "platform/sharing/module/Transaction.h"
-#include "webapi/base/OwnFile.h"
 #include "webapi/base/UniqueFd.h"
 
 namespace QELO::Platform {
@@ -52,17 +52,9 @@ bool SqliteLinkStore::Open(const char* path, bool create) {
     error_ = strerror(errno);
     return false;
   }
-  if (OthersMayChange(path)) {
-    error_ = "others may write it or its directory";
+  if (!openOwnDatabase(path, kBusyMs, database_, error_)) {
     return false;
   }
-  if (sqlite3_open_v2(path, &database_, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, nullptr) !=
-      SQLITE_OK) {
-    return Fail();
-  }
-  sqlite3_busy_timeout(database_, kBusyMs);
-  int keep = 1;  // else every process that comes and goes makes and removes the companion files
-  sqlite3_file_control(database_, "main", SQLITE_FCNTL_PERSIST_WAL, &keep);
   // Nor does each bring the log into the database, and onto the disk: those who write do.
   sqlite3_db_config(database_, SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
   int64_t version = 0;

@@ -10,9 +10,9 @@
 #include <memory>
 
 #include "platform/base/Secrets.h"
+#include "platform/base/module/OwnDatabase.h"
 #include "platform/base/module/SecretHash.h"
 #include "platform/tokens/module/TokenSchema.h"
-#include "webapi/base/OwnFile.h"
 #include "webapi/base/UniqueFd.h"
 
 namespace QELO::Platform {
@@ -97,17 +97,9 @@ bool TokenStore::Open(const char* path, bool create, FindUid findUid) {
     error_ = strerror(errno);
     return false;
   }
-  if (OthersMayChange(path)) {
-    error_ = "others may write it or its directory";
+  if (!openOwnDatabase(path, kBusyMs, database_, error_)) {
     return false;
   }
-  if (sqlite3_open_v2(path, &database_, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, nullptr) !=
-      SQLITE_OK) {
-    return Fail();
-  }
-  sqlite3_busy_timeout(database_, kBusyMs);
-  int keep = 1;  // else every process that comes and goes makes and removes the companion files
-  sqlite3_file_control(database_, "main", SQLITE_FCNTL_PERSIST_WAL, &keep);
   // What was logged ahead goes into the database when the last connection is closed, and the log is
   // emptied then: else each process would do it anew, which is three waits for the disk.
   return Execute("PRAGMA journal_size_limit=0") &&
