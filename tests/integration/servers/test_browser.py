@@ -54,10 +54,9 @@ data.append("file", new File([], "empty"));
 fetch(%(url)s, {method: "POST", body: data}).then((answer) => answer.text()).then(show);
 """
 FRAME = """
-let news = "loaded";
-window.onmessage = () => { news = "the page ran its script"; };
+window.onmessage = () => show("the page ran its script");
 const frame = document.createElement("iframe");
-frame.onload = () => setTimeout(() => show(news), 300);
+frame.onload = () => setTimeout(() => show("loaded"), %(patience)s);
 frame.src = %(url)s;
 document.body.append(frame);
 """
@@ -147,9 +146,11 @@ def test_Download_IsReadWholeAndInParts(browse, server, folder, sending):  # noq
 def test_UploadedPage_RunsNoScript(browse, server, folder, sending):  # noqa: F811
     downloads = Downloads(server.port, folder)
     file = downloads.put("page.html", b"<p>shown</p><script>parent.postMessage(1, '*')</script>")
-    assert browse(FRAME, url=downloads.url("file", path=file, name="page.html", inline=1)) == "loaded"
+    inline = downloads.url("file", path=file, name="page.html", inline=1)
+    assert browse(FRAME, url=inline, patience=1000) == "loaded"
     # The same page without the policy: what is tested above is the policy.
     own = server.directory / "www" / "own.html"
     own.write_bytes(file.read_bytes())
-    assert browse(FRAME, url=f"http://127.0.0.1:{server.port}/own.html") == "the page ran its script"
+    url = f"http://127.0.0.1:{server.port}/own.html"
+    assert browse(FRAME, url=url, patience=20_000) == "the page ran its script"
     own.unlink()

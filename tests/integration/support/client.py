@@ -1,6 +1,7 @@
 """Calls of the web API, as a client on another machine would make them."""
 
 import http.client
+import io
 import json
 import socket
 from urllib.parse import urlencode
@@ -40,6 +41,18 @@ class Answer:
     @property
     def refusal(self):
         return self.code, self.word
+
+
+def answer_in(received):
+    """The first HTTP answer in `received`, which may come in chunks."""
+
+    class Received:
+        def makefile(self, mode):
+            return io.BytesIO(received)
+
+    response = http.client.HTTPResponse(Received())
+    response.begin()
+    return Answer(response.status, response.headers, response.read())
 
 
 class Client:
