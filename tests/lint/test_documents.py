@@ -39,6 +39,15 @@ def test_Settings_StandInTheirTable():
     assert table_of("docs/platform.md", "Settings") == read
 
 
+@pytest.mark.parametrize("heading,keys", [("Members of an API", "kMembers"), ("Methods", "kAttributes")])
+def test_DescriptionKeys_StandInTheirTables(heading, keys):
+    text = (SOURCE / "webapi/runner/catalogue/DescriptionKeys.h").read_text()
+    listed = re.search(rf"{keys}\[\] = {{(.*?)}};", text, re.DOTALL).group(1)
+    names = set(re.findall(r'{"(\w+)",', listed))
+    assert len(names) > 10
+    assert table_of("docs/description.md", heading) == names
+
+
 def test_Modules_StandInTheirTable():
     text = (SOURCE / "platform/Modules.cmake").read_text()
     built = {f"{module}.so" for module in re.findall(r"^ *webapi_platform_module\((\w+)", text, re.M)}

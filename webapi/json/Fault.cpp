@@ -6,20 +6,25 @@
 
 namespace QELO::JsonHelper {
 
+Position positionAt(std::string_view text, size_t offset) {
+  Position position;
+  for (const char c : text.substr(0, offset)) {
+    if (c == '\n') {
+      ++position.line;
+      position.column = 1;
+    } else if ((static_cast<unsigned char>(c) & 0xC0U) != 0x80U) {
+      ++position.column;
+    }
+  }
+  return position;
+}
+
 bool findFault(std::string_view text, Position& fault) {
   const size_t offset = jsonTextFault(text, {.comments = true});
   if (offset == std::string_view::npos) {
     return false;
   }
-  fault = Position();
-  for (const char c : text.substr(0, offset)) {
-    if (c == '\n') {
-      ++fault.line;
-      fault.column = 1;
-    } else if ((static_cast<unsigned char>(c) & 0xC0U) != 0x80U) {
-      ++fault.column;
-    }
-  }
+  fault = positionAt(text, offset);
   return true;
 }
 

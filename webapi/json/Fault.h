@@ -12,6 +12,9 @@ struct Position {
   size_t column = 1;
 };
 
+/// The place of a text's byte with this number, counted from 0; that of the end beyond it.
+Position positionAt(std::string_view text, size_t offset);
+
 /// Finds the place from which on a text that is read from a file stops being JSON.
 /// @return false when it is JSON as a whole
 bool findFault(std::string_view text, Position& fault);

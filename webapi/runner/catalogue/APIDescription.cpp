@@ -3,11 +3,13 @@
 #include <algorithm>
 
 #include "webapi/JsonHelper.h"
+#include "webapi/runner/catalogue/DescriptionKeys.h"
 
 namespace QELO {
 namespace {
 
-constexpr int kMaxPriority = 10;
+using DescriptionKeys::kMaxPriority;
+
 constexpr char kDefaultRunAs[] = "system";
 
 }  // namespace

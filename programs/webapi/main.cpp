@@ -1,0 +1,50 @@
+// For authors of API libraries and administrators: checks descriptions, and what goes with them.
+
+#include <cstdio>
+#include <string_view>
+
+#include "programs/webapi/Arguments.h"
+#include "programs/webapi/check/Check.h"
+
+using namespace QELO::AuthorProgram;
+
+namespace {
+
+constexpr char kHelp[] =
+    "webapi COMMAND [ARGUMENT...]\n"
+    "    check   checks descriptions of APIs, and that their libraries have what they list\n"
+    "webapi COMMAND --help\n"
+    "    tells more of a command.\n";
+
+struct Command {
+  std::string_view name;
+  ExitCode (*run)(const Arguments& arguments);
+};
+
+constexpr Command kCommands[] = {{"check", Check}};
+
+ExitCode run(const Arguments& words) {
+  if (words.empty()) {
+    fprintf(stderr, "webapi: a command is missing; see webapi --help\n");
+    return kWrongUse;
+  }
+  if (words[0] == "--help" || words[0] == "-h" || words[0] == "help") {
+    fputs(kHelp, stdout);
+    return kDone;
+  }
+  for (const Command& command : kCommands) {
+    if (command.name == words[0]) {
+      return command.run({words.begin() + 1, words.end()});
+    }
+  }
+  fprintf(stderr, "webapi: there is no command %s; see webapi --help\n", Shown(words[0]).c_str());
+  return kWrongUse;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  const ExitCode code = run({argv + (argc > 0 ? 1 : 0), argv + argc});
+  // What cannot be printed, as on a full disk, is no success.
+  return fflush(stdout) == 0 && ferror(stdout) == 0 ? code : kFailed;
+}
