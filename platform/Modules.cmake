@@ -74,11 +74,16 @@ webapi_platform_module(sharing
           base/module/SecretHash.cpp base/module/OwnDatabase.cpp
   LIBRARIES JsonCpp::JsonCpp SQLite::SQLite3 ${MD_LIBRARY})
 
+# Checks parameters: on its own, since few calls need it.
+file(GLOB schema_sources CONFIGURE_DEPENDS RELATIVE ${PROJECT_SOURCE_DIR}/platform
+     ${PROJECT_SOURCE_DIR}/platform/schema/module/*.cpp)
+webapi_platform_module(schema SOURCES ${schema_sources} LIBRARIES webapi_base_static)
+
 # Sharing links have passwords of their own; those of accounts are PAM's on the host.
 set(password_modules module_password_crypt)
 if(NOT WEBAPI_ROOT_PREFIX)
   list(APPEND password_modules module_password_pam)
 endif()
 install(TARGETS ${password_modules} module_tokens module_tasks module_relay module_ciphers
-        module_sharing
+        module_sharing module_schema
         LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR}/webapi/modules)

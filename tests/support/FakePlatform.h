@@ -107,5 +107,7 @@ struct FakePlatform {
   int fileOutput = 0;      ///< result of each output
   bool fastOutput = true;  ///< the switch
 
+  bool readsSchemas = true;  ///< the host has a reader of schemas
+
   FakeUpload upload;
 };
