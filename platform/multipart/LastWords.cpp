@@ -2,10 +2,12 @@
 
 #include <unistd.h>
 
+#include <array>
 #include <atomic>
 #include <csignal>
 #include <cstring>
 #include <initializer_list>
+#include <new>
 
 #include "platform/multipart/Limits.h"
 
@@ -21,12 +23,17 @@ struct Entry {
   char name[kLongestName];
 };
 
-Entry entries[UploadLimits::kFiles];
-std::atomic<pid_t> maker;  ///< forked children have the table too, and leave the files alone
+using Table = std::array<Entry, UploadLimits::kFiles>;
+
+/// Made by the first file and kept until the process ends. As an object of the library its pages
+/// would be a cost of every call.
+constinit std::atomic<Table*> table{nullptr};
+/// Forked children have the table too, and leave the files alone.
+constinit std::atomic<pid_t> maker{0};
 
 void end(int signal) {
-  if (getpid() == maker.load()) {
-    for (const Entry& entry : entries) {
+  if (const Table* entries = table.load(); entries != nullptr && getpid() == maker.load()) {
+    for (const Entry& entry : *entries) {
       if (entry.isUsed.load()) {
         unlinkat(entry.directory, entry.name, 0);
       }
@@ -53,13 +60,19 @@ void watch() {
 }  // namespace
 
 void Add(int directory, const std::string& name) {
+  if (table.load() == nullptr) {
+    table = new (std::nothrow) Table{};
+  }
+  if (table.load() == nullptr) {
+    return;
+  }
   if (maker.exchange(getpid()) != getpid()) {
-    for (Entry& entry : entries) {
+    for (Entry& entry : *table) {
       entry.isUsed = false;
     }
     watch();
   }
-  for (Entry& entry : entries) {
+  for (Entry& entry : *table) {
     if (!entry.isUsed.load() && name.size() < kLongestName) {
       entry.directory = directory;
       memcpy(entry.name, name.c_str(), name.size() + 1);
@@ -70,7 +83,10 @@ void Add(int directory, const std::string& name) {
 }
 
 void Remove(int directory, const std::string& name) {
-  for (Entry& entry : entries) {
+  if (table.load() == nullptr) {
+    return;
+  }
+  for (Entry& entry : *table) {
     if (entry.isUsed.load() && entry.directory == directory && name == entry.name) {
       entry.isUsed = false;
       return;
