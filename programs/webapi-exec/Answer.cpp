@@ -10,6 +10,7 @@
 
 #include "programs/webapi-exec/Accounts.h"
 #include "programs/webapi-exec/Call.h"
+#include "programs/webapi-exec/Program.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIErrorText.h"
 
@@ -91,7 +92,7 @@ std::string outcome(const Json::Value& result, const Json::Value& call, const Op
 }
 
 ExitCode sayError(const std::string& meaning) {
-  fprintf(stderr, "webapi-exec: %s\n", meaning.c_str());
+  fprintf(stderr, "%s: %s\n", programName, meaning.c_str());
   return kFailed;
 }
 
@@ -150,7 +151,7 @@ ExitCode showTable(const Options& options, const Json::Value& answer) {
   if (failed == 0) {
     return kDone;
   }
-  fprintf(stderr, "webapi-exec: %zu of %zu calls failed\n", failed, rows.size() - 1);
+  fprintf(stderr, "%s: %zu of %zu calls failed\n", programName, failed, rows.size() - 1);
   return kFailed;
 }
 

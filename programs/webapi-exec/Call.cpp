@@ -8,6 +8,7 @@
 #include <cstring>
 
 #include "programs/webapi-exec/Accounts.h"
+#include "programs/webapi-exec/Program.h"
 #include "programs/webapi-exec/transfer/OutputFile.h"
 #include "programs/webapi-exec/transfer/TransferCall.h"
 #include "programs/webapi-exec/transfer/UploadBody.h"
@@ -109,7 +110,7 @@ std::string makeCall(const Options& options, Json::Value& answer) {
   const int lost = output.Finish(isWhole);
   error = error != 0 ? error : lost;
   if (!output.Left().empty()) {
-    fprintf(stderr, "webapi-exec: %s\n", output.Left().c_str());
+    fprintf(stderr, "%s: %s\n", programName, output.Left().c_str());
   }
   if (error != 0) {
     return options.output + ": " + strerror(error);

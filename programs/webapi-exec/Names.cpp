@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "programs/webapi-exec/Program.h"
 #include "webapi/APIDescription.h"
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
@@ -39,7 +40,7 @@ bool checkVersion(const Options& options, const APIDescription& description) {
   if (options.version == 0) {
     return true;
   }
-  fprintf(stderr, "webapi-exec: no such version: %s has %s\n", options.api.c_str(),
+  fprintf(stderr, "%s: no such version: %s has %s\n", programName, options.api.c_str(),
           known.empty() ? "none" : known.c_str());
   return false;
 }
@@ -50,7 +51,7 @@ ExitCode listNames(const Options& options) {
   APIRunner runner;
   Json::Value catalogue(Json::objectValue);
   if (chdir(Paths::kDescriptionDir) != 0 || !runner.InitLibDesc(catalogue)) {
-    fprintf(stderr, "webapi-exec: there are no APIs in %s\n", Paths::kDescriptionDir);
+    fprintf(stderr, "%s: there are no APIs in %s\n", programName, Paths::kDescriptionDir);
     return kFailed;
   }
   std::set<std::string> names;
@@ -59,7 +60,7 @@ ExitCode listNames(const Options& options) {
       names.insert(it.name());
     }
   } else if (!JsonHelper::hasMember(catalogue, options.api)) {
-    fprintf(stderr, "webapi-exec: there is no API %s\n", options.api.c_str());
+    fprintf(stderr, "%s: there is no API %s\n", programName, options.api.c_str());
     return kFailed;
   } else if (!checkVersion(options, APIDescription(catalogue[options.api]))) {
     return kFailed;

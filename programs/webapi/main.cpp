@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <string_view>
 
+#include "programs/webapi-exec/Program.h"
 #include "programs/webapi/Arguments.h"
 #include "programs/webapi/check/Check.h"
 
@@ -12,6 +13,7 @@ namespace {
 
 constexpr char kHelp[] =
     "webapi COMMAND [ARGUMENT...]\n"
+    "    call    calls an API of this host; webapi-exec is another name of it\n"
     "    check   checks descriptions of APIs, and that their libraries have what they list\n"
     "webapi COMMAND --help\n"
     "    tells more of a command.\n";
@@ -21,7 +23,17 @@ struct Command {
   ExitCode (*run)(const Arguments& arguments);
 };
 
-constexpr Command kCommands[] = {{"check", Check}};
+constexpr Command kCommands[] = {
+    {"check", Check},
+};
+
+/// webapi call: the words as they are, since it has options of its own.
+int call(int argc, char** argv) {
+  char name[] = "webapi call";
+  argv[0] = name;
+  QELO::ExecProgram::programName = name;
+  return QELO::ExecProgram::run(argc, argv);
+}
 
 ExitCode run(const Arguments& words) {
   if (words.empty()) {
@@ -44,6 +56,9 @@ ExitCode run(const Arguments& words) {
 }  // namespace
 
 int main(int argc, char** argv) {
+  if (argc > 1 && std::string_view(argv[1]) == "call") {
+    return call(argc - 1, argv + 1);
+  }
   const ExitCode code = run({argv + (argc > 0 ? 1 : 0), argv + argc});
   // What cannot be printed, as on a full disk, is no success.
   return fflush(stdout) == 0 && ferror(stdout) == 0 ? code : kFailed;

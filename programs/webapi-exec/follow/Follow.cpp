@@ -4,6 +4,7 @@
 
 #include "programs/webapi-exec/Answer.h"
 #include "programs/webapi-exec/Call.h"
+#include "programs/webapi-exec/Program.h"
 #include "programs/webapi-exec/follow/EndSignals.h"
 #include "programs/webapi-exec/follow/Follower.h"
 #include "webapi/JsonHelper.h"
@@ -19,7 +20,7 @@ ExitCode start(const Options& options, std::string& id) {
   Json::Value answer;
   const std::string wrong = makeCall(options, answer);
   if (!wrong.empty()) {
-    fprintf(stderr, "webapi-exec: %s\n", wrong.c_str());
+    fprintf(stderr, "%s: %s\n", programName, wrong.c_str());
   }
   if (answer.isNull()) {
     return kFailed;
@@ -29,7 +30,8 @@ ExitCode start(const Options& options, std::string& id) {
     return kDone;
   }
   if (showAnswer(options, answer) == kDone) {
-    fprintf(stderr, "webapi-exec: --follow needs a method that starts a task; this one did not\n");
+    fprintf(stderr, "%s: --follow needs a method that starts a task; this one did not\n",
+            programName);
   }
   return kFailed;
 }
@@ -40,7 +42,7 @@ ExitCode follow(const Options& options) {
   std::string user;
   const std::string wrong = findUser(options, user);
   if (!wrong.empty()) {
-    fprintf(stderr, "webapi-exec: %s\n", wrong.c_str());
+    fprintf(stderr, "%s: %s\n", programName, wrong.c_str());
     return kFailed;
   }
   std::string id = options.task;

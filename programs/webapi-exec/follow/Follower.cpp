@@ -8,6 +8,7 @@
 #include <cstring>
 
 #include "programs/webapi-exec/Answer.h"
+#include "programs/webapi-exec/Program.h"
 #include "programs/webapi-exec/Text.h"
 #include "programs/webapi-exec/follow/EndSignals.h"
 #include "webapi/JsonHelper.h"
@@ -53,7 +54,7 @@ Follower::Follower(const std::string& user, const std::string& id, bool isUserGi
 
 ExitCode Follower::Run() {
   if (const int error = task_.Look(status_); error != 0) {
-    fprintf(stderr, "webapi-exec: %s: error %d: %s\n", harmless(task_.Id()).c_str(), error,
+    fprintf(stderr, "%s: %s: error %d: %s\n", programName, harmless(task_.Id()).c_str(), error,
             taskErrorText(error));
     return kFailed;
   }
@@ -75,7 +76,7 @@ ExitCode Follower::Run() {
     case News::kLost:
       break;
   }
-  fprintf(stderr, "webapi-exec: the task cannot be watched any longer\n");
+  fprintf(stderr, "%s: the task cannot be watched any longer\n", programName);
   return Leave(kFailed);
 }
 
@@ -149,7 +150,7 @@ void Follower::StopTask() {
   const int error = task_.Stop();
   isStopped_ = error == 0;
   if (error != 0) {
-    fprintf(stderr, "webapi-exec: error %d: %s\n", error, taskErrorText(error));
+    fprintf(stderr, "%s: error %d: %s\n", programName, error, taskErrorText(error));
   }
 }
 
@@ -168,13 +169,13 @@ ExitCode Follower::End() {
     code = showAnswer(body);
   } else {
     printAnswer(body);
-    fprintf(stderr, isStopped_ ? "webapi-exec: the task was stopped\n"
-                               : "webapi-exec: the task was stopped before all was done\n");
+    fprintf(stderr, "%s: the task was stopped%s\n", programName,
+            isStopped_ ? "" : " before all was done");
   }
   const std::string reason =
       JsonHelper::asString(member(member(member(body, "error"), "errors"), "reason"));
   if (code != kDone && !reason.empty()) {
-    fprintf(stderr, "webapi-exec: %s\n", harmless(reason).c_str());
+    fprintf(stderr, "%s: %s\n", programName, harmless(reason).c_str());
   }
   if (fflush(stdout) == 0) {
     task_.Release();
@@ -186,8 +187,8 @@ ExitCode Follower::EndGone() {
   prompt_.Cancel();
   screen_.EndLine();
   printAnswer(bodyOf(status_));
-  fprintf(stderr,
-          "webapi-exec: the task's record was removed; this is the last that was seen of it\n");
+  fprintf(stderr, "%s: the task's record was removed; this is the last that was seen of it\n",
+          programName);
   return kFailed;
 }
 
@@ -195,7 +196,7 @@ ExitCode Follower::Leave(ExitCode code) {
   task_.Release();
   prompt_.Cancel();
   screen_.EndLine();
-  fprintf(stderr, "The task goes on. To follow it again:\n  webapi-exec --follow --task %s%s\n",
+  fprintf(stderr, "The task goes on. To follow it again:\n  %s --follow --task %s%s\n", programName,
           quoted(harmless(task_.Id())).c_str(), userOption_.c_str());
   return code;
 }
