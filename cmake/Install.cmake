@@ -47,6 +47,7 @@ configure_package_config_file(cmake/webapiConfig.cmake.in ${CMAKE_BINARY_DIR}/we
 write_basic_package_version_file(${CMAKE_BINARY_DIR}/webapiConfigVersion.cmake
                                  COMPATIBILITY SameMinorVersion)
 install(FILES ${CMAKE_BINARY_DIR}/webapiConfig.cmake ${CMAKE_BINARY_DIR}/webapiConfigVersion.cmake
+              cmake/webapiAddApi.cmake
         DESTINATION ${webapi_package_dir})
 file(RELATIVE_PATH webapi_prefix_from_pc ${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig
      ${CMAKE_INSTALL_PREFIX})

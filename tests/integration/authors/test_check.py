@@ -8,7 +8,7 @@ import shutil
 import pytest
 
 from author_program import webapi
-from conftest import BUILD, DESCRIPTIONS, PLUGINS, needs_root
+from conftest import BUILD, PLUGINS, needs_root
 
 GOOD = """{
   "QELO.Test.Good": {

@@ -6,12 +6,12 @@ import json
 import os
 import re
 import subprocess
-import textwrap
 
 import pytest
 
 from conftest import BUILD, SOURCE, answer_of, needs_root
 from documents import broken_links
+from installed import OVERLAYS, prefix, run, stage, step  # noqa: F401 (fixtures)
 from webserver import free_port
 
 PLUGINS = SOURCE / "tests" / "plugins"
@@ -32,43 +32,6 @@ target_link_options(outside PRIVATE -Wl,--no-undefined)
 
 GUIDE = (SOURCE / "docs" / "installing.md").read_text()
 PROJECT_GUIDE = (SOURCE / "docs" / "api-library.md").read_text()
-# Nothing that the guide does reaches the host: each directory is laid over with an empty one.
-OVERLAYS = """
-set -e
-mount -t tmpfs none {work}
-for name in usr etc var run; do
-  mkdir {work}/$name.upper {work}/$name.work
-  mount -t overlay overlay /$name \\
-    -o lowerdir=/$name,upperdir={work}/$name.upper,workdir={work}/$name.work
-done
-"""
-
-
-def run(*command, **options):
-    result = subprocess.run(
-        [str(word) for word in command], capture_output=True, text=True, check=False, **options
-    )
-    assert result.returncode == 0, result.stdout[-4000:] + result.stderr[-4000:]
-    return result.stdout
-
-
-@pytest.fixture(scope="module")
-def stage(tmp_path_factory):
-    """A build for the host itself, installed below a directory that stands for its root."""
-    build = BUILD / "host"
-    run("cmake", "-S", SOURCE, "-B", build, "-DCMAKE_BUILD_TYPE=Debug",
-        "-DCMAKE_INSTALL_PREFIX=/usr/local")
-    run("cmake", "--build", build, "-j", os.cpu_count())
-    stage = tmp_path_factory.mktemp("stage")
-    run("cmake", "--install", build, env={**os.environ, "DESTDIR": str(stage)})
-    return stage
-
-
-@pytest.fixture(scope="module")
-def prefix(stage):
-    return stage / "usr" / "local"
-
-
 @pytest.fixture
 def outside(tmp_path):
     """A directory with an API library's source."""
@@ -262,19 +225,14 @@ def test_InstalledEntry_ServesAnApiLibraryBuiltOutside(stage, prefix, outside):
     assert answer_of(result.stdout)["data"]["x"] == 5
 
 
-def step(name, guide=GUIDE):
-    found = re.search(rf"<!-- test: {name} -->\n *```\w*\n(.*?)```", guide, re.DOTALL)
-    return textwrap.dedent(found[1]).replace("build/host", str(BUILD / "host"))
-
-
 @pytest.fixture
 def project(tmp_path):
     """The guide's project of an API library outside of this tree."""
     directory = tmp_path / "visits"
     directory.mkdir()
-    (directory / "CMakeLists.txt").write_text(step("project", PROJECT_GUIDE))
-    (directory / "QELO.Example.Visits.lib.in").write_text(step("description", PROJECT_GUIDE))
-    (directory / "Visits.cpp").write_text(step("library", PROJECT_GUIDE))
+    (directory / "CMakeLists.txt").write_text(step(PROJECT_GUIDE, "project"))
+    (directory / "QELO.Example.Visits.lib.in").write_text(step(PROJECT_GUIDE, "description"))
+    (directory / "Visits.cpp").write_text(step(PROJECT_GUIDE, "library"))
     return directory
 
 
@@ -292,14 +250,14 @@ def test_Guides_EndWithALogin_AndCallsOfAnApiOfOnesOwn(stage, tmp_path, project)
     if subprocess.run(["unshare", "-m", "sh", "-c", overlays], capture_output=True).returncode != 0:
         pytest.skip("files cannot be laid over the host's here: no overlay mount")
     port = free_port()
-    configuration = step("lighttpd").replace("server.port = 80", f"server.port = {port}")
+    configuration = step(GUIDE, "lighttpd").replace("server.port = 80", f"server.port = {port}")
     script = "\n".join([
         overlays,
         "{",
         "{ userdel -f tina; userdel -f system; groupdel administrators; } 2> /dev/null || true",
         "useradd --create-home --home-dir /var/tina tina && echo 'tina:one 2 three' | chpasswd",
-        step("accounts"), step("install"), step("pam"), step("rights"),
-        f"cd {project}", step("build", PROJECT_GUIDE),
+        step(GUIDE, "accounts"), step(GUIDE, "install"), step(GUIDE, "pam"), step(GUIDE, "rights"),
+        f"cd {project}", step(PROJECT_GUIDE, "build"),
         "mkdir -p /var/www/html /var/log/lighttpd /var/cache/lighttpd/uploads",
         "chown -R www-data: /var/log/lighttpd /var/cache/lighttpd",
         f"cat > /etc/lighttpd/lighttpd.conf << 'END'\n{configuration}END",
@@ -308,9 +266,9 @@ def test_Guides_EndWithALogin_AndCallsOfAnApiOfOnesOwn(stage, tmp_path, project)
         "trap 'kill $server' EXIT",
         f"for i in $(seq 100); do (: > /dev/tcp/127.0.0.1/{port}) 2> /dev/null && break",
         "  sleep 0.05; done",
-        as_tina(step("call"), port),
-        as_tina(step("call", PROJECT_GUIDE), port),
-        as_tina(step("call", PROJECT_GUIDE), port),
+        as_tina(step(GUIDE, "call"), port),
+        as_tina(step(PROJECT_GUIDE, "call"), port),
+        as_tina(step(PROJECT_GUIDE, "call"), port),
         "stat -c '%U %a' /var/tina/.webapi /var/tina/.webapi/visits.json",
     ])
     lines = run("unshare", "-m", "bash", "-c", script, cwd=SOURCE).splitlines()
