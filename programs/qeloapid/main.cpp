@@ -16,6 +16,7 @@
 #include "programs/server/Server.h"
 #include "programs/server/ServiceManager.h"
 #include "programs/server/Surroundings.h"
+#include "programs/server/metrics/Metrics.h"
 #include "webapi/platform/Paths.h"
 
 namespace {
@@ -55,7 +56,8 @@ int main(int argc, char** argv) {
   }
   setenv("in_qeloapid", "1", 1);
   QELO::DaemonService service(argc, argv);
-  QELO::Server server(service, limits);
+  QELO::Metrics metrics;
+  QELO::Server server(service, limits, metrics);
   if (!server.Open()) {
     perror("qeloapid");
     return 1;

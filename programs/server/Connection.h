@@ -16,7 +16,10 @@ struct Connection {
   std::string listener;  ///< the path of the socket that it came by; "" for another kind
   std::string header;    ///< what has come of the request's front
   size_t wanted = 0;     ///< bytes that the header has, once that is known; 0: not yet
+  std::string answer;    ///< what the server itself says, when nothing has to be started for it
+  bool isQuiet = false;  ///< told nothing when it is refused, and not counted
   ServerClock::time_point accepted;
+  ServerClock::time_point arrived;   ///< its header was whole
   ServerClock::time_point deadline;  ///< of what is waited for at present
 };
 

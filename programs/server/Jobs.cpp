@@ -2,6 +2,7 @@
 
 #include <signal.h>
 #include <sys/mman.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 
@@ -38,6 +39,10 @@ bool isKeptFromClient(pid_t pid, int socket) {
   return !error && isHeld && !isOutput;
 }
 
+std::chrono::microseconds lengthOf(const timeval& time) {
+  return std::chrono::seconds(time.tv_sec) + std::chrono::microseconds(time.tv_usec);
+}
+
 }  // namespace
 
 void Jobs::NoteEnd::operator()(Note* note) const {
@@ -57,11 +62,13 @@ void Jobs::Add(Job job) {
 }
 
 std::optional<Jobs::Job> Jobs::TakeEnded(int& status) {
-  for (pid_t pid; (pid = waitpid(-1, &status, WNOHANG)) > 0;) {
+  rusage usage{};
+  for (pid_t pid; (pid = wait4(-1, &status, WNOHANG, &usage)) > 0;) {
     const auto found = jobs_.find(pid);
     if (found != jobs_.end()) {
       Job job = std::move(found->second);
       jobs_.erase(found);
+      job.processor = lengthOf(usage.ru_utime) + lengthOf(usage.ru_stime);
       return job;
     }
   }

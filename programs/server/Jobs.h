@@ -28,6 +28,7 @@ class Jobs {
     ServerClock::time_point deadline;
     bool isKilled = false;
     bool isSilent = false;  ///< it was killed before it had said anything to the client
+    std::chrono::microseconds processor{};  ///< that it took, once it has ended
   };
 
   /// A blank note, which the next process that is forked shares; null without memory.

@@ -1,9 +1,9 @@
 #include "programs/server/Server.h"
 
 #include <poll.h>
-#include <sys/epoll.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
+#include <sys/wait.h>
 #include <syslog.h>
 #include <unistd.h>
 
@@ -19,15 +19,16 @@
 namespace QELO {
 namespace {
 
+using std::chrono::duration_cast;
+using std::chrono::microseconds;
+
 constexpr char kSource[] = "Server.cpp";
 constexpr rlim_t kOtherFiles = 128;  ///< descriptors that the server has beside its connections
-constexpr int kEventsAtOnce = 64;
 constexpr int kAcceptedAtOnce = 64;  ///< of one listener before the others have their turn
 constexpr int kShortageMilliseconds = 10;
 constexpr std::chrono::milliseconds kSweepPause{100};
-constexpr std::chrono::seconds kLeavingLimit{2};  ///< for who was refused to take that in
+constexpr size_t kReaders = 16;  ///< that ask for the figures at once; no request's room
 constexpr std::chrono::seconds kRefusalPause{5};  ///< between two log lines on refusals
-constexpr size_t kDropped = 65536;                ///< bytes that are dropped by one read
 
 bool isGone(int descriptor) {
   pollfd state{descriptor, 0, 0};
@@ -36,28 +37,19 @@ bool isGone(int descriptor) {
 
 }  // namespace
 
-Server::Server(Service& service, const ServerLimits& limits) : service_(service), limits_(limits) {}
+Server::Server(Service& service, const ServerLimits& limits, Metrics& metrics)
+    : service_(service), limits_(limits), metrics_(metrics), departures_(events_, limits.arriving) {
+  metrics_.limits = limits;
+  metrics_.startedAt = std::time(nullptr);
+}
 
 bool Server::Open() {
   RaiseFileLimit(kOtherFiles + limits_.atOnce + limits_.queued + 2 * limits_.arriving);
-  events_ = UniqueFd(epoll_create1(EPOLL_CLOEXEC));
-  return events_ && signals_.Open() && Watch(signals_.Descriptor());
-}
-
-bool Server::Watch(int descriptor) {
-  epoll_event event{};
-  event.events = EPOLLIN;
-  event.data.fd = descriptor;
-  return epoll_ctl(events_.Get(), EPOLL_CTL_ADD, descriptor, &event) == 0;
-}
-
-/// Always before it is closed: a child may have it open, and then the kernel goes on to report it.
-void Server::Unwatch(int descriptor) {
-  epoll_ctl(events_.Get(), EPOLL_CTL_DEL, descriptor, nullptr);
+  return events_.Open() && signals_.Open() && events_.Watch(signals_.Descriptor());
 }
 
 bool Server::Listen(Listener listener) {
-  if (!Watch(listener.Descriptor())) {
+  if (!events_.Watch(listener.Descriptor())) {
     return false;
   }
   listeners_.push_back(std::move(listener));
@@ -67,7 +59,7 @@ bool Server::Listen(Listener listener) {
 void Server::StopListening(const std::string& path) {
   for (auto it = listeners_.begin(); it != listeners_.end();) {
     if (it->IsOurs() && it->Path() == path) {
-      Unwatch(it->Descriptor());
+      events_.Unwatch(it->Descriptor());
       it = listeners_.erase(it);
     } else {
       ++it;
@@ -84,16 +76,14 @@ std::vector<std::string> Server::Paths() const {
 }
 
 bool Server::IsIdle() const {
-  return arriving_.empty() && leaving_.empty() && waiting_.empty() && jobs_.Count() == 0;
+  return arriving_.empty() && departures_.IsEmpty() && waiting_.empty() && jobs_.Count() == 0;
 }
 
 void Server::Run() {
-  epoll_event events[kEventsAtOnce];
   while (!isStopping_ || !IsIdle()) {
-    const int pause = IsIdle() && refused_ == 0 ? -1 : static_cast<int>(kSweepPause.count());
-    const int count = epoll_wait(events_.Get(), events, kEventsAtOnce, pause);
-    for (int i = 0; i < count; ++i) {
-      Hear(events[i].data.fd);
+    const bool isQuiet = IsIdle() && refused_ == 0;
+    for (const int descriptor : events_.Wait(isQuiet ? Events::kWithoutEnd : kSweepPause)) {
+      Hear(descriptor);
     }
     Sweep();
   }
@@ -104,22 +94,11 @@ void Server::Hear(int descriptor) {
     HandleSignals();
     return;
   }
-  const auto arriving = arriving_.find(descriptor);
-  if (arriving != arriving_.end()) {
-    Unwatch(descriptor);
-    Held connection = std::move(arriving->second);
-    arriving_.erase(arriving);
+  if (Held connection = TakeArriving(descriptor)) {
     Arrive(std::move(connection));
     return;
   }
-  const auto leaving = leaving_.find(descriptor);
-  if (leaving != leaving_.end()) {
-    char dropped[kDropped];
-    const ssize_t count = recv(descriptor, dropped, sizeof dropped, MSG_DONTWAIT);
-    if (count == 0 || (count < 0 && errno != EAGAIN && errno != EINTR)) {
-      Unwatch(descriptor);
-      leaving_.erase(leaving);
-    }
+  if (departures_.Hear(descriptor)) {
     return;
   }
   for (const Listener& listener : listeners_) {
@@ -151,7 +130,7 @@ void Server::Stop() {
   isStopping_ = true;
   ServiceManager::Tell("STOPPING=1");
   for (const Listener& listener : listeners_) {
-    Unwatch(listener.Descriptor());
+    events_.Unwatch(listener.Descriptor());
   }
   // What has connected already was promised an answer.
   for (const Listener& listener : listeners_) {
@@ -178,15 +157,26 @@ bool Server::Accept(const Listener& listener) {
     connection->deadline = connection->accepted + limits_.arrival;
     if (service_.Admits(*connection)) {
       Arrive(std::move(connection));
+    } else {
+      ++metrics_.denied;
     }
   }
   return true;
 }
 
 void Server::Arrive(Held connection) {
+  metrics_.runningNow = jobs_.Count();
+  metrics_.waitingNow = waiting_.size();
+  metrics_.arrivingNow = arriving_.size() - readers_;
   switch (service_.Take(*connection)) {
     case Service::Arrival::kWhole:
+      connection->arrived = ServerClock::now();
+      metrics_.arriving.Add(
+          duration_cast<microseconds>(connection->arrived - connection->accepted));
       Enqueue(std::move(connection));
+      return;
+    case Service::Arrival::kAnswered:
+      departures_.Tell(std::move(connection));
       return;
     case Service::Arrival::kMalformed:
       Refuse(std::move(connection), Service::Refusal::kMalformed);
@@ -198,11 +188,27 @@ void Server::Arrive(Held connection) {
       break;
   }
   const int descriptor = connection->socket.Get();
-  if (arriving_.size() >= limits_.arriving || !Watch(descriptor)) {
+  const bool isFull =
+      connection->isQuiet ? readers_ >= kReaders : arriving_.size() - readers_ >= limits_.arriving;
+  if (isFull || !events_.Watch(descriptor)) {
     Refuse(std::move(connection), Service::Refusal::kBusy);
     return;
   }
+  readers_ += connection->isQuiet ? 1 : 0;
   arriving_[descriptor] = std::move(connection);
+}
+
+/// @return null when nothing arrives by it
+Server::Held Server::TakeArriving(int descriptor) {
+  const auto found = arriving_.find(descriptor);
+  if (found == arriving_.end()) {
+    return nullptr;
+  }
+  events_.Unwatch(descriptor);
+  Held connection = std::move(found->second);
+  readers_ -= connection->isQuiet ? 1 : 0;
+  arriving_.erase(found);
+  return connection;
 }
 
 void Server::Enqueue(Held connection) {
@@ -230,6 +236,7 @@ bool Server::DropGone() {
         present.push_back(std::move(waiting_[i]));
       }
     }
+    metrics_.gone += waiting_.size() - present.size();
     waiting_.swap(present);
   }
   return waiting_.size() < limits_.queued;
@@ -239,7 +246,9 @@ void Server::StartWaiting() {
   while (!waiting_.empty() && jobs_.Count() < limits_.atOnce) {
     Held connection = std::move(waiting_.front());
     waiting_.pop_front();
-    if (!isGone(connection->socket.Get())) {
+    if (isGone(connection->socket.Get())) {
+      ++metrics_.gone;
+    } else {
       Start(std::move(connection));
     }
   }
@@ -249,6 +258,7 @@ void Server::Start(Held connection) {
   Jobs::Job job;
   job.note = Jobs::MakeNote();
   std::fflush(nullptr);
+  const ServerClock::time_point begin = ServerClock::now();
   job.pid = job.note == nullptr ? -1 : fork();
   if (job.pid < 0) {
     WEBAPI_LOG(kSource, "cannot start a process [%m]");
@@ -259,6 +269,8 @@ void Server::Start(Held connection) {
     RunChild(std::move(connection), *job.note);
   }
   job.started = ServerClock::now();
+  metrics_.waiting.Add(duration_cast<microseconds>(begin - connection->arrived));
+  metrics_.forking.Add(duration_cast<microseconds>(job.started - begin));
   job.deadline = job.started + limits_.request;
   job.connection = std::move(connection);
   job.connection->header = std::string();
@@ -275,12 +287,14 @@ void Server::RunChild(Held connection, Note& note) {
 }
 
 void Server::EndJob(Jobs::Job job, int status) {
-  using std::chrono::duration_cast;
-  using std::chrono::microseconds;
   const int descriptor = job.connection->socket.Get();
-  service_.Ended(*job.note, {job.pid, status, job.isKilled,
-                             duration_cast<microseconds>(job.started - job.connection->accepted),
-                             duration_cast<microseconds>(ServerClock::now() - job.started)});
+  const auto lasted = duration_cast<microseconds>(ServerClock::now() - job.started);
+  ++(job.isKilled ? metrics_.killed : WIFSIGNALED(status) ? metrics_.crashed : metrics_.served);
+  metrics_.serving.Add(lasted);
+  metrics_.processor += job.processor;
+  service_.Ended(*job.note,
+                 {job.pid, status, job.isKilled,
+                  duration_cast<microseconds>(job.started - job.connection->accepted), lasted});
   if (job.isSilent) {
     Refuse(std::move(job.connection), Service::Refusal::kTimedOut);
     return;
@@ -289,16 +303,13 @@ void Server::EndJob(Jobs::Job job, int status) {
 }
 
 void Server::Refuse(Held connection, Service::Refusal reason) {
-  ++refused_;
-  const int descriptor = connection->socket.Get();
-  const std::string text = service_.Refuse(reason);
-  send(descriptor, text.data(), text.size(), MSG_DONTWAIT | MSG_NOSIGNAL);
-  shutdown(descriptor, SHUT_WR);
-  // Closed with something unread, the other side might lose what it was told.
-  if (!text.empty() && leaving_.size() < limits_.arriving && Watch(descriptor)) {
-    connection->deadline = ServerClock::now() + kLeavingLimit;
-    leaving_[descriptor] = std::move(connection);
+  if (connection->isQuiet) {
+    return;
   }
+  ++refused_;
+  metrics_.CountRefusal(reason);
+  connection->answer = service_.Refuse(reason);
+  departures_.Tell(std::move(connection));
 }
 
 /// What is waited for in vain.
@@ -309,24 +320,16 @@ void Server::Sweep() {
   }
   nextSweep_ = now + kSweepPause;
   jobs_.KillOverdue(now);
-  for (auto it = arriving_.begin(); it != arriving_.end();) {
-    Held connection = it->second->deadline <= now ? std::move(it->second) : nullptr;
-    if (connection == nullptr) {
-      ++it;
-      continue;
+  std::vector<int> slow;
+  for (const auto& [descriptor, connection] : arriving_) {
+    if (connection->deadline <= now) {
+      slow.push_back(descriptor);
     }
-    it = arriving_.erase(it);
-    Unwatch(connection->socket.Get());
-    Refuse(std::move(connection), Service::Refusal::kSlow);
   }
-  for (auto it = leaving_.begin(); it != leaving_.end();) {
-    if (it->second->deadline > now) {
-      ++it;
-      continue;
-    }
-    Unwatch(it->first);
-    it = leaving_.erase(it);
+  for (const int descriptor : slow) {
+    Refuse(TakeArriving(descriptor), Service::Refusal::kSlow);
   }
+  departures_.Sweep(now);
   while (!waiting_.empty() && waiting_.front()->deadline <= now) {  // the oldest is the first
     Held connection = std::move(waiting_.front());
     waiting_.pop_front();

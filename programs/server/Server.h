@@ -9,12 +9,14 @@
 #include <vector>
 
 #include "programs/server/Connection.h"
+#include "programs/server/Departures.h"
+#include "programs/server/Events.h"
 #include "programs/server/Jobs.h"
 #include "programs/server/Limits.h"
 #include "programs/server/Listener.h"
 #include "programs/server/Service.h"
 #include "programs/server/SignalQueue.h"
-#include "webapi/base/UniqueFd.h"
+#include "programs/server/metrics/Metrics.h"
 
 namespace QELO {
 
@@ -26,7 +28,8 @@ namespace QELO {
 /// a second one kills it.
 class Server {
  public:
-  Server(Service& service, const ServerLimits& limits);
+  /// @param metrics  is kept up to date
+  Server(Service& service, const ServerLimits& limits, Metrics& metrics);
   Server(const Server&) = delete;
   Server& operator=(const Server&) = delete;
 
@@ -44,10 +47,9 @@ class Server {
  private:
   using Held = std::unique_ptr<Connection>;
 
-  bool Watch(int descriptor);
-  void Unwatch(int descriptor);
   void HandleSignals();
   bool Accept(const Listener& listener);
+  Held TakeArriving(int descriptor);
   void Arrive(Held connection);
   void Enqueue(Held connection);
   void Start(Held connection);
@@ -64,11 +66,13 @@ class Server {
 
   Service& service_;
   const ServerLimits limits_;
+  Metrics& metrics_;
   SignalQueue signals_;
-  UniqueFd events_;
+  Events events_;
+  Departures departures_;
   std::vector<Listener> listeners_;
   std::unordered_map<int, Held> arriving_;  ///< by descriptor
-  std::unordered_map<int, Held> leaving_;   ///< refused; what still comes is dropped
+  size_t readers_ = 0;                      ///< that are among these
   std::deque<Held> waiting_;
   Jobs jobs_;
   ServerClock::time_point nextSweep_;

@@ -15,7 +15,7 @@ class Server;
 /// What one server does with its connections.
 class Service {
  public:
-  enum class Arrival { kMore, kWhole, kMalformed, kTooLarge };
+  enum class Arrival { kMore, kWhole, kAnswered, kMalformed, kTooLarge };
   enum class Refusal { kBusy, kSlow, kMalformed, kTooLarge, kTimedOut };
 
   /// How a serving process ended.
@@ -31,7 +31,8 @@ class Service {
 
   /// Whether the other side may use the server at all; else it is hung up on.
   virtual bool Admits(const Connection& connection) = 0;
-  /// Takes what has come of the header, without waiting and nothing of what follows it.
+  /// Takes what has come of the header, without waiting and nothing of what follows it. kAnswered:
+  /// no process is needed, the connection has the answer.
   virtual Arrival Take(Connection& connection) = 0;
   /// Serves the request; in a process of its own, which has the connection alone and ends with
   /// this call's result.

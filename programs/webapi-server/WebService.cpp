@@ -12,6 +12,7 @@
 
 #include "programs/entry.cgi/ServeRequest.h"
 #include "programs/server/ServiceManager.h"
+#include "programs/server/metrics/Page.h"
 #include "programs/webapi-server/RequestInput.h"
 #include "programs/webapi-server/ScgiHeader.h"
 #include "webapi/APIRunner.h"
@@ -70,7 +71,8 @@ bool WebService::Admits(const Connection& connection) {
   ucred peer{};
   size = sizeof peer;
   const bool isKnown = getsockopt(socket, SOL_SOCKET, SO_PEERCRED, &peer, &size) == 0;
-  if (isKnown && (peer.uid == 0 || peer.uid == geteuid() || peer.uid == client_)) {
+  const uid_t other = IsReading(connection) ? peers_.reader : peers_.client;
+  if (isKnown && (peer.uid == 0 || peer.uid == geteuid() || peer.uid == other)) {
     return true;
   }
   syslog(LOG_AUTH | LOG_NOTICE, "%s:%d refused a connection of the user %d", kSource, __LINE__,
@@ -78,7 +80,15 @@ bool WebService::Admits(const Connection& connection) {
   return false;
 }
 
+bool WebService::IsReading(const Connection& connection) const {
+  return !peers_.figures.empty() && connection.listener == peers_.figures;
+}
+
 Service::Arrival WebService::Take(Connection& connection) {
+  if (IsReading(connection)) {
+    connection.isQuiet = true;
+    return MetricsPage::Take(connection, metrics_);
+  }
   return ScgiHeader::Take(connection);
 }
 

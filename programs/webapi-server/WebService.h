@@ -5,6 +5,7 @@
 #include <string>
 
 #include "programs/server/Service.h"
+#include "programs/server/metrics/Metrics.h"
 
 namespace QELO {
 
@@ -13,9 +14,16 @@ namespace QELO {
 /// and the answer on standard output.
 class WebService : public Service {
  public:
-  /// @param client      the account that may connect beside root and our own; (uid_t)-1: none
+  /// Who may connect beside root and our own account; (uid_t)-1: nobody.
+  struct Peers {
+    uid_t client = static_cast<uid_t>(-1);  ///< passes requests on
+    uid_t reader = static_cast<uid_t>(-1);  ///< reads the figures
+    std::string figures;                    ///< path of the socket that they are read by
+  };
+
   /// @param argc, argv  main()'s, whose area shows the call that a process serves
-  WebService(uid_t client, int argc, char** argv) : client_(client), argc_(argc), argv_(argv) {}
+  WebService(const Peers& peers, const Metrics& metrics, int argc, char** argv)
+      : peers_(peers), metrics_(metrics), argc_(argc), argv_(argv) {}
 
   /// Loads the API libraries that the descriptions of the working directory name.
   static void LoadLibraries();
@@ -28,7 +36,10 @@ class WebService : public Service {
   void Reload(Server& server) override;
 
  private:
-  const uid_t client_;
+  bool IsReading(const Connection& connection) const;
+
+  const Peers peers_;
+  const Metrics& metrics_;
   const int argc_;
   char** const argv_;
   ServerClock::time_point nextLook_;  ///< at the libraries' files

@@ -18,6 +18,7 @@
 #include "programs/server/Server.h"
 #include "programs/server/ServiceManager.h"
 #include "programs/server/Surroundings.h"
+#include "programs/server/metrics/Metrics.h"
 #include "programs/webapi-server/WebService.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
@@ -26,10 +27,13 @@ namespace {
 
 constexpr char kBindAtStart[] = "LD_BIND_NOW";
 constexpr char kUsage[] =
-    "usage: webapi-server [--socket PATH] [--port N] [--client ACCOUNT] [LIMITS]\n"
+    "usage: webapi-server [--socket PATH] [--port N] [--client ACCOUNT]\n"
+    "                     [--metrics PATH [--reader ACCOUNT]] [LIMITS]\n"
     "  --socket PATH      local socket to serve, made as the client's\n"
     "  --port N           port of the loopback address to serve\n"
     "  --client ACCOUNT   the web server's account: it may use the socket, beside root\n"
+    "  --metrics PATH     local socket that the server's figures are read by\n"
+    "  --reader ACCOUNT   may read them, beside root\n"
     "limits:\n"
     "  --requests N       requests at once (32)\n"
     "  --queue N          requests that wait for their turn (256)\n"
@@ -42,7 +46,7 @@ struct Settings {
   QELO::ServerLimits limits;
   std::string socket;
   unsigned port = 0;
-  uid_t client = static_cast<uid_t>(-1);
+  QELO::WebService::Peers peers;
 };
 
 bool findAccount(const std::string& name, uid_t& uid) {
@@ -53,6 +57,17 @@ bool findAccount(const std::string& name, uid_t& uid) {
   return account != nullptr;
 }
 
+auto place(std::string& setting) {
+  return [&setting](const std::string& path) {
+    setting = path;
+    return !path.empty() && path[0] == '/';
+  };
+}
+
+auto account(uid_t& uid) {
+  return [&uid](const std::string& name) { return findAccount(name, uid); };
+}
+
 bool readOptions(int argc, char** argv, Settings& settings) {
   QELO::ServerLimits& limits = settings.limits;
   limits.request = std::chrono::hours(1);  // of a large upload, too
@@ -61,13 +76,11 @@ bool readOptions(int argc, char** argv, Settings& settings) {
   };
   const auto count = [](unsigned& limit) { return [&limit](unsigned number) { limit = number; }; };
   QELO::Options options;
-  options.Text("socket", [&](const std::string& path) {
-    settings.socket = path;
-    return !path.empty() && path[0] == '/';
-  });
+  options.Text("socket", place(settings.socket));
   options.Number("port", 1, 65535, count(settings.port));
-  options.Text("client",
-               [&](const std::string& name) { return findAccount(name, settings.client); });
+  options.Text("client", account(settings.peers.client));
+  options.Text("metrics", place(settings.peers.figures));
+  options.Text("reader", account(settings.peers.reader));
   options.Number("requests", 1, 4096, count(limits.atOnce));
   options.Number("queue", 0, 65536, count(limits.queued));
   options.Number("arriving", 1, 65536, count(limits.arriving));
@@ -102,10 +115,13 @@ bool listen(QELO::Server& server, const Settings& settings, const std::vector<in
   for (const int descriptor : handed) {
     add(QELO::Listener::Handed(descriptor), "handed socket");
   }
-  if (!settings.socket.empty()) {
+  const auto addPath = [&](const std::string& path, uid_t owner) {
     QELO::Listener::Access access;
-    access.owner = settings.client;
-    add(QELO::Listener::AtPath(settings.socket, access), settings.socket);
+    access.owner = owner;
+    add(QELO::Listener::AtPath(path, access), path);
+  };
+  if (!settings.socket.empty()) {
+    addPath(settings.socket, settings.peers.client);
   }
   if (settings.port != 0) {
     add(QELO::Listener::AtPort(static_cast<unsigned short>(settings.port)),
@@ -114,6 +130,9 @@ bool listen(QELO::Server& server, const Settings& settings, const std::vector<in
   if (good && server.Paths().empty()) {
     fprintf(stderr, "nowhere to listen\n%s", kUsage);
     good = false;
+  }
+  if (good && !settings.peers.figures.empty()) {
+    addPath(settings.peers.figures, settings.peers.reader);
   }
   return good;
 }
@@ -134,8 +153,9 @@ int main(int argc, char** argv) {
   }
   QELO::WebService::LoadLibraries();
   QLIBGroupIsAdminGroupMem("root", 0);  // what accounts are looked up with is loaded now
-  QELO::WebService service(settings.client, argc, argv);
-  QELO::Server server(service, settings.limits);
+  QELO::Metrics metrics;
+  QELO::WebService service(settings.peers, metrics, argc, argv);
+  QELO::Server server(service, settings.limits, metrics);
   if (!server.Open() || !listen(server, settings, handed)) {
     return 1;
   }
