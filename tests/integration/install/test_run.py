@@ -17,6 +17,7 @@ from conftest import SOURCE, needs_root
 from webserver import free_port
 
 ORDINARY_USER = "nobody"
+CONFIGURATIONS = {"nginx": "nginx", "apache": "apache2"}
 
 
 @pytest.fixture(scope="module")
@@ -88,11 +89,26 @@ def test_Check_AsAnOrdinaryUser_IsRight(checkout):
     assert owner != "root"
 
 
+@pytest.mark.parametrize("server", ["nginx", "apache"])
+def test_Check_ByAnotherServer_AsAnOrdinaryUser_IsRight(checkout, server):
+    port = free_port()
+    result = run(checkout, "--check", "--port", port, "--server", server)
+    check_answers(result, port)
+    assert "The same by the fork server" in result.stdout
+    assert (checkout / "build" / "dev" / f"server-{port}" / f"{CONFIGURATIONS[server]}.conf").exists()
+    for process in Path("/proc").glob("[0-9]*/cmdline"):
+        try:
+            assert f"server-{port}/" not in process.read_text(errors="replace")
+        except OSError:
+            pass  # it has ended
+
+
 @needs_root
-def test_Check_AsRoot_IsRight():
+@pytest.mark.parametrize("server", ["lighttpd", "nginx", "apache"])
+def test_Check_AsRoot_IsRight(server):
     port = free_port()
     result = subprocess.run(
-        ["./run", "--check", "--port", str(port)],
+        ["./run", "--check", "--port", str(port), "--server", server],
         cwd=SOURCE, stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=400,
         check=False,
     )
@@ -120,7 +136,8 @@ def test_PortThatIsTaken_IsSaid(checkout):
     assert f"Port {port} of 127.0.0.1 is taken" in result.stderr
 
 
-@pytest.mark.parametrize("arguments", [["--port"], ["--port", "x"], ["--port", "70000"], ["--no"]])
+@pytest.mark.parametrize("arguments", [
+    ["--port"], ["--port", "x"], ["--port", "70000"], ["--server"], ["--server", "other"], ["--no"]])
 def test_WrongArguments_AreRefused(checkout, arguments):
     assert run(checkout, *arguments).returncode == 2
 

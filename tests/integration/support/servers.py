@@ -9,7 +9,7 @@ from pathlib import Path
 import pytest
 
 from conftest import ENTRY
-from webserver import ApacheCgi, ApacheCgid, LighttpdScgi, Nginx, NginxScgi, WebServer
+from webserver import ApacheCgi, ApacheCgid, ApacheScgi, LighttpdScgi, Nginx, NginxScgi, WebServer
 
 SERVERS = {
     "lighttpd": WebServer,
@@ -18,6 +18,7 @@ SERVERS = {
     "nginx-scgi": NginxScgi,
     "apache-mod_cgi": ApacheCgi,
     "apache-mod_cgid": ApacheCgid,
+    "apache-scgi": ApacheScgi,
 }
 
 

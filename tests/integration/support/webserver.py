@@ -181,3 +181,12 @@ class ApacheCgid(ApacheCgi):
     """Apache with threads."""
 
     definitions = ("CGID",)
+
+
+class ApacheScgi(ApacheCgi):
+    """Apache with threads, and our fork server."""
+
+    template = "apache2-scgi.conf.in"
+
+    def start_helpers(self, **identity):
+        return self.start_fork_server(**identity)
