@@ -41,6 +41,14 @@ install(CODE "
 install(DIRECTORY include/webapi DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}
         FILES_MATCHING PATTERN *.h)
 
+# The made-up host for tests of API libraries, a component that is asked for by name. Without what
+# debuggers want it is a tenth of the size.
+install(TARGETS webapi_testing EXPORT webapi-testing-targets
+        ARCHIVE DESTINATION ${CMAKE_INSTALL_LIBDIR})
+install(CODE "execute_process(COMMAND \"${CMAKE_STRIP}\" --strip-debug
+  \"\$ENV{DESTDIR}${CMAKE_INSTALL_FULL_LIBDIR}/libwebapi-ARDO5-testing.a\"
+  COMMAND_ERROR_IS_FATAL ANY)")
+install(EXPORT webapi-testing-targets NAMESPACE webapi:: DESTINATION ${webapi_package_dir})
 install(EXPORT webapi-targets NAMESPACE webapi:: DESTINATION ${webapi_package_dir})
 configure_package_config_file(cmake/webapiConfig.cmake.in ${CMAKE_BINARY_DIR}/webapiConfig.cmake
                               INSTALL_DESTINATION ${webapi_package_dir})

@@ -134,13 +134,16 @@ void Method(APIRequest* request, APIResponse* response) {
 
 /// A function as an entry of a table of checks: it takes a Call and says whether the method may be
 /// called, or throws the Error that is answered in its place. What it refuses without one is
-/// answered with the error that the response has.
+/// answered with the error that the check of the caller has left, else with 105.
 template <auto kFunction>
 int Check(APIRequest* request, APIResponse* response) {
   static_assert(std::is_invocable_r_v<bool, decltype(kFunction), const Call&>,
                 "a check is a function of const QELO::Call& that gives a bool");
   bool isPassed = false;
   method::Guarded(*response, [&] { isPassed = kFunction(Call(*request, *response)); });
+  if (!isPassed && response->GetError() == WEBAPI_ERR_NONE) {
+    response->SetError(WEBAPI_ERR_NO_PERMISSION);
+  }
   return isPassed ? 1 : 0;
 }
 

@@ -127,6 +127,9 @@ TEST_F(MethodAnswers, ChecksPassRefuseOrThrow) {
   response->SetError(WEBAPI_ERR_NOT_AUTHENTICATED);
   EXPECT_EQ(Check<isWanted>(request.get(), response.get()), 0);
   EXPECT_EQ(response->GetError(), WEBAPI_ERR_NOT_AUTHENTICATED);
+  response->SetError(WEBAPI_ERR_NONE);
+  EXPECT_EQ(Check<isWanted>(request.get(), response.get()), 0);
+  EXPECT_EQ(response->GetError(), WEBAPI_ERR_NO_PERMISSION);
   Ask(R"({"n":1,"strange":1})");
   EXPECT_EQ(Check<isWanted>(request.get(), response.get()), 0);
   EXPECT_EQ(response->GetError(), 408);
