@@ -83,6 +83,11 @@ class WEBAPI_API APIUpload {
   /// @return a Result
   int GetUploadFile(Json::Value& params);
 
+  /// Reads some of a body that is no form, in a method with "deferUpload" whose client sends bytes
+  /// as they are. It waits for them no longer than for those of any upload.
+  /// @return how many bytes; 0 when all that the request announces have been read; BROKEN_OFF
+  static long long ReadBody(char* buffer, unsigned long long size);
+
   /// Whether GetUploadParam() has found a file that GetUploadFile() has not loaded yet.
   bool HasFile() const;
   /// The field and the name of that file; "" when there is none.

@@ -4,14 +4,15 @@
 #include <poll.h>
 #include <stdio_ext.h>
 #include <sys/sendfile.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
 
+#include "platform/settings/Settings.h"
 #include "webapi/base/Log.h"
-#include "webapi/base/TextFile.h"
 
 namespace QELO::Platform {
 namespace {
@@ -36,16 +37,54 @@ bool endedEarly() {
   return false;
 }
 
+/// Has writing to standard output fail where it would wait. @return the flags that it had; -1 when
+/// nothing was changed
+int endWaiting() {
+  struct stat info {};
+  const bool hasAReader =
+      fstat(STDOUT_FILENO, &info) == 0 && (S_ISFIFO(info.st_mode) || S_ISSOCK(info.st_mode));
+  const int flags = hasAReader ? fcntl(STDOUT_FILENO, F_GETFL) : -1;
+  const bool isChanged = flags >= 0 && (flags & O_NONBLOCK) == 0 &&
+                         fcntl(STDOUT_FILENO, F_SETFL, flags | O_NONBLOCK) == 0;
+  return isChanged ? flags : -1;
+}
+
 }  // namespace
 
-Writer::Writer() {
+Writer::Writer() : flags_(-1), pace_(Settings().DownloadPace()) {
   if (fflush(stdout) != 0) {
     __fpurge(stdout);  // the client is gone, and no later flush must try again
   }
+  flags_ = endWaiting();
+}
+
+Writer::~Writer() {
+  if (flags_ >= 0) {
+    fcntl(STDOUT_FILENO, F_SETFL, flags_);
+  }
+}
+
+bool Writer::AwaitRoom() {
+  const int ready = pace_.Await(STDOUT_FILENO, POLLOUT);
+  if (ready == 0) {
+    WEBAPI_LOG(kSource, "the answer broke off: the client takes it too slowly");
+  }
+  return ready > 0 || (ready < 0 && failed());
 }
 
 bool Writer::WriteText(std::string_view text) {
-  return QELO::WriteText(STDOUT_FILENO, text) || failed();
+  while (!text.empty()) {
+    const ssize_t count = TEMP_FAILURE_RETRY(write(STDOUT_FILENO, text.data(), text.size()));
+    if (count > 0) {
+      text.remove_prefix(static_cast<size_t>(count));
+      pace_.Add(static_cast<uint64_t>(count));
+    } else if (count == 0 || errno != EAGAIN) {
+      return failed();
+    } else if (!AwaitRoom()) {
+      return false;
+    }
+  }
+  return true;
 }
 
 bool Writer::SendFile(int file, off_t start, off_t length) {
@@ -60,12 +99,15 @@ bool Writer::SendFile(int file, off_t start, off_t length) {
     if (count == 0) {
       return endedEarly();
     }
-    if (count < 0 && errno == EAGAIN) {
-      pollfd room{STDOUT_FILENO, POLLOUT, 0};
-      poll(&room, 1, -1);
-    } else if (count < 0 && (errno == EINVAL || errno == ENOSYS)) {
+    if (count > 0) {
+      pace_.Add(static_cast<uint64_t>(count));
+    } else if (errno == EAGAIN) {
+      if (!AwaitRoom()) {
+        return false;
+      }
+    } else if (errno == EINVAL || errno == ENOSYS) {
       return CopyFile(file, position, end - position);  // not for this file system or output
-    } else if (count < 0) {
+    } else {
       return failed();
     }
   }

@@ -5,13 +5,21 @@
 #include <cstdio>
 #include <string_view>
 
+#include "webapi/base/Pace.h"
+
 namespace QELO::Platform {
 
 /// Writes an answer to standard output, behind what the process has printed before. That the client
-/// is gone makes an operation fail; anything else that does is logged.
+/// is gone makes an operation fail; anything else that does is logged. So is a client that takes
+/// the answer more slowly than the settings allow.
+///
+/// While it lives, writing to standard output does not wait, where that is a pipe or a socket.
 class Writer {
  public:
   Writer();
+  Writer(const Writer&) = delete;
+  Writer& operator=(const Writer&) = delete;
+  ~Writer();
 
   bool WriteText(std::string_view text);
   /// Sends a part of a regular file without copying it through the process.
@@ -22,6 +30,10 @@ class Writer {
 
  private:
   bool CopyFile(int file, off_t start, off_t length);
+  bool AwaitRoom();
+
+  int flags_;  ///< of standard output, that it had before; negative: they have not been changed
+  Pace pace_;
 };
 
 }  // namespace QELO::Platform

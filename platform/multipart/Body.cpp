@@ -20,25 +20,23 @@ bool hasAWriter(int descriptor) {
 
 }  // namespace
 
-Body::Body(int descriptor, uint64_t length, std::chrono::milliseconds idleLimit)
+Body::Body(int descriptor, uint64_t length, const PaceLimits& limits)
     : descriptor_(descriptor),
       length_(length),
       left_(length),
-      idleLimit_(idleLimit),
+      pace_(limits),
       mayBlock_(hasAWriter(descriptor)) {}
 
 int64_t Body::Read(char* buffer, size_t size) {
   const size_t wanted = static_cast<size_t>(std::min<uint64_t>(size, left_));
   while (wanted > 0) {
-    if (mayBlock_) {
-      pollfd input{descriptor_, POLLIN, 0};
-      if (TEMP_FAILURE_RETRY(poll(&input, 1, static_cast<int>(idleLimit_.count()))) <= 0) {
-        return QELO_UPLOAD_BROKEN_OFF;
-      }
+    if (mayBlock_ && pace_.Await(descriptor_, POLLIN) <= 0) {
+      return QELO_UPLOAD_BROKEN_OFF;
     }
     const ssize_t count = TEMP_FAILURE_RETRY(read(descriptor_, buffer, wanted));
     if (count > 0) {
       left_ -= static_cast<uint64_t>(count);
+      pace_.Add(static_cast<uint64_t>(count));
       TakenBodyBytes() += descriptor_ == STDIN_FILENO ? count : 0;
       return count;
     }

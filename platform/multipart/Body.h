@@ -1,16 +1,17 @@
 #pragma once
 
-#include <chrono>
 #include <cstddef>
 #include <cstdint>
+
+#include "webapi/base/Pace.h"
 
 namespace QELO::Platform {
 
 /// The body of a request on a descriptor: as many bytes as were announced.
 class Body {
  public:
-  /// @param idleLimit  how long the client may send nothing
-  Body(int descriptor, uint64_t length, std::chrono::milliseconds idleLimit);
+  /// @param limits  how slow the client may be
+  Body(int descriptor, uint64_t length, const PaceLimits& limits);
 
   /// Reads some. @return how many bytes; 0 when all announced ones have been read; a negative
   /// QeloUploadResult when the client broke off, stalls, or the descriptor cannot be read
@@ -23,7 +24,7 @@ class Body {
   int descriptor_;
   uint64_t length_;
   uint64_t left_;
-  std::chrono::milliseconds idleLimit_;
+  Pace pace_;
   bool mayBlock_;  ///< a pipe or a socket, at whose other end somebody may stall
 };
 

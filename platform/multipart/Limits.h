@@ -1,6 +1,5 @@
 #pragma once
 
-#include <chrono>
 #include <cstddef>
 
 /// What one upload may ask for. A person's form has a dozen fields, and a browser sends a header of
@@ -20,7 +19,5 @@ inline constexpr size_t kFields = 1000;        ///< ordinary fields
 inline constexpr size_t kFieldBytes = 1 << 20;
 /// Files: each keeps a descriptor open to the end of the process.
 inline constexpr size_t kFiles = 512;
-/// How long a client may send nothing before the rest of its body is given up.
-inline constexpr std::chrono::seconds kIdle{30};
 
 }  // namespace QELO::Platform::UploadLimits

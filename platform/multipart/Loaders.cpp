@@ -6,15 +6,16 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <limits>
 #include <memory>
 #include <optional>
 #include <set>
 #include <string>
 #include <vector>
 
-#include "platform/multipart/Limits.h"
 #include "platform/multipart/PartialFile.h"
 #include "platform/multipart/Upload.h"
+#include "platform/settings/Settings.h"
 #include "webapi/base/FileIdentity.h"
 #include "webapi/base/NullDevice.h"
 #include "webapi/base/Number.h"
@@ -26,6 +27,7 @@ namespace {
 /// What a process has of uploads. At its end the files go, also when a method calls exit().
 struct State {
   std::unique_ptr<Upload> upload;
+  std::optional<Body> body;  ///< one that is no form
   std::optional<FileOwner> owner;
   std::optional<uid_t> caller;
   std::optional<Slice> slice;  ///< that was loaded
@@ -43,17 +45,30 @@ std::string variable(const char* name) {
   return value != nullptr ? value : "";
 }
 
-/// The upload on standard input; another input is another upload.
-Upload& upload() {
+/// What is known of an input before is not that of another one.
+State& stateOfInput() {
   State& own = state();
-  if (own.upload == nullptr || !own.input.IsAt(STDIN_FILENO)) {
-    uint64_t length = 0;
-    QELO::ParseNumber(variable("CONTENT_LENGTH"), length);
-    own.upload = std::make_unique<Upload>(Body(STDIN_FILENO, length, UploadLimits::kIdle),
-                                          variable("CONTENT_TYPE"));
+  if (!own.input.IsAt(STDIN_FILENO)) {
+    own.upload.reset();
+    own.body.reset();
     own.input = QELO::FileIdentity(STDIN_FILENO);
     own.slice.reset();
     own.received = 0;
+  }
+  return own;
+}
+
+Body bodyOfRequest(uint64_t unannounced) {
+  uint64_t length = unannounced;
+  QELO::ParseNumber(variable("CONTENT_LENGTH"), length);
+  return Body(STDIN_FILENO, length, Settings().BodyPace());
+}
+
+/// The upload on standard input.
+Upload& upload() {
+  State& own = stateOfInput();
+  if (own.upload == nullptr) {
+    own.upload = std::make_unique<Upload>(bodyOfRequest(0), variable("CONTENT_TYPE"));
   }
   return *own.upload;
 }
@@ -205,6 +220,17 @@ int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size
 
 void QeloCgiUploadOwnerSet(uid_t uid, gid_t gid) {
   state().owner = FileOwner{uid, gid};
+}
+
+long long QeloCgiReadBody(char* buffer, unsigned long long size) {
+  State& own = stateOfInput();
+  if (own.upload != nullptr) {
+    return QELO_UPLOAD_MALFORMED;
+  }
+  if (!own.body) {
+    own.body = bodyOfRequest(std::numeric_limits<uint64_t>::max());
+  }
+  return own.body->Read(buffer, size);
 }
 
 int QeloCgiLoadUploadAll(QLIBSZHASH** parameters, QLIBSZHASH** files, const char* directory, int) {

@@ -14,6 +14,11 @@
 namespace QELO::Platform {
 namespace {
 
+constexpr int kMostRate = 1'000'000'000;  ///< bytes a second
+constexpr int kDay = 86400;               ///< seconds
+constexpr int kWeek = 7 * kDay;
+constexpr int kYear = 366 * kDay;
+
 bool isTrusted(const char* path) {
   if (!OthersMayChange(path)) {
     return true;
@@ -67,6 +72,24 @@ bool Settings::GetSwitch(std::string_view key, bool fallback) const {
   return strcasecmp(text.c_str(), "no") == 0 ? false : fallback;
 }
 
+PaceLimits Settings::PaceOver(int window) const {
+  PaceLimits limits;
+  limits.leastRate = static_cast<uint64_t>(GetNumber("transfer_least_rate", 256, 0, kMostRate));
+  limits.window = std::chrono::seconds(window);
+  limits.longest = std::chrono::seconds(GetNumber("transfer_longest", kWeek, 0, kYear));
+  return limits;
+}
+
+PaceLimits Settings::BodyPace() const {
+  return PaceOver(GetNumber("upload_window", 60, 1, kDay));
+}
+
+PaceLimits Settings::DownloadPace() const {
+  PaceLimits limits = PaceOver(GetNumber("download_window", 600, 1, kDay));
+  limits.idle = limits.window;
+  return limits;
+}
+
 }  // namespace QELO::Platform
 
 extern "C" int QLIBCConfGetARDOTimeout(void) {
@@ -75,4 +98,13 @@ extern "C" int QLIBCConfGetARDOTimeout(void) {
 
 extern "C" int QLIBCConfGetCompoundEntries(int loggedIn) {
   return QELO::Platform::Settings().CompoundEntries(loggedIn != 0);
+}
+
+extern "C" void QLIBCConfGetBodyLimits(QLIBCTransferLimits* limits) {
+  const auto secondsOf = [](std::chrono::milliseconds time) {
+    return static_cast<unsigned>(std::chrono::duration_cast<std::chrono::seconds>(time).count());
+  };
+  const QELO::PaceLimits pace = QELO::Platform::Settings().BodyPace();
+  *limits = {static_cast<unsigned>(pace.leastRate), secondsOf(pace.window),
+             secondsOf(pace.longest)};
 }

@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "platform/settings/KeyValueFile.h"
+#include "webapi/base/Pace.h"
 
 namespace QELO::Platform {
 
@@ -31,8 +32,14 @@ class Settings {
                     : GetNumber("compound_entries_anonymous", 256, 0, 1'000'000);
   }
   bool TokenEnabled() const { return GetSwitch("enable_token", true); }
+  /// How slowly a body may come.
+  PaceLimits BodyPace() const;
+  /// How slowly a download may be taken. Who plays a film stops reading for minutes.
+  PaceLimits DownloadPace() const;
 
  private:
+  PaceLimits PaceOver(int window) const;
+
   std::shared_ptr<const KeyValueFile> own_;
 };
 

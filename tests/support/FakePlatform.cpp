@@ -176,6 +176,10 @@ int QLIBCConfGetCompoundEntries(int loggedIn) {
   return loggedIn != 0 ? fake().compoundEntries : fake().compoundEntriesAnonymous;
 }
 
+void QLIBCConfGetBodyLimits(QLIBCTransferLimits* limits) {
+  *limits = fake().bodyLimits;
+}
+
 int QLIBCConfGetARDOTimeout(void) {
   return fake().timeoutSetting;
 }

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "tests/support/FakeUpload.h"
+#include "webapi/platform/Core.h"
 #include "webapi/platform/Sharing.h"
 
 /// The host's operations as unit tests want them: each answers what its field says, and the calls
@@ -34,6 +35,7 @@ struct FakePlatform {
   int timeoutSetting = 900;
   int compoundEntries = 1024;
   int compoundEntriesAnonymous = 256;
+  QLIBCTransferLimits bodyLimits{256, 60, 604800};
   std::function<int(const std::string&, const std::string&)> setKeyValue;  ///< unset: 0
 
   // Names and addresses of the network: what each check answers.

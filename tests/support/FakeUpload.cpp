@@ -50,6 +50,12 @@ int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size
   return fake().sliceSize != 0 ? 1 : 0;
 }
 
+long long QeloCgiReadBody(char* buffer, unsigned long long size) {
+  const std::string piece = fake().body.substr(0, size);
+  fake().body.erase(0, size);
+  return static_cast<long long>(piece.copy(buffer, piece.size()));
+}
+
 int QeloCgiLoadUploadAll(QLIBSZHASH** parameters, QLIBSZHASH** files, const char* directory, int) {
   note("QeloCgiLoadUploadAll");
   fake().directory = directory;

@@ -18,6 +18,7 @@ struct FakeUpload {
   std::string name;
   unsigned long long left = 0;
   unsigned long long positions[2] = {};
+  std::string body;        ///< one that is no form
   bool callsBack = false;  ///< the progress function is called with 1 of 2
 
   uid_t caller = static_cast<uid_t>(-1);

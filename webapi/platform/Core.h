@@ -89,4 +89,14 @@ WEBAPI_API int QLIBCConfGetARDOTimeout(void);
 /// @param loggedIn  0: for a caller who is not logged in; else for one who is
 WEBAPI_API int QLIBCConfGetCompoundEntries(int loggedIn);
 
+/// How slow the client of a transfer may be.
+struct QLIBCTransferLimits {
+  unsigned leastRate;  ///< bytes a second that it sends on the average; 0: any
+  unsigned window;     ///< seconds that this is the average of
+  unsigned longest;    ///< seconds that it is waited for in all; 0: without end
+};
+
+/// Of a body that comes.
+WEBAPI_API void QLIBCConfGetBodyLimits(struct QLIBCTransferLimits* limits);
+
 }  // extern "C"

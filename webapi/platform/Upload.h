@@ -55,6 +55,11 @@ WEBAPI_API void QeloCgiUploadCallerSet(uid_t uid);
 /// @return 1, and 0 when none was loaded
 WEBAPI_API int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size);
 
+/// Reads some of a body that is no form, which comes as the limits of a slow client allow.
+/// @return how many bytes; 0 when all that were announced have been read; else a negative
+///         QeloUploadResult, also when another loader has begun on the body
+WEBAPI_API long long QeloCgiReadBody(char* buffer, unsigned long long size);
+
 /// Loads the whole body. Where the CGI variable HTTP_X_TYPE_NAME is "SLICEUPLOAD", in any case, the
 /// body's file is a slice of one that comes in several requests: `files` has it when it is whole.
 /// @param parameters  receives the ordinary fields, and a file's name under its field

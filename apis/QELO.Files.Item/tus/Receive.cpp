@@ -1,8 +1,8 @@
 // The body of a request as it arrives, into the unfinished file.
 
 #include <fcntl.h>
-#include <poll.h>
 #include <unistd.h>
+#include <webapi/APIUpload.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -19,18 +19,8 @@
 namespace files {
 namespace {
 
-constexpr size_t kPiece = 256 << 10;   ///< bytes that are read at once
-constexpr int kIdleLimit = 60 * 1000;  ///< milliseconds without a byte, after which it is over
-constexpr char kMismatch[] = "460";    ///< the protocol's own status
-
-/// Some bytes of the request's body. @return 0 at its end, and when no more come
-ssize_t readSome(char* buffer, size_t size) {
-  pollfd input{STDIN_FILENO, POLLIN, 0};
-  if (TEMP_FAILURE_RETRY(poll(&input, 1, kIdleLimit)) <= 0) {
-    return 0;
-  }
-  return std::max<ssize_t>(TEMP_FAILURE_RETRY(read(STDIN_FILENO, buffer, size)), 0);
-}
+constexpr size_t kPiece = 256 << 10;  ///< bytes that are read at once
+constexpr char kMismatch[] = "460";   ///< the protocol's own status
 
 /// @return 0 or errno
 int writeAll(int file, const char* data, size_t size, uint64_t at) {
@@ -70,11 +60,11 @@ int receive(int file, uint64_t end, uint64_t left, Digest* digest, uint64_t& len
   while (left > 0 && !isMore) {
     // One more than there may be shows whether there is more.
     const size_t room = std::min({uint64_t{kPiece}, end - length + 1, left});
-    const auto count = static_cast<uint64_t>(readSome(buffer.get(), room));
-    const uint64_t taken = std::min(count, end - length);
-    if (count == 0) {
-      break;
+    const long long count = QELO::APIUpload::ReadBody(buffer.get(), room);
+    if (count <= 0) {
+      break;  // what has come counts
     }
+    const uint64_t taken = std::min(static_cast<uint64_t>(count), end - length);
     if (const int error = writeAll(file, buffer.get(), taken, length); error != 0) {
       return error;
     }
@@ -82,8 +72,8 @@ int receive(int file, uint64_t end, uint64_t left, Digest* digest, uint64_t& len
       digest->Add(buffer.get(), taken);
     }
     length += taken;
-    left -= count;
-    isMore = count > taken;
+    left -= static_cast<uint64_t>(count);
+    isMore = static_cast<uint64_t>(count) > taken;
   }
   return 0;
 }

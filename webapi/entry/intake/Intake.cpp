@@ -16,6 +16,7 @@
 #include "webapi/json/Literal.h"
 #include "webapi/model/request/CipherEnvelope.h"
 #include "webapi/platform/Cgi.h"
+#include "webapi/platform/Core.h"
 #include "webapi/platform/Upload.h"
 #include "webapi/platform/WebAPIUtil.h"
 
@@ -48,6 +49,16 @@ Json::Value& sectionOf(Json::Value& params, const char* name) {
 bool isResumable(const APIRequest& request) {
   const std::string type = JsonHelper::asString(request.GetEnv("CONTENT_TYPE", ""));
   return request.HasEnv(kResumableVersion) && (type.empty() || type == kPieceType);
+}
+
+PaceLimits bodyPace() {
+  QLIBCTransferLimits limits{};
+  QLIBCConfGetBodyLimits(&limits);
+  PaceLimits pace;
+  pace.leastRate = limits.leastRate;
+  pace.window = std::chrono::seconds(limits.window);
+  pace.longest = std::chrono::seconds(limits.longest);
+  return pace;
 }
 
 bool namesCall(const Json::Value& section) {
@@ -100,7 +111,7 @@ bool Intake::InitPostParam(Json::Value& section) {
       return false;
     }
     std::string body;
-    const bool received = RequestBody::Read(STDIN_FILENO, length, RequestBody::kIdleLimit, body);
+    const bool received = RequestBody::Read(STDIN_FILENO, length, bodyPace(), body);
     RequestBody::CloseStandardInput();
     return received && !body.empty() && ReadLine(std::move(body), section);
   } catch (const std::exception& error) {

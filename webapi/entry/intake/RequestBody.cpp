@@ -17,10 +17,10 @@ constexpr size_t kPiece = 64 << 10;  // bytes that a pipe holds
 
 /// Reads up to `size` bytes into a text that has room for them.
 /// @return false when the input cannot be read
-bool receive(int fd, size_t size, std::chrono::milliseconds idleLimit, std::string& text) {
+bool receive(int fd, size_t size, const PaceLimits& limits, std::string& text) {
+  Pace pace(limits);
   while (text.size() < size) {
-    pollfd input{fd, POLLIN, 0};
-    const int ready = TEMP_FAILURE_RETRY(poll(&input, 1, static_cast<int>(idleLimit.count())));
+    const int ready = pace.Await(fd, POLLIN);
     if (ready <= 0) {
       return ready == 0;
     }
@@ -32,13 +32,14 @@ bool receive(int fd, size_t size, std::chrono::milliseconds idleLimit, std::stri
     if (count == 0 || (count < 0 && errno != EAGAIN)) {
       return count == 0;
     }
+    pace.Add(text.size() - received);
   }
   return true;
 }
 
 }  // namespace
 
-bool Read(int fd, int64_t length, std::chrono::milliseconds idleLimit, std::string& text) {
+bool Read(int fd, int64_t length, const PaceLimits& limits, std::string& text) {
   std::string received;
   try {
     // The kernel gives pages as they are written to, so an announced length costs nothing.
@@ -46,7 +47,7 @@ bool Read(int fd, int64_t length, std::chrono::milliseconds idleLimit, std::stri
   } catch (const std::exception&) {
     return false;
   }
-  if (!receive(fd, static_cast<size_t>(length), idleLimit, received)) {
+  if (!receive(fd, static_cast<size_t>(length), limits, received)) {
     return false;
   }
   received.resize(std::min(received.find('\0'), received.size()));

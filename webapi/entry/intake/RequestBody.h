@@ -1,23 +1,22 @@
 #pragma once
 
-#include <chrono>
 #include <cstdint>
 #include <string>
 
-namespace QELO::RequestBody {
+#include "webapi/base/Pace.h"
 
-/// How long a client may send nothing before the rest of its body is given up.
-inline constexpr std::chrono::seconds kIdleLimit{30};
+namespace QELO::RequestBody {
 
 /// Longest body in bytes that is taken as parameters: they are kept in memory, several times over
 /// while they are read, and nobody has been asked for a permission yet.
 inline constexpr int64_t kMaxLength = 16 << 20;
 
 /// Reads a body of `length` bytes and takes the text up to its first NUL. A body that ends or
-/// stalls early is taken as far as it came; memory is used for what came, not for `length`.
+/// stalls early, or comes too slowly, is taken as far as it came; memory is used for what came, not
+/// for `length`.
 /// @param length  bytes announced, above 0
 /// @return false, and `text` unchanged, when memory is short or `fd` cannot be read
-bool Read(int fd, int64_t length, std::chrono::milliseconds idleLimit, std::string& text);
+bool Read(int fd, int64_t length, const PaceLimits& limits, std::string& text);
 
 /// Makes /dev/null the process's standard input. Stays as it is when /dev/null cannot be opened.
 void CloseStandardInput();

@@ -25,6 +25,10 @@ int APIUpload::GetUploadFile(Json::Value& params) {
   return private_->GetUploadFile(params);
 }
 
+long long APIUpload::ReadBody(char* buffer, unsigned long long size) {
+  return QeloCgiReadBody(buffer, size);
+}
+
 bool APIUpload::HasFile() const {
   return private_->HasFile();
 }

@@ -6,6 +6,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <string>
 #include <thread>
 
@@ -17,8 +18,10 @@ extern "C" __attribute__((visibility("default"))) const char* __asan_default_opt
 namespace QELO::RequestBody {
 namespace {
 
-constexpr std::chrono::milliseconds kPatient{5000};
-constexpr std::chrono::milliseconds kImpatient{30};
+constexpr std::chrono::milliseconds kLong{60'000};
+constexpr PaceLimits kPatient{std::chrono::milliseconds(5000), kLong, 1, kLong};
+constexpr PaceLimits kImpatient{std::chrono::milliseconds(30), kLong, 1, kLong};
+constexpr PaceLimits kHurried{kLong, std::chrono::milliseconds(50), 1'000'000, kLong};
 
 class RequestBodyTest : public testing::Test {
  protected:
@@ -70,6 +73,20 @@ TEST_F(RequestBodyTest, BodyThatStallsIsTakenAfterTheLimit) {
   Send("abc");
   EXPECT_TRUE(Read(pipe_[0], 100, kImpatient, text_));
   EXPECT_EQ(text_, "abc");
+}
+
+TEST_F(RequestBodyTest, BodyThatComesTooSlowlyIsTakenAsFarAsItCame) {
+  std::atomic<bool> hasEnded = false;
+  std::thread client([&] {
+    for (int i = 0; i < 1000 && !hasEnded; ++i) {
+      Send("x");
+      std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+  });
+  EXPECT_TRUE(Read(pipe_[0], 1000, kHurried, text_));
+  hasEnded = true;
+  client.join();
+  EXPECT_LT(text_.size(), 20U);
 }
 
 TEST_F(RequestBodyTest, InputThatDoesNotBlockIsWaitedFor) {
