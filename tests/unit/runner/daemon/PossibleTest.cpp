@@ -65,6 +65,21 @@ TEST_F(DaemonChoice, NothingIsForwardedWithinADaemonWhateverTheVariableHolds) {
   }
 }
 
+TEST_F(DaemonChoice, MethodRunsInProcessWithinADaemon) {
+  for (const bool within : {false, true}) {
+    Json::Value description = Description("state");
+    description["socket"] = "daemon.sock";
+    WriteDescription(description);
+    MakeRequest("QELO.Test.Call", 1, "run");
+    within ? setenv("in_qeloapid", "", 1) : unsetenv("in_qeloapid");
+    TestRunner tested;
+    platform->daemonConnects = false;
+    EXPECT_EQ(tested.Process(request.get(), response.get()), within);
+    EXPECT_EQ(Data().isObject(), within);
+    EXPECT_EQ(response->GetError(), within ? 0 : 117);
+  }
+}
+
 TEST_F(DaemonChoice, DescriptionWithoutASocketStaysInProcessInSilence) {
   for (const char* members :
        {"{}", R"({"socket": ""})", R"({"socket": null})", R"({"socket": ["daemon.sock"]})"}) {
