@@ -6,6 +6,7 @@
 #include "programs/webapi-exec/Program.h"
 #include "programs/webapi/Arguments.h"
 #include "programs/webapi/check/Check.h"
+#include "programs/webapi/diff/Diff.h"
 #include "programs/webapi/new/New.h"
 
 using namespace QELO::AuthorProgram;
@@ -16,6 +17,7 @@ constexpr char kHelp[] =
     "webapi COMMAND [ARGUMENT...]\n"
     "    call    calls an API of this host; webapi-exec is another name of it\n"
     "    check   checks descriptions of APIs, and that their libraries have what they list\n"
+    "    diff    tells what callers of an old description meet in a new one\n"
     "    new     writes a new API library, with tests\n"
     "webapi COMMAND --help\n"
     "    tells more of a command.\n";
@@ -27,6 +29,7 @@ struct Command {
 
 constexpr Command kCommands[] = {
     {"check", Check},
+    {"diff", Diff},
     {"new", New},
 };
 
