@@ -50,9 +50,8 @@ bool becomeRootGroup() {
 std::vector<gid_t> currentGroups() {
   const int count = getgroups(0, nullptr);
   std::vector<gid_t> groups(count > 0 ? static_cast<size_t>(count) : 0);
-  if (count > 0) {
-    getgroups(count, groups.data());
-  }
+  const int read = getgroups(static_cast<int>(groups.size()), groups.data());
+  groups.resize(read > 0 ? static_cast<size_t>(read) : 0);
   return groups;
 }
 
