@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <new>
 
 namespace QELO::Platform {
 namespace {
@@ -52,16 +53,28 @@ bool isMethodsAnswer(long status, const char* type) {
 
 bool Transfer::Prepare() {
   handle_.reset(curl_easy_init());
-  curl_slist* list = nullptr;
-  for (const std::string& header : call_.headers) {
-    list = curl_slist_append(list, header.c_str());
-  }
-  headers_.reset(curl_slist_append(list, kNoContinue));
-  if (handle_ == nullptr || headers_ == nullptr || !SetSecurity() || !SetOptions()) {
+  if (handle_ == nullptr || !SetHeaders() || !SetSecurity() || !SetOptions()) {
     Fail(CRED_REQUEST_NO_TRANSPORT, "the transport takes no request");
     return false;
   }
   return true;
+}
+
+bool Transfer::AddHeader(const char* header) {
+  curl_slist* longer = curl_slist_append(headers_.get(), header);
+  if (longer == nullptr) {
+    return false;  // what there was is there yet
+  }
+  [[maybe_unused]] const curl_slist* before = headers_.release();
+  headers_.reset(longer);
+  return true;
+}
+
+/// All or none: without one of them the other host would take the call for another one.
+bool Transfer::SetHeaders() {
+  return std::all_of(call_.headers.begin(), call_.headers.end(),
+                     [this](const std::string& header) { return AddHeader(header.c_str()); }) &&
+         AddHeader(kNoContinue);
 }
 
 /// Each of these has to be taken: without one of them the call would go out unguarded.
@@ -102,12 +115,19 @@ bool Transfer::SetOptions() {
          curl_easy_setopt(curl, CURLOPT_URL, call_.url.c_str()) == CURLE_OK;
 }
 
-size_t Transfer::TakeAnswer(char* data, size_t, size_t count, void* self) {
-  std::string& answer = static_cast<Transfer*>(self)->call_.answer;
+/// Nothing is thrown through the transport, which is written in C.
+size_t Transfer::TakeAnswer(char* data, size_t, size_t count, void* object) {
+  auto* self = static_cast<Transfer*>(object);
+  std::string& answer = self->call_.answer;
   if (count > kLongestAnswer - answer.size()) {
     return 0;
   }
-  answer.append(data, count);
+  try {
+    answer.append(data, count);
+  } catch (const std::bad_alloc&) {
+    self->hasNoMemory_ = true;
+    return 0;
+  }
   return count;
 }
 
@@ -168,7 +188,9 @@ void Transfer::Finish(CURLcode result) {
   const char* type = nullptr;
   curl_easy_getinfo(handle_.get(), CURLINFO_RESPONSE_CODE, &status);
   curl_easy_getinfo(handle_.get(), CURLINFO_CONTENT_TYPE, &type);
-  if (result != CURLE_OK) {
+  if (hasNoMemory_) {
+    Fail(CRED_REQUEST_BROKEN, "no memory is left for the answer");
+  } else if (result != CURLE_OK) {
     Fail(errorOf(result), message_[0] != '\0' ? message_ : curl_easy_strerror(result));
   } else if (!isMethodsAnswer(status, type)) {
     Fail(CRED_REQUEST_REFUSED, "its web server answered with status " + std::to_string(status));
@@ -177,8 +199,8 @@ void Transfer::Finish(CURLcode result) {
 
 void Transfer::Fail(CredRequestError error, const std::string& reason) {
   call_.error = error;
+  std::string().swap(call_.answer);
   call_.reason = reason;
-  call_.answer.clear();
 }
 
 }  // namespace QELO::Platform

@@ -33,8 +33,10 @@ class Transfer {
  private:
   using Clock = std::chrono::steady_clock;
 
-  static size_t TakeAnswer(char* data, size_t, size_t count, void* self);
-  static size_t GiveUpload(char* buffer, size_t, size_t room, void* self);
+  static size_t TakeAnswer(char* data, size_t, size_t count, void* object);
+  static size_t GiveUpload(char* buffer, size_t, size_t room, void* object);
+  bool AddHeader(const char* header);
+  bool SetHeaders();
   bool SetOptions();
   bool SetSecurity();
   void Fail(CredRequestError error, const std::string& reason);
@@ -49,6 +51,7 @@ class Transfer {
   std::unique_ptr<CURL, Free> handle_;
   char message_[CURL_ERROR_SIZE] = "";
   bool isPaused_ = false;
+  bool hasNoMemory_ = false;                ///< for the answer
   int64_t sent_ = 0;                        ///< bytes of the body, as far as they were given
   curl_off_t uploaded_ = 0;                 ///< bytes that have left, when last looked at
   Clock::time_point moved_ = Clock::now();  ///< when the last of them did
