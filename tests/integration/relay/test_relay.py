@@ -4,6 +4,7 @@ by TLS."""
 import hashlib
 import json
 import shutil
+import socket
 import subprocess
 import time
 from urllib.parse import parse_qs, urlencode
@@ -11,6 +12,7 @@ from urllib.parse import parse_qs, urlencode
 import pytest
 from conftest import BUILD, ROOT, needs_root
 from tls import Authority, ScriptedHost, TlsFront, json_answer, openssl, public_key_pin
+from upload import TYPE, Form
 from webserver import WebServer
 
 pytestmark = needs_root
@@ -36,7 +38,7 @@ def good(authority):
 def other(root, good, tmp_path_factory):
     """The other host: a root of its own, a web server, and TLS in front."""
     place = tmp_path_factory.mktemp("other") / "root"
-    shutil.copytree(root, place, symlinks=True)
+    subprocess.run(["cp", "-a", root, place], check=True)  # with its owners
     for spare in (place / "run" / "webapi", place / "var" / "lib" / "webapi"):
         shutil.rmtree(spare, ignore_errors=True)
     at_other = [*AT_OTHER_ROOT, place, ROOT]
@@ -46,7 +48,7 @@ def other(root, good, tmp_path_factory):
     server = WebServer(tmp_path_factory.mktemp("other-server"), BUILD / "programs" / "entry.cgi")
     server.start(*at_other)
     front = TlsFront(*good, server.port)
-    front.token = token
+    front.token, front.place = token, place
     yield front
     front.stop()
     server.stop()
@@ -314,3 +316,61 @@ def test_UploadThatFails_AnswersAllTheSame(client, admin, scripted, hosts, descr
     assert upload(client, admin, b"x" * 3_000_000).code == 109
     hosts(7, scripted.url)
     assert upload(client, admin, b"x", long="x" * 6000).code == 109
+
+
+def test_Upload_ReachesTheMethodOfTheOtherHost(client, admin, other, hosts):
+    """A file, there and back again, and nothing of it here."""
+    hosts(7, other.url, other.token)
+    content = bytes(range(256)) * 8_000
+    query = {"api": "QELO.Files.Item", "version": 1, "_sid": admin["sid"], "relay_zt": 7}
+    target = f"/webapi/entry.cgi?{urlencode({**query, 'method': 'upload', 'path': '/own'})}"
+    form = Form().field("existing", "refuse").file("file", "relayed.bin", content).body()
+    answer = client.request("POST", target, form, {"Content-Type": TYPE})
+    assert [item["path"] for item in answer.data["items"]] == ["/own/relayed.bin"]
+    assert (other.place / "home/alice/relayed.bin").read_bytes() == content
+    assert not list((ROOT / "home").rglob("relayed.bin"))
+    back = client.call("QELO.Files.Item", "download", _sid=admin["sid"], relay_zt=7, path="/own/relayed.bin")
+    assert back.body == content
+    again = client.request("POST", target, form, {"Content-Type": TYPE})
+    assert again.code == 406  # the other method's own error: it is there
+
+
+def test_UploadWhoseCallStandsInTheForm_Is109(client, admin, scripted, hosts, describe):
+    """Its body was begun to be read, so that it cannot be passed on whole."""
+    describe("QELO.Test.Upload", "good.so", allowUser=["admin.local"], authLevel=1,
+             methods={"1": [{"run": {"allowUpload": True}}]})
+    hosts(7, scripted.url)
+    del scripted.requests[:]
+    served = scripted.served
+    form = Form()
+    for name, value in (("api", "QELO.Test.Upload"), ("version", "1"), ("method", "run"),
+                        ("_sid", admin["sid"]), ("relay_zt", "7")):
+        form.field(name, value)
+    form.file("file", "a", b"x" * 300_000)
+    start = time.monotonic()
+    answer = client.request("POST", "/webapi/entry.cgi", form.body(), {"Content-Type": TYPE})
+    assert answer.code == 109
+    assert time.monotonic() - start < 8
+    assert (scripted.requests, scripted.served) == ([], served)
+
+
+@pytest.mark.parametrize("relayed_call", ["upload", "call"])
+def test_Answer_WaitsForTheBody(client, admin, other, scripted, hosts, describe, relayed_call):
+    """The web server takes the answer when it has passed on the body; who reads it late gets it all."""
+    describe("QELO.Test.Upload", "good.so", allowUser=["admin.local"], authLevel=1,
+             methods={"1": [{"run": {"allowUpload": True}}]})
+    hosts(7, scripted.url)
+    scripted.answer = json_answer({"success": True, "data": "y" * 3_000_000})
+    api, method, kind = (("QELO.Test.Upload", "run", TYPE) if relayed_call == "upload" else
+                         (API, "plain", "application/octet-stream"))
+    query = urlencode({"api": api, "version": 1, "method": method, "_sid": admin["sid"], "relay_zt": 7})
+    size = 8_000_000
+    with socket.create_connection(("127.0.0.1", client.port), timeout=60) as connection:
+        connection.sendall(f"POST /webapi/entry.cgi?{query} HTTP/1.0\r\nHost: localhost\r\n"
+                           f"Content-Type: {kind}\r\nContent-Length: {size}\r\n\r\n".encode())
+        for _ in range(size // 1_000_000):  # not a byte is read meanwhile
+            connection.sendall(b"x" * 1_000_000)
+            time.sleep(0.1)
+        received = b"".join(iter(lambda: connection.recv(65536), b""))
+    scripted.answer = None
+    assert received.endswith(b'"}') and received.count(b"y" * 1000) == 3000

@@ -8,6 +8,8 @@
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
+#include "webapi/base/Log.h"
+#include "webapi/base/TakenBody.h"
 #include "webapi/json/Literal.h"
 #include "webapi/platform/CredRequest.h"
 
@@ -56,6 +58,11 @@ int Relay::Queue(CredRequestMgr& manager, long host, const Json::Value& params) 
   const std::string method = request_.GetAPIMethod();
   if (!request_.IsUploadRequest()) {
     return manager.AddWebAPIRequest(host, api, version, method, params);
+  }
+  if (TakenBodyBytes() > 0) {
+    // Its call stands in the form: what is left would be another body than the one announced.
+    WEBAPI_LOG("WebEntry", "an upload whose body was begun to be read is not relayed");
+    return -1;
   }
   Json::Value headers(Json::objectValue);
   headers[Literal("Content-Type")] = request_.GetEnv("CONTENT_TYPE");

@@ -1,6 +1,7 @@
 // Calls that another host serves: what is asked of it, and what the client gets.
 
 #include "tests/support/CgiFixture.h"
+#include "webapi/base/TakenBody.h"
 
 namespace QELO {
 namespace {
@@ -15,6 +16,11 @@ class EntryRelay : public CgiTest {
     platform->authorizedUser = "ann";
     platform->relayAnswer = "{\"success\":true, \"data\":\"\xff there\"}";
     Describe("{}");  // nobody may call it here
+    TakenBodyBytes() = 0;
+  }
+  void TearDown() override {
+    TakenBodyBytes() = 0;
+    CgiTest::TearDown();
   }
 
   /// The recorded calls of the manager, one a line.
@@ -128,6 +134,17 @@ TEST_F(EntryRelay, UploadPassesItsBodyOn) {
                          "\",\"Content-Type\":\"multipart/form-data; boundary=b\"}, 0, 0)\n"
                          "GetRequest(0)\nRun(5)\n~CredRequestMgr()\n");
   EXPECT_EQ(RestOfInput(), "");
+}
+
+TEST_F(EntryRelay, UploadWhoseBodyWasBegunToBeReadIs109AndNothingIsQueued) {
+  Describe("{}", R"({"allowUpload": true})");
+  Post("--b\r\nthe body\r\n--b--\r\n");
+  Set("QUERY_STRING", std::string(kCall) + "&relay_zt=7");
+  Set("CONTENT_TYPE", "multipart/form-data; boundary=b");
+  TakenBodyBytes() = 5;
+  EXPECT_EQ(Serve().Code(), 109);
+  EXPECT_EQ(Steps(), "CredRequestMgr()\n~CredRequestMgr()\n");
+  EXPECT_EQ(SyslogCapture::Count("an upload whose body was begun to be read is not relayed"), 1);
 }
 
 TEST_F(EntryRelay, UploadToAMethodWithoutIs115) {
