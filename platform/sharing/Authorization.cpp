@@ -2,6 +2,7 @@
 
 #include "platform/base/IpAddress.h"
 #include "platform/base/Secrets.h"
+#include "platform/sharing/LinkConnection.h"
 #include "platform/sharing/LinkState.h"
 #include "platform/sharing/LinkStore.h"
 #include "webapi/base/Log.h"
@@ -76,7 +77,7 @@ int authorize(const char* id, const char* sid, const QeloSharingVisit& visit) {
   if (!hasLinkStore()) {
     return kNoLink;  // no link was ever made
   }
-  const std::unique_ptr<LinkStore> store = openLinkStore(false);
+  LinkStore* store = LinkConnection::Get();
   if (store == nullptr) {
     return kBroken;
   }
@@ -104,6 +105,8 @@ int authorize(const char* id, const char* sid, const QeloSharingVisit& visit) {
 
 extern "C" int QeloSharingIsAuthorized(const char* sharingId, const char* sharingSid,
                                        const QeloSharingVisit* visit) {
-  return visit == nullptr ? QELO::Platform::kRefused
-                          : QELO::Platform::authorize(sharingId, sharingSid, *visit);
+  using namespace QELO::Platform;
+  const int result = visit == nullptr ? kRefused : authorize(sharingId, sharingSid, *visit);
+  LinkConnection::Drop();
+  return result;
 }

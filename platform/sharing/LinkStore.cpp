@@ -9,9 +9,14 @@
 
 namespace QELO::Platform {
 
-bool hasLinkStore() {
+LinkStoreFile findLinkStore() {
   struct stat info {};
-  return stat(Paths::kSharingDatabase, &info) == 0;
+  return stat(Paths::kSharingDatabase, &info) == 0 ? LinkStoreFile{info.st_dev, info.st_ino}
+                                                   : LinkStoreFile();
+}
+
+bool hasLinkStore() {
+  return !(findLinkStore() == LinkStoreFile());
 }
 
 std::unique_ptr<LinkStore> openLinkStore(bool create) {

@@ -74,6 +74,15 @@ class LinkStore {
 /// @return null on failure, which is logged
 std::unique_ptr<LinkStore> openLinkStore(bool create);
 
+/// Which file the database is, as long as it lives; equal to none of another one's.
+struct LinkStoreFile {
+  dev_t device = 0;
+  ino_t inode = 0;
+  bool operator==(const LinkStoreFile&) const = default;
+};
+
+/// @return LinkStoreFile() when there is no database
+LinkStoreFile findLinkStore();
 /// Whether there is a database.
 bool hasLinkStore();
 

@@ -168,4 +168,28 @@ LinkResult RemoveLink(const std::string& owner, int64_t id) {
   return resultOf(*store, store->Remove(account.uid, id));
 }
 
+LinkResult FindLink(const std::string& owner, const std::string& id, Json::Value& link) {
+  Platform::Account account;
+  if (!findOwner(owner, account)) {
+    return LINK_FAILED;
+  }
+  if (!Platform::isSecretText(id) || !Platform::hasLinkStore()) {
+    return LINK_ABSENT;
+  }
+  const std::unique_ptr<LinkStore> store = Platform::openLinkStore(false);
+  StoredLink found;
+  if (store == nullptr) {
+    return LINK_FAILED;
+  }
+  const LinkResult result = resultOf(*store, store->FindLink(id, found));
+  const bool isTheirs =
+      found.entry.ownerName == account.name && found.entry.ownerUid == account.uid;
+  if (result != LINK_DONE || !isTheirs) {
+    return result == LINK_DONE ? LINK_ABSENT : result;
+  }
+  link = Platform::toJson(found);
+  link["link"] = id;
+  return LINK_DONE;
+}
+
 }  // namespace QELO::sharing

@@ -1,9 +1,10 @@
 #include "platform/base/Secrets.h"
-#include "platform/sharing/Connection.h"
+#include "platform/sharing/LinkConnection.h"
 #include "webapi/platform/Sharing.h"
 
 namespace QELO::sharing::db {
 
+using Platform::LinkConnection;
 using Platform::LinkStore;
 
 SharingDB& SharingDB::Instance() {
@@ -15,21 +16,12 @@ bool SharingDB::IsGood() const {
   return Platform::hasLinkStore();
 }
 
-std::shared_ptr<Connection> SharingDB::Use() {
-  std::shared_ptr<Connection> used = connection_.lock();
-  if (used == nullptr) {
-    used = std::make_shared<Connection>();
-    connection_ = used;
-  }
-  return used;
-}
-
-EntryDB::EntryDB(SharingDB& db) : connection_(db.Use()) {}
-SessionDB::SessionDB(SharingDB& db) : connection_(db.Use()) {}
-TokenDB::TokenDB(SharingDB& db) : connection_(db.Use()) {}
+EntryDB::EntryDB(SharingDB&) {}
+SessionDB::SessionDB(SharingDB&) {}
+TokenDB::TokenDB(SharingDB&) {}
 
 bool EntryDB::GetByHash(const std::string& hash, record::Entry& entry) {
-  LinkStore* store = Platform::isSecretText(hash) ? connection_->Get() : nullptr;
+  LinkStore* store = Platform::isSecretText(hash) ? LinkConnection::Get() : nullptr;
   Platform::StoredLink link;
   if (store == nullptr || store->FindLink(hash, link) != LinkStore::Result::kDone) {
     return false;
@@ -39,7 +31,7 @@ bool EntryDB::GetByHash(const std::string& hash, record::Entry& entry) {
 }
 
 bool SessionDB::GetBySessionId(const std::string& id, record::Session& session) {
-  LinkStore* store = Platform::isSecretText(id) ? connection_->Get() : nullptr;
+  LinkStore* store = Platform::isSecretText(id) ? LinkConnection::Get() : nullptr;
   Platform::StoredSession found;
   if (store == nullptr || store->FindSession(id, found) != LinkStore::Result::kDone) {
     return false;
@@ -50,7 +42,7 @@ bool SessionDB::GetBySessionId(const std::string& id, record::Session& session) 
 
 bool TokenDB::GetBySessionEntry(const record::Session& session, const record::Entry& entry,
                                 record::Token& token) {
-  LinkStore* store = session.get_id() != 0 && entry.get_id() != 0 ? connection_->Get() : nullptr;
+  LinkStore* store = session.get_id() != 0 && entry.get_id() != 0 ? LinkConnection::Get() : nullptr;
   int64_t opened = 0;
   if (store == nullptr ||
       store->FindToken(session.get_id(), entry.get_id(), opened) != LinkStore::Result::kDone) {

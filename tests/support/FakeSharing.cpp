@@ -53,10 +53,6 @@ bool SharingDB::IsGood() const {
   return fake().sharingGood;
 }
 
-std::shared_ptr<Connection> SharingDB::Use() {
-  return nullptr;
-}
-
 EntryDB::EntryDB(SharingDB&) {}
 SessionDB::SessionDB(SharingDB&) {}
 TokenDB::TokenDB(SharingDB&) {}
@@ -108,6 +104,10 @@ LinkResult ChangeLink(const std::string& owner, int64_t id, const Json::Value& t
 LinkResult RemoveLink(const std::string& owner, int64_t id) {
   Json::Value nothing;
   return done("RemoveLink(" + owner + ", " + std::to_string(id) + ")", nothing);
+}
+
+LinkResult FindLink(const std::string& owner, const std::string& id, Json::Value& link) {
+  return done("FindLink(" + owner + ", " + id + ")", link);
 }
 
 LinkResult OpenLink(const std::string& id, const std::string& password, const std::string& address,

@@ -4,7 +4,6 @@
 #include <sys/types.h>
 
 #include <cstdint>
-#include <memory>
 #include <string>
 #include <utility>
 
@@ -131,18 +130,13 @@ class Token {
 
 namespace db {
 
-struct Connection;
-
-/// The sharing database. It is open while one of the objects below lives that was asked.
+/// The sharing database. Asking opens it; it is closed when QeloSharingIsAuthorized() has been
+/// asked, and before the process forks.
 class WEBAPI_API SharingDB {
  public:
   static SharingDB& Instance();
   /// Whether the database is there to be asked.
   bool IsGood() const;
-  std::shared_ptr<Connection> Use();
-
- private:
-  std::weak_ptr<Connection> connection_;
 };
 
 /// Look-ups; a record that is not found stays as it was, and the result is false.
@@ -151,26 +145,17 @@ class WEBAPI_API EntryDB {
   explicit EntryDB(SharingDB& db);
   /// @param hash  the id that a link's address ends with
   bool GetByHash(const std::string& hash, record::Entry& entry);
-
- private:
-  std::shared_ptr<Connection> connection_;
 };
 class WEBAPI_API SessionDB {
  public:
   explicit SessionDB(SharingDB& db);
   bool GetBySessionId(const std::string& id, record::Session& session);
-
- private:
-  std::shared_ptr<Connection> connection_;
 };
 class WEBAPI_API TokenDB {
  public:
   explicit TokenDB(SharingDB& db);
   bool GetBySessionEntry(const record::Session& session, const record::Entry& entry,
                          record::Token& token);
-
- private:
-  std::shared_ptr<Connection> connection_;
 };
 
 }  // namespace db
@@ -212,6 +197,10 @@ WEBAPI_API LinkResult ListLinks(const std::string& owner, Json::Value& links);
 WEBAPI_API LinkResult ChangeLink(const std::string& owner, int64_t id, const Json::Value& terms,
                                  Json::Value& link);
 WEBAPI_API LinkResult RemoveLink(const std::string& owner, int64_t id);
+/// The owner's link with an id.
+/// @param id    the one that its address ends with
+/// @param link  receives it, with that id as "link"
+WEBAPI_API LinkResult FindLink(const std::string& owner, const std::string& id, Json::Value& link);
 
 /// A visitor opens a link, which is one use of it.
 /// @param address  the client's

@@ -86,9 +86,12 @@ LinkStore::Result SqliteLinkStore::FindToken(int64_t session, int64_t link, int6
 
 void SqliteLinkStore::Extend(int64_t session, int64_t ends) {
   sqlite3_busy_timeout(database_, 0);
+  Transaction transaction(*this);
   Statement statement(Prepare("UPDATE sessions SET ends = ?2 WHERE id = ?1"));
   statement.Number(1, session).Number(2, ends);
-  statement.Run();
+  if (transaction.Begun() && statement.Run()) {
+    transaction.Commit();
+  }
 }
 
 LinkStore::Result SqliteLinkStore::List(uid_t owner, std::vector<StoredLink>& links) {

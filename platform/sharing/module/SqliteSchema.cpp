@@ -15,7 +15,6 @@
 namespace QELO::Platform {
 namespace {
 
-constexpr int kBusyMs = 2000;
 constexpr int kVersion = 1;
 /// Numbers of links and sessions are never given twice: what points to one that is gone points to
 /// nothing.
@@ -52,11 +51,9 @@ bool SqliteLinkStore::Open(const char* path, bool create) {
     error_ = strerror(errno);
     return false;
   }
-  if (!openOwnDatabase(path, kBusyMs, database_, error_)) {
+  if (!openOwnDatabase(path, database_, error_)) {
     return false;
   }
-  // Nor does each bring the log into the database, and onto the disk: those who write do.
-  sqlite3_db_config(database_, SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
   int64_t version = 0;
   if (!ReadVersion(version)) {
     return false;

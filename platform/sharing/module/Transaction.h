@@ -1,5 +1,6 @@
 #pragma once
 
+#include "platform/base/module/OwnDatabase.h"
 #include "platform/base/module/Statement.h"
 #include "platform/sharing/module/SqliteLinkStore.h"
 
@@ -22,14 +23,11 @@ class SqliteLinkStore::Transaction {
   Transaction& operator=(const Transaction&) = delete;
 
   bool Begun() const { return begun_; }
-  /// The log is emptied, unless others are at it: each process that opens the database reads it.
   bool Commit() {
     if (!Statement(store_.Prepare("COMMIT")).Run()) {
       return false;
     }
-    sqlite3_busy_timeout(store_.database_, 0);
-    sqlite3_wal_checkpoint_v2(store_.database_, nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr,
-                              nullptr);
+    emptyDatabaseLog(store_.database_);
     return true;
   }
 

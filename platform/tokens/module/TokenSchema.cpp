@@ -4,6 +4,8 @@
 
 #include <memory>
 
+#include "platform/base/module/OwnDatabase.h"
+
 namespace QELO::Platform {
 namespace {
 
@@ -51,6 +53,9 @@ bool TokenSchema::Bring(bool create, uid_t (*findUid)(const char* user), std::st
       error = sqlite3_errmsg(database_);
       Execute("ROLLBACK");
       return false;
+    }
+    if (done) {
+      emptyDatabaseLogAtClose(database_);
     }
   }
   error = !done                ? sqlite3_errmsg(database_)

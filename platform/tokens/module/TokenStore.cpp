@@ -18,7 +18,6 @@
 namespace QELO::Platform {
 namespace {
 
-constexpr int kBusyMs = 2000;
 constexpr int kHashSize = 32;  ///< bytes of a secretHash()
 
 struct Finalize {
@@ -97,12 +96,7 @@ bool TokenStore::Open(const char* path, bool create, FindUid findUid) {
     error_ = strerror(errno);
     return false;
   }
-  if (!openOwnDatabase(path, kBusyMs, database_, error_)) {
-    return false;
-  }
-  // What was logged ahead goes into the database when the last connection is closed, and the log is
-  // emptied then: else each process would do it anew, which is three waits for the disk.
-  return Execute("PRAGMA journal_size_limit=0") &&
+  return openOwnDatabase(path, database_, error_) &&
          TokenSchema(database_).Bring(create, findUid, error_);
 }
 
@@ -135,7 +129,7 @@ bool TokenStore::Create(Entry& entry, std::string& token) {
   }
   entry.id = sqlite3_last_insert_rowid(database_);
   token = secret;
-  return AddScopes(entry) && Execute("COMMIT");
+  return AddScopes(entry) && Commit();
 }
 
 bool TokenStore::AddScopes(const Entry& entry) {
@@ -198,9 +192,11 @@ void TokenStore::NoteUse(int64_t id, int64_t now) {
     const Statement statement(prepared);
     sqlite3_bind_int64(prepared, 1, id);
     sqlite3_bind_int64(prepared, 2, now);
-    sqlite3_step(prepared);
+    if (sqlite3_step(prepared) == SQLITE_DONE) {
+      emptyDatabaseLogAtClose(database_);
+    }
   }
-  sqlite3_busy_timeout(database_, kBusyMs);
+  sqlite3_busy_timeout(database_, kDatabasePatienceMs);
 }
 
 bool TokenStore::FindHash(int64_t id, int64_t now, unsigned char* hash) {
@@ -252,8 +248,7 @@ bool TokenStore::Revoke(int64_t id, const Owner* owner, bool& found) {
     return Fail();
   }
   found = sqlite3_changes(database_) > 0;
-  return Execute("DELETE FROM scopes WHERE token NOT IN (SELECT id FROM tokens)") &&
-         Execute("COMMIT");
+  return Execute("DELETE FROM scopes WHERE token NOT IN (SELECT id FROM tokens)") && Commit();
 }
 
 bool TokenStore::Prepare(const char* sql, sqlite3_stmt*& statement) {
@@ -262,6 +257,14 @@ bool TokenStore::Prepare(const char* sql, sqlite3_stmt*& statement) {
 
 bool TokenStore::Execute(const char* sql) {
   return sqlite3_exec(database_, sql, nullptr, nullptr, nullptr) == SQLITE_OK || Fail();
+}
+
+bool TokenStore::Commit() {
+  if (!Execute("COMMIT")) {
+    return false;
+  }
+  emptyDatabaseLogAtClose(database_);
+  return true;
 }
 
 bool TokenStore::Fail() {

@@ -85,6 +85,7 @@ class TokenStore {
   void NoteUse(int64_t id, int64_t now);
   bool Prepare(const char* sql, sqlite3_stmt*& statement);
   bool Execute(const char* sql);
+  bool Commit();
   bool Fail();
 
   sqlite3* database_ = nullptr;

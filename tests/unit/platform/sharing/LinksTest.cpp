@@ -134,6 +134,24 @@ TEST_F(Links, MissingOnesAreAbsent) {
   EXPECT_EQ(RemoveLink("alice", link["id"].asInt64()), LINK_ABSENT);
 }
 
+TEST_F(Links, AreFoundByTheirIdForTheirOwnerAlone) {
+  const std::string noSecret = kNoSecret;
+  Json::Value found;
+  EXPECT_EQ(FindLink("alice", noSecret, found), LINK_ABSENT);  // no database yet
+  const Json::Value link = Make(R"({"name": "n"})");
+  const std::string id = link["link"].asString();
+  ASSERT_EQ(FindLink("alice", id, found), LINK_DONE);
+  EXPECT_EQ(found, link);
+  found = Json::Value();
+  for (const std::string& wrong :
+       {noSecret, id.substr(1), id + "x", std::string(), std::string("1")}) {
+    EXPECT_EQ(FindLink("alice", wrong, found), LINK_ABSENT) << wrong;
+  }
+  EXPECT_EQ(FindLink("bob", id, found), LINK_ABSENT);
+  EXPECT_EQ(FindLink("zoe", id, found), LINK_FAILED);
+  EXPECT_TRUE(found.isNull());
+}
+
 TEST_F(Links, NumbersAreNotGivenTwice) {
   const Json::Value link = Make();
   ASSERT_EQ(RemoveLink("alice", link["id"].asInt64()), LINK_DONE);

@@ -1,11 +1,13 @@
 // The records of link, session and token that a request asks for; and the database when others hold
 // it.
 
-#include <sqlite3.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <chrono>
 #include <filesystem>
 
+#include "tests/unit/platform/DatabaseProgram.h"
 #include "tests/unit/platform/sharing/Fixture.h"
 
 using namespace QELO::sharing;
@@ -68,34 +70,68 @@ TEST_F(Records, ThatAreNotFoundStayAsTheyWere) {
   EXPECT_EQ(token.get_opened(), 0);
 }
 
-TEST_F(Records, DatabaseIsClosedWhenNobodyAsks) {
-  const Json::Value link = Make();
-  const auto openFiles = [] {
-    const std::filesystem::directory_iterator files("/proc/self/fd");
-    return std::distance(begin(files), end(files));
-  };
-  const auto before = openFiles();
-  {
-    db::EntryDB entries(database);
-    ASSERT_TRUE(entries.GetByHash(link["link"].asString(), entry));
-    EXPECT_GT(openFiles(), before);
+/// Descriptors of this process that lead to the database or its companions.
+int openFiles() {
+  int count = 0;
+  for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+    std::error_code gone;
+    const std::string file = std::filesystem::read_symlink(entry, gone);
+    count += file.find("sharing.db") != std::string::npos ? 1 : 0;
   }
-  EXPECT_EQ(openFiles(), before);
+  return count;
+}
+
+TEST_F(Records, AskingOnceOpensTheDatabaseForTheCheckToo) {
+  const Json::Value link = Make();
+  const std::string sid = SessionFor(link);
+  ASSERT_TRUE(db::EntryDB(database).GetByHash(link["link"].asString(), entry));
+  const int open = openFiles();
+  EXPECT_GT(open, 0);
+  ASSERT_TRUE(db::SessionDB(database).GetBySessionId(sid, session));
+  EXPECT_EQ(openFiles(), open);
+  ASSERT_EQ(remove(Path("modules/sharing.so").c_str()), 0);  // it could not be opened again
+  EXPECT_EQ(Ask(link, sid), 1);
+  EXPECT_EQ(openFiles(), 0);
+}
+
+TEST_F(Records, DatabaseIsClosedBeforeTheProcessForks) {
+  const Json::Value link = Make();
+  const std::string sid = SessionFor(link);
+  ASSERT_TRUE(db::EntryDB(database).GetByHash(link["link"].asString(), entry));
+  ASSERT_GT(openFiles(), 0);
+  const pid_t child = fork();
+  if (child == 0) {
+    _exit(openFiles() == 0 && Ask(link, sid) == 1 ? 0 : 1);
+  }
+  int status = -1;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  EXPECT_EQ(status, 0);
+  EXPECT_EQ(openFiles(), 0);
+  EXPECT_EQ(Ask(link, sid), 1);
+}
+
+TEST_F(Records, AnotherDatabaseInItsPlaceIsTheOneThatIsAsked) {
+  const Json::Value link = Make();
+  ASSERT_TRUE(db::EntryDB(database).GetByHash(link["link"].asString(), entry));
+  for (const char* file : {"", "-wal", "-shm"}) {
+    ASSERT_EQ(remove((Path(kDatabase) + file).c_str()), 0) << file;
+  }
+  const Json::Value other = Make();
+  EXPECT_FALSE(db::EntryDB(database).GetByHash(link["link"].asString(), entry));
+  EXPECT_TRUE(db::EntryDB(database).GetByHash(other["link"].asString(), entry));
 }
 
 TEST_F(Records, ThatOthersHoldAreWaitedForTwoSecondsAtMost) {
   const Json::Value link = Make();
   const std::string sid = SessionFor(link);
-  sqlite3* other = nullptr;
-  ASSERT_EQ(sqlite3_open(Path(kDatabase).c_str(), &other), SQLITE_OK);
-  ASSERT_EQ(sqlite3_exec(other, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr), SQLITE_OK);
+  const DatabaseProgram other(Path(kDatabase), "BEGIN IMMEDIATE");
+  ASSERT_EQ(other.Error(), "");
   // Who only asks waits for nobody, and who is half over is extended another time.
   EXPECT_EQ(Ask(link, sid), 1);
   const auto start = std::chrono::steady_clock::now();
   EXPECT_EQ(Open(link), LINK_FAILED);
   EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(8));
   EXPECT_EQ(SyslogCapture::Count("cannot open a sharing link [database is locked]"), 1);
-  sqlite3_close(other);
 }
 
 }  // namespace

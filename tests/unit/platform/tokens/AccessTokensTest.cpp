@@ -1,4 +1,3 @@
-#include <sqlite3.h>
 #include <sys/wait.h>
 #include <unistd.h>
 

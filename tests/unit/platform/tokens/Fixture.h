@@ -1,11 +1,11 @@
 #pragma once
 
-#include <sqlite3.h>
 #include <unistd.h>
 
 #include <string>
 
 #include "platform/tokens/module/TokenStore.h"
+#include "tests/unit/platform/DatabaseProgram.h"
 #include "tests/unit/platform/PrivateRoot.h"
 #include "webapi/platform/Token.h"
 
@@ -59,13 +59,7 @@ class TokenTest : public PrivateRoot {
   static uid_t NoUid(const char*) { return TokenStore::kNobody; }
 
   /// Runs SQL in the database as another program would.
-  static void Execute(const std::string& sql) {
-    sqlite3* database = nullptr;
-    ASSERT_EQ(sqlite3_open(Database().c_str(), &database), SQLITE_OK);
-    EXPECT_EQ(sqlite3_exec(database, sql.c_str(), nullptr, nullptr, nullptr), SQLITE_OK)
-        << sqlite3_errmsg(database);
-    sqlite3_close(database);
-  }
+  static void Execute(const std::string& sql) { EXPECT_EQ(runSql(Database(), sql), ""); }
 
   /// Takes the database back to its second version, which kept one API and method of a token.
   static void MakeSecond() {

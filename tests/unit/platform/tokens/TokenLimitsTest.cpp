@@ -1,9 +1,8 @@
 // What a token is for, from where, and when it was used.
 
-#include <sqlite3.h>
-
 #include <chrono>
 
+#include "tests/unit/platform/DatabaseProgram.h"
 #include "tests/unit/platform/tokens/Fixture.h"
 
 namespace {
@@ -84,13 +83,11 @@ TEST_F(TokenLimits, LastUseIsKeptByTheMinute) {
 
 TEST_F(TokenLimits, LastUseIsLeftOutWhileSomebodyElseWrites) {
   const std::string token = Create();
-  sqlite3* database = nullptr;
-  ASSERT_EQ(sqlite3_open(Database().c_str(), &database), SQLITE_OK);
-  ASSERT_EQ(sqlite3_exec(database, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr), SQLITE_OK);
+  const DatabaseProgram other(Database(), "BEGIN IMMEDIATE");
+  ASSERT_EQ(other.Error(), "");
   const auto start = std::chrono::steady_clock::now();
   EXPECT_EQ(Grant(token), 1);
   EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(1500));
-  sqlite3_close(database);
 }
 
 }  // namespace
