@@ -9,6 +9,8 @@
 
 #include <string>
 
+#include "QrCode.h"
+
 namespace {
 
 using QELO::APIRequest;
@@ -29,7 +31,8 @@ enum Error : int {
   kWrongPassword = 404,
   kNotPost = 405,
   kTooManyLinks = 406,
-  kTooManyAttempts = 407
+  kTooManyAttempts = 407,
+  kTooLong = 408
 };
 
 int ErrorOf(SharingLink::Result result) {
@@ -136,6 +139,28 @@ void Remove(APIRequest* request, APIResponse* response) {
   Answer(response, SharingLink::Remove(*request, id.Get()), Json::Value());
 }
 
+/// The address of a link as a picture, for a telephone's camera.
+void Qr(APIRequest* request, APIResponse* response) {
+  Json::Value link;
+  const SharingLink::Result result =
+      SharingLink::Find(*request, JsonHelper::asString(request->GetParam("link")), link);
+  if (result != SharingLink::LINK_OK) {
+    response->SetError(ErrorOf(result));
+    return;
+  }
+  AddAddress(*request, link);
+  Json::Value data(Json::objectValue);
+  std::string svg;
+  if (!share::drawQrCode(JsonHelper::asString(link["url"]), svg)) {
+    response->SetError(kTooLong);
+    return;
+  }
+  data["id"] = link["id"];
+  data["url"] = link["url"];
+  data["svg"] = svg;
+  response->SetSuccess(data);
+}
+
 void AddSessionCookie(const APIRequest& request, APIResponse* response, const std::string& sid) {
   const bool isSecure = request.GetURLProto("") == "https";
   if (!response->AddCookie(kCookie, sid, "/", 0, "", isSecure, true)) {
@@ -181,8 +206,9 @@ int CheckOwner(APIRequest* request, APIResponse* response) {
 }
 
 QELO::_tag_API_TABLE table[] = {
-    {kApi, 1, "create", Create}, {kApi, 1, "list", List}, {kApi, 1, "change", Change},
-    {kApi, 1, "remove", Remove}, {kApi, 1, "open", Open}, {nullptr, 0, nullptr, nullptr},
+    {kApi, 1, "create", Create},    {kApi, 1, "list", List}, {kApi, 1, "change", Change},
+    {kApi, 1, "remove", Remove},    {kApi, 1, "qr", Qr},     {kApi, 1, "open", Open},
+    {nullptr, 0, nullptr, nullptr},
 };
 
 QELO::_tag_API_CHECK_TABLE checkTable[] = {
@@ -190,6 +216,7 @@ QELO::_tag_API_CHECK_TABLE checkTable[] = {
     {kApi, 1, "list", CheckOwner, {nullptr, nullptr}},
     {kApi, 1, "change", CheckOwner, {nullptr, nullptr}},
     {kApi, 1, "remove", CheckOwner, {nullptr, nullptr}},
+    {kApi, 1, "qr", CheckOwner, {nullptr, nullptr}},
     {nullptr, 0, nullptr, nullptr, {nullptr, nullptr}},
 };
 

@@ -41,6 +41,10 @@ class WEBAPI_API SharingLink {
   static Result Change(const APIRequest& request, int64_t id, const Json::Value& terms,
                        Json::Value& link);
   static Result Remove(const APIRequest& request, int64_t id);
+  /// The one with an id.
+  /// @param id    the secret that the link's address ends with
+  /// @param link  receives what it is, with that secret as "link"
+  static Result Find(const APIRequest& request, const std::string& id, Json::Value& link);
 
   /// Opens a link for whoever sends the request; one line to the authorisation facility says what
   /// came of it.

@@ -62,6 +62,11 @@ SharingLink::Result SharingLink::Remove(const APIRequest& request, int64_t id) {
   return resultOf(sharing::RemoveLink(request.GetLoginUserName(), id));
 }
 
+SharingLink::Result SharingLink::Find(const APIRequest& request, const std::string& id,
+                                      Json::Value& link) {
+  return resultOf(sharing::FindLink(request.GetLoginUserName(), id, link));
+}
+
 SharingLink::Result SharingLink::Open(const APIRequest& request, const std::string& id,
                                       const std::string& password, Json::Value& visit) {
   const std::string address = request.GetRemoteIP();

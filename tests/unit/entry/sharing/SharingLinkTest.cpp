@@ -40,9 +40,11 @@ TEST_F(SharingLinks, AreTheRequestsUsers) {
   EXPECT_EQ(SharingLink::Change(*Request(), 7, terms, made), SharingLink::LINK_OK);
   EXPECT_EQ(SharingLink::List(*Request(), made), SharingLink::LINK_OK);
   EXPECT_EQ(SharingLink::Remove(*Request(), 7), SharingLink::LINK_OK);
-  EXPECT_EQ(platform->calls, (std::vector<std::string>{"CreateLink(ann, {\"project\":\"p\"})",
-                                                       "ChangeLink(ann, 7, {\"project\":\"p\"})",
-                                                       "ListLinks(ann)", "RemoveLink(ann, 7)"}));
+  EXPECT_EQ(SharingLink::Find(*Request(), "secret", made), SharingLink::LINK_OK);
+  EXPECT_EQ(platform->calls,
+            (std::vector<std::string>{"CreateLink(ann, {\"project\":\"p\"})",
+                                      "ChangeLink(ann, 7, {\"project\":\"p\"})", "ListLinks(ann)",
+                                      "RemoveLink(ann, 7)", "FindLink(ann, secret)"}));
 }
 
 TEST_F(SharingLinks, ResultsAreThePlatforms) {
