@@ -1,9 +1,10 @@
 // Enciphers parameter lines for the web API, with what browsers and node bring along. See
 // docs/ciphers.md for what an envelope is, and what it is good for.
 //
-//   import { encipherForHost, encipherWithToken } from './envelope.mjs';
+//   import { encipherForHost, encipherWithToken, hostKey } from './envelope.mjs';
+//   const { key, now } = await hostKey('/webapi/entry.cgi');
 //   fetch('/webapi/entry.cgi', { method: 'POST', body: new URLSearchParams({
-//     __cIpHeRtExT: await encipherForHost(publicKeyPem, 'api=...&version=1&method=...') }) });
+//     __cIpHeRtExT: await encipherForHost(key, 'api=...&version=1&method=...', now()) }) });
 
 const { subtle } = globalThis.crypto;
 const bytesOf = (text) => new TextEncoder().encode(text);
@@ -47,6 +48,20 @@ async function seal(algorithm, enciphered, key, line, seconds) {
 }
 
 const now = () => Math.floor(Date.now() / 1000);
+
+/**
+ * The host's public key, and its clock. Whoever can change the answer on its way can give another key:
+ * ask by https, or compare the key with one that is known.
+ * @param {string} url  of the host's entry.cgi
+ * @return {Promise<{key: string, now: function(): number}>}
+ */
+export async function hostKey(url) {
+  const call = new URLSearchParams({ api: 'QELO.Access.Cipher', version: 1, method: 'get' });
+  const answer = await (await fetch(url, { method: 'POST', body: call })).json();
+  if (!answer.success) throw new Error(`the host has no key: error ${answer.error.code}`);
+  const ahead = answer.data.time - now();
+  return { key: answer.data.key, now: () => now() + ahead };
+}
 
 /**
  * The value of "__cIpHeRtExT".

@@ -7,6 +7,7 @@
 
 #include "platform/base/ModuleLoader.h"
 #include "platform/base/Paths.h"
+#include "platform/base/TextBuffer.h"
 #include "platform/ciphers/Envelope.h"
 #include "platform/ciphers/ReplayTable.h"
 #include "platform/settings/Settings.h"
@@ -26,11 +27,17 @@ constexpr char kName[] = "__cIpHeRtExT";
 constexpr char kForPrivateKey[] = "RSA-OAEP-256";
 constexpr char kForKeyText[] = "dir";
 constexpr size_t kLargestKeyFile = 16384;  // bytes
+constexpr char kNoPrivateKey[] = "the private key is missing, or others may read or write it";
 
 /// Logged for the administrator alone: who sent it learns that it failed and no more.
 bool refuse(const char* reason) {
   WEBAPI_LOG(kSource, "no envelope was opened: %s", LogText(reason).c_str());
   return false;
+}
+
+int refuseKey(const char* reason) {
+  WEBAPI_LOG(kSource, "no public key was given out: %s", reason);
+  return -1;
 }
 
 bool isName(std::string_view text) {
@@ -81,7 +88,7 @@ bool readPrivateKey(std::string& pem) {
 bool openForUs(std::string_view text, std::string& plain) {
   std::string pem;
   if (!readPrivateKey(pem)) {
-    return refuse("the private key is missing, or others may read or write it");
+    return refuse(kNoPrivateKey);
   }
   const auto open =
       reinterpret_cast<OpenByPrivateKey>(findInModule(kCipherModule, kOpenByPrivateKey));
@@ -170,6 +177,19 @@ int QeloCgiDecryptParam(char* text) {
   }
   memcpy(text, plain.c_str(), plain.size() + 1);
   return 1;
+}
+
+int QeloCgiGetPublicKey(char* text, int size) {
+  fillBuffer("", text, size);
+  std::string pem;
+  std::string found;
+  if (!readPrivateKey(pem)) {
+    return refuseKey(kNoPrivateKey);
+  }
+  const auto find = reinterpret_cast<FindPublicKey>(findInModule(kCipherModule, kFindPublicKey));
+  const bool good = find != nullptr && find(pem, &found) && fillBuffer(found, text, size);
+  std::fill(pem.begin(), pem.end(), '\0');
+  return good ? 0 : refuseKey("the private key is of no use");
 }
 
 }  // extern "C"

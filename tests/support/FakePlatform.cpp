@@ -257,6 +257,13 @@ int QeloCgiDecryptParam(char* text) {
   return fake().decryptParam ? fake().decryptParam(text) : 0;
 }
 
+int QeloCgiGetPublicKey(char* text, int size) {
+  note("QeloCgiGetPublicKey");
+  const std::string& key = fake().publicKey;
+  text[key.copy(text, static_cast<size_t>(size) - 1)] = '\0';
+  return key.empty() ? -1 : 0;
+}
+
 int QeloLoginAttempt(const char* address, const char* account) {
   note("QeloLoginAttempt", address, account);
   return fake().loginAttempt;

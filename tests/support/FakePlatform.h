@@ -56,6 +56,7 @@ struct FakePlatform {
   std::string loadedCookies;  ///< HTTP_COOKIE at the last QeloCgiLoadInCookies
   int detectResult = 1;
   std::function<int(char*)> decryptParam;
+  std::string publicKey;  ///< of QeloCgiGetPublicKey(); "": there is none
 
   // Credentials and tokens
   bool credentialResult = true;

@@ -54,6 +54,10 @@ WEBAPI_API unsigned int QeloCgiUIDGet(const char* sessionId, const char* user);
 
 /// Deciphers a parameter line in place when it is enciphered. @return 0 on failure
 WEBAPI_API int QeloCgiDetectAndDecryptParamLine(char* line);
+/// The public key that envelopes for this host are made for, as PEM.
+/// @param size  bytes of the buffer; 4,096 hold every key
+/// @return 0; else -1 and an empty text: the host has none, or the caller may not read it
+WEBAPI_API int QeloCgiGetPublicKey(char* text, int size);
 /// Deciphers a "__cIpHeRtExT" value in place. @return 0 on failure
 WEBAPI_API int QeloCgiDecryptParam(char* text);
 

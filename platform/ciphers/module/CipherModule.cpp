@@ -11,6 +11,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <memory>
+#include <utility>
 #include <vector>
 
 #include "webapi/Export.h"
@@ -98,15 +99,22 @@ bool open(const CipherText& envelope, const Bytes& key, std::string& plain) {
          decipher(envelope, key, plain);
 }
 
-/// @return false when the private key is of no use. A content key that cannot be deciphered becomes
-/// a
-///         random one: its sender must not learn what was wrong with it.
-bool readContentKey(const std::string& pem, const std::string& enciphered, Bytes& key) {
+/// @return null when it is of no use
+Owned<EVP_PKEY> readPrivateKey(const std::string& pem) {
   const Owned<BIO> bio(BIO_new_mem_buf(pem.data(), static_cast<int>(pem.size())));
-  const Owned<EVP_PKEY> rsa(
-      bio != nullptr ? PEM_read_bio_PrivateKey(bio.get(), nullptr, nullptr, nullptr) : nullptr);
-  if (rsa == nullptr || EVP_PKEY_get_base_id(rsa.get()) != EVP_PKEY_RSA ||
-      EVP_PKEY_get_bits(rsa.get()) < kLeastBits) {
+  Owned<EVP_PKEY> rsa(bio != nullptr ? PEM_read_bio_PrivateKey(bio.get(), nullptr, nullptr, nullptr)
+                                     : nullptr);
+  return rsa != nullptr && EVP_PKEY_get_base_id(rsa.get()) == EVP_PKEY_RSA &&
+                 EVP_PKEY_get_bits(rsa.get()) >= kLeastBits
+             ? std::move(rsa)
+             : nullptr;
+}
+
+/// @return false when the private key is of no use. A content key that cannot be deciphered becomes
+/// a random one: its sender must not learn what was wrong with it.
+bool readContentKey(const std::string& pem, const std::string& enciphered, Bytes& key) {
+  const Owned<EVP_PKEY> rsa = readPrivateKey(pem);
+  if (rsa == nullptr) {
     return false;
   }
   const Owned<EVP_PKEY_CTX> context(EVP_PKEY_CTX_new(rsa.get(), nullptr));
@@ -153,6 +161,18 @@ extern "C" WEBAPI_API bool webapiOpenByPrivateKey(const std::string& pem,
                                                   const CipherText& envelope, std::string* plain) {
   Bytes key;
   return readContentKey(pem, envelope.key, key) && open(envelope, key, *plain);
+}
+
+extern "C" WEBAPI_API bool webapiFindPublicKey(const std::string& pem, std::string* publicPem) {
+  const Owned<EVP_PKEY> rsa = readPrivateKey(pem);
+  const Owned<BIO> written(BIO_new(BIO_s_mem()));
+  char* text = nullptr;
+  if (rsa == nullptr || written == nullptr || PEM_write_bio_PUBKEY(written.get(), rsa.get()) != 1) {
+    return false;
+  }
+  const long size = BIO_get_mem_data(written.get(), &text);
+  publicPem->assign(text, static_cast<size_t>(size));
+  return true;
 }
 
 extern "C" WEBAPI_API bool webapiOpenByKeyText(const std::string& keyText,

@@ -23,6 +23,10 @@ using OpenByPrivateKey = bool (*)(const std::string& pem, const CipherText& enve
 /// Opens an envelope whose content key both sides derive from a text, by HKDF with SHA-512.
 using OpenByKeyText = bool (*)(const std::string& keyText, const CipherText& envelope,
                                std::string* plain);
+/// The public half of a private key that OpenByPrivateKey takes.
+/// @param publicPem  receives it; unchanged on failure
+/// @return false when the key is of no use
+using FindPublicKey = bool (*)(const std::string& pem, std::string* publicPem);
 /// The text that stands for a secret of 32 bytes as a key: 32 characters, 24 bytes of HKDF with
 /// SHA-256 as base64url.
 /// @param text  receives it
@@ -30,6 +34,7 @@ using DeriveKeyText = bool (*)(const unsigned char* secret, std::string* text);
 
 inline constexpr char kCipherModule[] = "ciphers.so";
 inline constexpr char kOpenByPrivateKey[] = "webapiOpenByPrivateKey";
+inline constexpr char kFindPublicKey[] = "webapiFindPublicKey";
 inline constexpr char kOpenByKeyText[] = "webapiOpenByKeyText";
 inline constexpr char kDeriveKeyText[] = "webapiDeriveKeyText";
 

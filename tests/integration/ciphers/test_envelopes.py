@@ -4,6 +4,7 @@ opens them: the openssl command and node."""
 import json
 import shutil
 import subprocess
+import time
 from urllib.parse import urlencode
 
 import pytest
@@ -128,3 +129,34 @@ def test_ForeignEnvelopes_EndTheCall(client, alice, public_key, token):
         body = urlencode({"__nEkOtReHpIc": number, "__tXeTrEhPiC": envelope})
         assert client.post(body).code == 101
     assert client.post(urlencode({"__cIpHeRtExT": good})).data["user"] == "alice"
+
+
+def test_PublicKey_IsGivenToEverybody(client, public_key):
+    data = client.call("QELO.Access.Cipher", "get").data
+    assert data["key"] == public_key.read_text()
+    assert (data["alg"], data["enc"]) == ("RSA-OAEP-256", "A256CBC-HS512")
+    assert abs(data["time"] - time.time()) < 30
+
+
+def test_PublicKey_OfAHostWithoutOne_Is400(client, public_key):
+    private = ROOT / "etc/webapi/cipher.pem"
+    private.rename(private.with_suffix(".away"))
+    try:
+        assert client.call("QELO.Access.Cipher", "get").code == 400
+    finally:
+        private.with_suffix(".away").rename(private)
+
+
+@pytest.mark.skipif(shutil.which("node") is None, reason="node is not installed")
+def test_Page_AsksForTheKeyAndEnciphersForIt(client, alice, public_key):
+    """The example module, by itself: the host's key, its clock, an envelope and the call."""
+    script = (f"import {{ encipherForHost, hostKey }} from '{EXAMPLES}/envelope.mjs';"
+              "const [url, line] = process.argv.slice(1);"
+              "const clock = Date.now; Date.now = () => clock() - 3_600_000;"  # an hour slow
+              "const { key, now } = await hostKey(url);"
+              "const body = new URLSearchParams({ __cIpHeRtExT: await encipherForHost(key, line, now()) });"
+              "console.log(await (await fetch(url, { method: 'POST', body })).text());")
+    output = subprocess.run(
+        ["node", "--input-type=module", "-e", script, f"http://127.0.0.1:{client.port}/webapi/entry.cgi",
+         CALL + f"_sid={alice['sid']}"], check=True, capture_output=True, text=True).stdout
+    assert json.loads(output)["data"]["user"] == "alice"
