@@ -2,12 +2,14 @@
 
 #include <webapi/APIUpload.h>
 #include <webapi/JsonHelper.h>
+#include <webapi/SharingLink.h>
 #include <webapi/WebAPIError.h>
 
 #include "calls/Call.h"
 #include "calls/ItemJson.h"
 #include "calls/Methods.h"
 #include "calls/ReadExisting.h"
+#include "sharing/Scope.h"
 #include "transfer/Placing.h"
 
 namespace files {
@@ -25,6 +27,18 @@ struct Target {
   std::string name;  ///< of the one file; "": as the client calls it
 };
 
+/// Whether a visitor by a sharing link may bring files there: into what is shared, and in nobody's
+/// place. The link's check knew the address alone, not the form.
+bool mayBring(Call& call, const Target& target) {
+  const Json::Value link = QELO::SharingLink::Of(call.Request());
+  const std::string shared = QELO::JsonHelper::asString(QELO::JsonHelper::member(link, "path"));
+  if (!isWithin(target.path.Text(), shared) || target.existing == Existing::kReplace) {
+    call.Response().SetError(QELO::WEBAPI_ERR_SHARING_APPLICATION);
+    return false;
+  }
+  return true;
+}
+
 /// @return false when it was refused, which is the answer
 bool readTarget(Call& call, Target& target) {
   const auto name = call.Request().GetAndCheckString("name", APIRequest::PARAM_OPTIONAL);
@@ -32,7 +46,9 @@ bool readTarget(Call& call, Target& target) {
     return call.RefuseParameters();
   }
   target.name = name.Get();
-  return call.ReadPath("path", target.path) && call.OpenFolderForChange(target.path, target.folder);
+  return call.ReadPath("path", target.path) &&
+         (!call.Request().IsSharing() || mayBring(call, target)) &&
+         call.OpenFolderForChange(target.path, target.folder);
 }
 
 /// Whether a file may come to this name. @return false when it was refused, which is the answer
