@@ -118,6 +118,10 @@ bool InitCredentialsByExecutable(const char* path, bool keepPrivilege) {
     errno = EPERM;
     return false;
   }
+  // Root's groups decide nothing.
+  if (keepPrivilege && info.st_uid == 0 && geteuid() == 0) {
+    return getegid() == 0 || setresgid(kSameGid, 0, kSameGid) == 0;
+  }
   Account account;
   if (findAccountById(info.st_uid, account) != Lookup::kFound) {
     WEBAPI_LOG(kSource, "the owner of %s is no account: user id %u", QELO::LogText(path).c_str(),

@@ -3,6 +3,8 @@
 #include <dlfcn.h>
 #include <regex.h>
 
+#include <string_view>
+
 #include "webapi/APIRequest.h"
 #include "webapi/base/Log.h"
 #include "webapi/base/Text.h"
@@ -22,13 +24,38 @@ bool isEmpty(const char* pattern) {
   return pattern == nullptr || *pattern == '\0';
 }
 
+/// A whole name: "^", letters, digits, "_", "-" and dots as "[.]", "$". Most are of this kind, and
+/// to compile one costs more than all the rest of a table.
+/// @return false when the pattern is of another kind
+bool readWholeName(const char* pattern, std::string& name) {
+  constexpr std::string_view kDot = "[.]";
+  std::string_view rest(pattern);
+  if (rest.size() < 2 || rest.front() != '^' || rest.back() != '$') {
+    return false;
+  }
+  rest = rest.substr(1, rest.size() - 2);
+  while (!rest.empty()) {
+    const bool isDot = rest.starts_with(kDot);
+    const char c = isDot ? '.' : rest.front();
+    if (!isDot && !IsAlphanumeric(c) && c != '_' && c != '-') {
+      return false;
+    }
+    name += c;
+    rest.remove_prefix(isDot ? kDot.size() : 1);
+  }
+  return true;
+}
+
 }  // namespace
 
 std::string CheckLibraries::GetSharingCheckLibPath(APIRequest* request) {
-  const std::string project =
-      request != nullptr ? request->GetSharingEntry().get_project_name() : "";
-  // No other name leads to this directory alone.
-  return IsProjectName(project) ? Paths::kSharingCheckDir + project + ".so" : "";
+  if (request == nullptr) {
+    return "";
+  }
+  const std::string project = request->GetSharingEntry().get_project_name();
+  const bool leadsElsewhere =
+      project.find("../") != std::string::npos || project.find('\0') != std::string::npos;
+  return leadsElsewhere ? "" : Paths::kSharingCheckDir + project + ".so";
 }
 
 bool CheckLibraries::OpenSharingCheckLib(APIRequest* request,
@@ -110,6 +137,10 @@ bool CheckLibraries::GetSharingCheckFunc(APIRequest* request, _tag_API_SHARING_C
 int CheckLibraries::RegexMatch(const char* pattern, const char* subject) {
   if (pattern[0] == '*' && pattern[1] == '\0') {
     return 0;
+  }
+  std::string name;
+  if (readWholeName(pattern, name)) {
+    return name == subject ? 0 : REG_NOMATCH;
   }
   regex_t expression;
   const int fault = regcomp(&expression, pattern, REG_EXTENDED);

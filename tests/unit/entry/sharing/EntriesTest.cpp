@@ -92,6 +92,27 @@ TEST(RegexMatch, StarMatchesAnything) {
   EXPECT_EQ(LinkEntry<WebEntry>::RegexMatch("*", "anything"), 0);
 }
 
+TEST(RegexMatch, WholeNamesAreComparedAsTheHostWould) {
+  const char* subjects[] = {"QELO.Files.Item",   "QELO.Files.Items",
+                            "xQELO.Files.Item",  "QELO-Files_2",
+                            "QELOxFiles.Item",   "",
+                            "QELO.Files.Item\n", "[.]"};
+  for (const char* pattern :
+       {"^QELO[.]Files[.]Item$", "^QELO-Files_2$", "^$", "^[.]$", "^QELO.Files.Item$", "^[.$",
+        "^$$", "^^$", "QELO[.]Files[.]Item$", "^QELO[.]Files[.]Item", "^a|b$", "^x*$", "^", "$"}) {
+    regex_t expression;
+    const int fault = regcomp(&expression, pattern, REG_EXTENDED);
+    for (const char* subject : subjects) {
+      const int hosts = fault != 0 ? fault : regexec(&expression, subject, 0, nullptr, 0);
+      EXPECT_EQ(LinkEntry<WebEntry>::RegexMatch(pattern, subject), hosts)
+          << pattern << " " << subject;
+    }
+    if (fault == 0) {
+      regfree(&expression);
+    }
+  }
+}
+
 TEST(RegexMatch, AnswersTheHostsResult) {
   EXPECT_EQ(LinkEntry<WebEntry>::RegexMatch("^a+$", "aaa"), 0);
   EXPECT_EQ(LinkEntry<WebEntry>::RegexMatch("^a+$", "aab"), REG_NOMATCH);

@@ -27,12 +27,17 @@ TEST_F(LinkLibrary, StandsInTheFixedDirectoryUnderTheProjectsName) {
   EXPECT_EQ(PathOf(std::string(64, 'x')), Paths::kSharingCheckDir + std::string(64, 'x') + ".so");
 }
 
+TEST_F(LinkLibrary, OfAnyProjectWithinTheDirectoryIsItsName) {
+  for (const std::string project :
+       {"a/b", "/files", "..", ".files", "", "a b", "\xC3\xA4", "a..b"}) {
+    EXPECT_EQ(PathOf(project), Paths::kSharingCheckDir + project + ".so");
+  }
+}
+
 TEST_F(LinkLibrary, ProjectThatLeadsElsewhereHasNone) {
-  for (const char* project : {"../files", "a/../../files", "a/b", "/files", "..", ".files", "",
-                              "a b", "a\nb", "a\\b", "\xC3\xA4"}) {
+  for (const char* project : {"../files", "a/../../files", "../", "a../b"}) {
     EXPECT_EQ(PathOf(project), "") << project;
   }
-  EXPECT_EQ(PathOf(std::string(65, 'x')), "");
   EXPECT_EQ(PathOf(std::string("a\0b", 3)), "");
   EXPECT_EQ(entry->GetSharingCheckLibPath(nullptr), "");
 }
