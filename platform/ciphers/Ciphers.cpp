@@ -36,7 +36,7 @@ bool refuse(const char* reason) {
 }
 
 int refuseKey(const char* reason) {
-  WEBAPI_LOG(kSource, "no public key was given out: %s", reason);
+  WEBAPI_LOG(kSource, "no public key was given out: %s", LogText(reason).c_str());
   return -1;
 }
 

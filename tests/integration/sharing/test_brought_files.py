@@ -7,8 +7,7 @@ import pytest
 
 from accounts import account
 from conftest import ROOT
-from shared_folder import folder  # noqa: F401
-from sharing import Visitor, alice, bob, stranger, visit  # noqa: F401
+from sharing import Visitor, alice, bob, folder, stranger, visit  # noqa: F401
 from upload import TYPE, Form
 
 API = "QELO.Files.Item"

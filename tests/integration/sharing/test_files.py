@@ -5,8 +5,7 @@ import json
 import pytest
 
 from conftest import ROOT
-from shared_folder import folder  # noqa: F401
-from sharing import Visitor, alice, stranger, visit  # noqa: F401
+from sharing import Visitor, alice, folder, stranger, visit  # noqa: F401
 
 API = "QELO.Files.Item"
 
