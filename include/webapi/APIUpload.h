@@ -32,6 +32,9 @@ class APIUploadPrivate;
 ///       }
 ///     }
 ///
+/// PARTIAL ends the loop when a client sends one large file in several requests, as
+/// docs/uploads.md tells, and this was not the last: GetSlice() is the answer then.
+///
 /// A temporary file is the account's that the method runs as, with mode 0600. It is removed when
 /// the method has ended, before its answer is printed, unless the method has renamed it; and it is
 /// locked (flock) as long as the process lives.
@@ -93,6 +96,10 @@ class WEBAPI_API APIUpload {
   /// The field and the name of that file; "" when there is none.
   std::string GetFileField() const;
   std::string GetFileName() const;
+
+  /// Of a request with a slice of a file, how much there is of that: {"received", "size"}, in
+  /// bytes; null for all others. It is the answer to PARTIAL, and belongs beside WRONG_SLICE.
+  Json::Value GetSlice() const;
 
   /// All files of the request that have been loaded, in the order of their fields' names or, with
   /// "deferUpload", in the order in which they came: a list of objects {"field", "name", "path",

@@ -1,6 +1,5 @@
 // The loaders of the seam, over the one upload of the process.
 
-#include <strings.h>
 #include <unistd.h>
 
 #include <cstdio>
@@ -13,7 +12,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/multipart/PartialFile.h"
+#include "platform/multipart/SliceIntake.h"
 #include "platform/multipart/Upload.h"
 #include "platform/settings/Settings.h"
 #include "webapi/base/FileIdentity.h"
@@ -24,15 +23,15 @@ using namespace QELO::Platform;
 
 namespace {
 
+constexpr uid_t kNobody = static_cast<uid_t>(-1);
+
 /// What a process has of uploads. At its end the files go, also when a method calls exit().
 struct State {
   std::unique_ptr<Upload> upload;
   std::optional<Body> body;  ///< one that is no form
   std::optional<FileOwner> owner;
-  std::optional<uid_t> caller;
-  std::optional<Slice> slice;  ///< that was loaded
-  uint64_t received = 0;       ///< of its file
-  QELO::FileIdentity input;    ///< where standard input leads to while it is this upload's
+  SliceIntake slices;
+  QELO::FileIdentity input;  ///< where standard input leads to while it is this upload's
 };
 
 State& state() {
@@ -51,9 +50,8 @@ State& stateOfInput() {
   if (!own.input.IsAt(STDIN_FILENO)) {
     own.upload.reset();
     own.body.reset();
+    own.slices.Reset();
     own.input = QELO::FileIdentity(STDIN_FILENO);
-    own.slice.reset();
-    own.received = 0;
   }
   return own;
 }
@@ -74,10 +72,24 @@ Upload& upload() {
 }
 
 /// Nothing later in the process waits for more of a body that has arrived.
-void closeReceived(const Upload& current) {
-  if (current.IsReceived()) {
+void closeReceived() {
+  const Upload* current = state().upload.get();
+  if (current != nullptr && current->IsReceived()) {
     QELO::PutNullOver({STDIN_FILENO}, O_RDONLY);
     state().input = QELO::FileIdentity(STDIN_FILENO);
+  }
+}
+
+/// Does what a loader does. Without memory the upload has failed, and nothing is thrown at those
+/// who call by C's rules.
+template <typename Call>
+int guarded(Call call) noexcept {
+  try {
+    return call(upload());
+  } catch (const std::exception&) {
+    State& own = state();
+    return own.upload != nullptr ? own.upload->Fail(QELO_UPLOAD_NO_MEMORY)
+                                 : static_cast<int>(QELO_UPLOAD_NO_MEMORY);
   }
 }
 
@@ -100,10 +112,15 @@ bool copyText(const std::string& text, char* buffer, int size) {
   return snprintf(buffer, static_cast<size_t>(size), "%s", text.c_str()) < size;
 }
 
-void tell(const Upload& current, QeloCgiUploadState& told) {
-  told.total = current.Length();
-  told.left = current.Length() - current.Position();
-  told.result = current.Result();
+/// Ends a loader of a method that reads its upload itself. @return the result
+int tell(int result, QeloCgiUploadState& told) {
+  if (Upload* current = state().upload.get(); current != nullptr) {
+    current->SetProgress(nullptr);
+    told.total = current->Length();
+    told.left = current->Length() - current->Position();
+  }
+  closeReceived();
+  return told.result = result;
 }
 
 struct LoadedFile {
@@ -135,68 +152,75 @@ int keepAll(Upload& current, const std::vector<LoadedFile>& loaded, QLIBSZHASH**
     // Behind the fields: of two with one name it is the file's that counts.
     if (!intoHash(parameters)(loaded[at].key, loaded[at].name) ||
         !intoHash(files)(loaded[at].key, paths[at])) {
-      QLIBCHashRemoveAll(*files);
       return current.Fail(QELO_UPLOAD_NO_MEMORY);
     }
   }
   return current.Result();
 }
 
-/// Without a word of which slice of what it is, a file is a whole one.
-bool isSlice() {
-  return strcasecmp(variable("HTTP_X_TYPE_NAME").c_str(), "SLICEUPLOAD") == 0 &&
-         !(variable("HTTP_X_UPLOAD_ID").empty() && variable("HTTP_X_FILE_SIZE").empty() &&
-           variable("HTTP_X_SLICE_OFFSET").empty());
-}
-
-/// Adds the file that was found to the one that it is a slice of.
-/// @param whole  receives that one, when this was the rest of it
-int addSlice(Upload& current, const Slice& slice, const char* directory,
-             std::unique_ptr<TemporaryFile>& whole) {
-  std::unique_ptr<PartialFile> file;
-  if (const int fault =
-          PartialFile::Open(*state().caller, slice, directory, state().received, file);
-      fault != 0) {
-    return current.Fail(fault);
+/// Reads what stands behind a slice that was not the last.
+int endSlice(Upload& current, QLIBSZHASH** parameters) {
+  if (current.ReadFields(intoHash(parameters)) != QELO_UPLOAD_DONE) {
+    return current.Result();
   }
-  current.ReadInto([&](std::string_view bytes) { return file->Write(bytes); });
-  state().received = file->Received();
-  if (current.Result() == QELO_UPLOAD_DONE && file->IsWhole()) {
-    whole = file->Finish(state().owner);
-    return whole != nullptr ? current.Result() : current.Fail(QELO_UPLOAD_NO_FILE);
-  }
-  return current.Result();
+  return current.PendingFile() != nullptr ? current.Fail(QELO_UPLOAD_MALFORMED)
+                                          : static_cast<int>(QELO_UPLOAD_PARTIAL);
 }
 
 /// Loads a body that has one slice, or none: then it asks how much there is.
 int loadSlice(Upload& current, const char* directory, QLIBSZHASH** parameters,
               std::vector<LoadedFile>& loaded) {
-  const std::optional<Slice> slice = readSlice();
-  if (!slice || !state().caller) {
-    return current.Fail(QELO_UPLOAD_WRONG_SLICE);
+  if (const int fault = state().slices.Open(); fault != 0) {
+    return current.Fail(fault);
   }
-  state().slice = slice;
   if (current.ReadFields(intoHash(parameters)) != QELO_UPLOAD_DONE) {
     return current.Result();
   }
-  std::unique_ptr<TemporaryFile> whole;
   if (current.PendingFile() == nullptr) {
-    std::unique_ptr<PartialFile> file;
-    const int fault = PartialFile::Open(*state().caller, *slice, nullptr, state().received, file);
-    return fault != 0 ? current.Fail(fault) : QELO_UPLOAD_PARTIAL;
-  }
-  const PartHeader part = *current.PendingFile();
-  if (addSlice(current, *slice, directory, whole) != QELO_UPLOAD_DONE ||
-      current.ReadFields(intoHash(parameters)) != QELO_UPLOAD_DONE) {
-    return current.Result();
-  }
-  if (current.PendingFile() != nullptr) {
-    return current.Fail(QELO_UPLOAD_MALFORMED);
-  }
-  if (whole == nullptr) {
     return QELO_UPLOAD_PARTIAL;
   }
+  const PartHeader part = *current.PendingFile();
+  std::unique_ptr<TemporaryFile> whole;
+  if (state().slices.Add(current, directory, state().owner, whole) != QELO_UPLOAD_DONE) {
+    return current.Result();
+  }
+  const int end = endSlice(current, parameters);
+  if (end != QELO_UPLOAD_PARTIAL || whole == nullptr) {
+    return end;
+  }
   loaded.push_back({part.field, part.fileName});
+  current.Adopt(std::move(whole));
+  return current.Result();
+}
+
+/// At the end of a body without a file: one with slices asks how much there is.
+int answerQuestion(Upload& current) {
+  SliceIntake& slices = state().slices;
+  if (!SliceIntake::IsAsked() || slices.HasAdded()) {
+    return current.Result();
+  }
+  const int fault = slices.Open();
+  return fault != 0 ? current.Fail(fault) : static_cast<int>(QELO_UPLOAD_PARTIAL);
+}
+
+/// Receives the file that was found for a method that reads its upload itself.
+/// @param path  receives its path when it is whole
+/// @return a QeloUploadResult
+int loadFile(Upload& current, const char* directory, QLIBSZHASH** parameters, std::string& path) {
+  if (!SliceIntake::IsAsked()) {
+    return current.ReadFile(directory, std::nullopt, true, path);
+  }
+  std::unique_ptr<TemporaryFile> whole;
+  if (state().slices.Add(current, directory, std::nullopt, whole) != QELO_UPLOAD_DONE) {
+    return current.Result();
+  }
+  if (whole == nullptr) {
+    return endSlice(current, parameters);
+  }
+  if (!whole->Keep()) {
+    return current.Fail(QELO_UPLOAD_NO_FILE);
+  }
+  path = whole->Path();
   current.Adopt(std::move(whole));
   return current.Result();
 }
@@ -205,16 +229,19 @@ int loadSlice(Upload& current, const char* directory, QLIBSZHASH** parameters,
 
 extern "C" {
 
-void QeloCgiUploadCallerSet(uid_t uid) {
-  state().caller = uid;
+int QeloCgiUploadCallerSet(uid_t uid) {
+  SliceIntake& slices = stateOfInput().slices;
+  slices.SetCaller(uid != kNobody ? std::optional(uid) : std::nullopt);
+  return uid != kNobody && SliceIntake::IsAsked() ? slices.Open() : 0;
 }
 
 int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size) {
-  if (!state().slice) {
+  const SliceIntake& slices = state().slices;
+  if (!slices.Said()) {
     return 0;
   }
-  *received = state().received;
-  *size = state().slice->size;
+  *received = slices.Received();
+  *size = slices.Said()->size;
   return 1;
 }
 
@@ -234,74 +261,79 @@ long long QeloCgiReadBody(char* buffer, unsigned long long size) {
 }
 
 int QeloCgiLoadUploadAll(QLIBSZHASH** parameters, QLIBSZHASH** files, const char* directory, int) {
-  Upload& current = upload();
-  std::vector<LoadedFile> loaded;
-  int result = isSlice() ? loadSlice(current, directory, parameters, loaded)
-                         : loadAll(current, directory, parameters, loaded);
-  if (result == QELO_UPLOAD_DONE) {
-    result = keepAll(current, loaded, parameters, files);
+  const int result = guarded([&](Upload& current) {
+    std::vector<LoadedFile> loaded;
+    const int found = SliceIntake::IsAsked() ? loadSlice(current, directory, parameters, loaded)
+                                             : loadAll(current, directory, parameters, loaded);
+    return found == QELO_UPLOAD_DONE ? keepAll(current, loaded, parameters, files) : found;
+  });
+  if (result == QELO_UPLOAD_NO_MEMORY) {
+    QLIBCHashRemoveAll(*files);
   }
-  closeReceived(current);
+  state().slices.LetGo();
+  closeReceived();
   return result;
 }
 
 int QeloCgiLoadUploadNumParams(QeloCgiContext* context, int, int, unsigned long long positions[2],
                                char* part, int size) {
-  Upload& current = upload();
   QLIBSZHASH* hash = nullptr;
   memcpy(&hash, context->block, sizeof hash);
   if (hash == nullptr) {
     return QELO_UPLOAD_NO_MEMORY;
   }
-  const int result = current.KeepFields(intoHash(&hash));
-  positions[0] = current.Position();
-  positions[1] = current.Length();
-  if (positions[0] == positions[1] && positions[1] > 0) {
-    --positions[0];  // a form without a file is still to be handed out
-  }
-  copyText(current.PendingFile() != nullptr ? current.PendingFile()->text : "", part, size);
-  closeReceived(current);
+  const int result = guarded([&](Upload& current) {
+    current.KeepFields(intoHash(&hash));
+    positions[0] = current.Position();
+    positions[1] = current.Length();
+    if (positions[0] == positions[1] && positions[1] > 0) {
+      --positions[0];  // a form without a file is still to be handed out
+    }
+    copyText(current.PendingFile() != nullptr ? current.PendingFile()->text : "", part, size);
+    return current.Result();
+  });
+  closeReceived();
   return result;
 }
 
 int QeloCgiLoadUploadParams(QLIBSZHASH** parameters, QeloCgiUploadProgress progress,
                             QeloCgiUploadState* told, char* part, int partSize, char* field,
                             int fieldSize, char* file, int fileSize) {
-  Upload& current = upload();
-  current.SetProgress(progress);
   *part = *field = *file = '\0';
-  if (current.ReadFields(intoHash(parameters)) == QELO_UPLOAD_DONE &&
-      current.PendingFile() != nullptr) {
-    copyText(current.PendingFile()->text, part, partSize);
-    if (!copyText(current.PendingFile()->field, field, fieldSize) ||
-        !copyText(current.PendingFile()->fileName, file, fileSize)) {
-      *part = *field = *file = '\0';
-      current.Fail(QELO_UPLOAD_TOO_LARGE);
+  const int result = guarded([&](Upload& current) {
+    current.SetProgress(progress);
+    if (current.ReadFields(intoHash(parameters)) != QELO_UPLOAD_DONE) {
+      return current.Result();
     }
-  }
-  current.SetProgress(nullptr);
-  tell(current, *told);
-  closeReceived(current);
-  return told->result;
+    const PartHeader* pending = current.PendingFile();
+    if (pending == nullptr) {
+      return answerQuestion(current);
+    }
+    copyText(pending->text, part, partSize);
+    if (copyText(pending->field, field, fieldSize) && copyText(pending->fileName, file, fileSize)) {
+      return current.Result();
+    }
+    *part = *field = *file = '\0';
+    return current.Fail(QELO_UPLOAD_TOO_LARGE);
+  });
+  return tell(result, *told);
 }
 
 int QeloCgiLoadUploadFileToDir(QLIBSZHASH** parameters, const char* directory,
                                QeloCgiUploadProgress progress, QeloCgiUploadState* told, char* part,
                                char* field, char* file) {
-  Upload& current = upload();
-  current.SetProgress(progress);
-  std::string path;
-  if (current.PendingFile() == nullptr) {
-    current.Fail(QELO_UPLOAD_NO_FILE);
-  } else if (current.ReadFile(directory, std::nullopt, true, path) == QELO_UPLOAD_DONE &&
-             !intoHash(parameters)(field, path)) {
-    current.Fail(QELO_UPLOAD_NO_MEMORY);
-  }
+  const int result = guarded([&](Upload& current) {
+    current.SetProgress(progress);
+    std::string path;
+    const int loaded = current.PendingFile() != nullptr
+                           ? loadFile(current, directory, parameters, path)
+                           : current.Fail(QELO_UPLOAD_NO_FILE);
+    return loaded == QELO_UPLOAD_DONE && !intoHash(parameters)(field, path)
+               ? current.Fail(QELO_UPLOAD_NO_MEMORY)
+               : loaded;
+  });
   *part = *field = *file = '\0';
-  current.SetProgress(nullptr);
-  tell(current, *told);
-  closeReceived(current);
-  return told->result;
+  return tell(result, *told);
 }
 
 }  // extern "C"

@@ -29,6 +29,11 @@ constexpr size_t kShortestId = 16;
 constexpr size_t kLongestId = 64;
 constexpr size_t kLongestRecord = 4096;
 constexpr int kMostLookedAt = 4096;  ///< records that one request looks at
+constexpr long kEmptyWait = 60;      ///< seconds that a record without a file is left alone
+
+struct Close {
+  void operator()(DIR* stream) const { closedir(stream); }
+};
 
 std::string_view header(const char* name) {
   const char* value = getenv(name);
@@ -76,11 +81,17 @@ UniqueFd openRecord(int records, const char* name, int flags) {
   return file;
 }
 
-void removeIfOld(int records, const char* name) {
+/// Removes a file that waited too long. A record that nobody has and that tells of none is what a
+/// process that was killed left behind.
+/// @return whether a file is begun
+bool keepUnlessOld(int records, const char* name) {
   struct stat info {};
-  if (fstatat(records, name, &info, AT_SYMLINK_NOFOLLOW) != 0 ||
-      time(nullptr) - info.st_mtim.tv_sec <= PartialFile::kLongestWait) {
-    return;
+  if (fstatat(records, name, &info, AT_SYMLINK_NOFOLLOW) != 0) {
+    return false;
+  }
+  const long limit = info.st_size == 0 ? kEmptyWait : PartialFile::kLongestWait;
+  if (time(nullptr) - info.st_mtim.tv_sec <= limit) {
+    return info.st_size != 0;
   }
   const UniqueFd file = openRecord(records, name, 0);
   Record record;
@@ -90,25 +101,25 @@ void removeIfOld(int records, const char* name) {
     }
     unlinkat(records, name, 0);
   }
+  return !file;
 }
 
-/// Removes what waited too long. @return how many records of the caller there are
+/// Removes what waited too long. @return how many files the caller has begun
 int sweep(int records, const std::string& caller) {
   UniqueFd readable(openat(records, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  DIR* stream = readable ? fdopendir(readable.Get()) : nullptr;
+  const std::unique_ptr<DIR, Close> stream(readable ? fdopendir(readable.Get()) : nullptr);
   if (stream == nullptr) {
     return 0;
   }
-  readable.Release();  // closedir closes it
+  readable.Release();  // the stream closes it
   int count = 0;
   const dirent* entry = nullptr;
-  for (int seen = 0; seen < kMostLookedAt && (entry = readdir(stream)) != nullptr; ++seen) {
-    if (entry->d_name[0] != '.') {
-      removeIfOld(records, entry->d_name);
-      count += std::string_view(entry->d_name).starts_with(caller) ? 1 : 0;
+  for (int seen = 0; seen < kMostLookedAt && (entry = readdir(stream.get())) != nullptr; ++seen) {
+    if (entry->d_name[0] != '.' && keepUnlessOld(records, entry->d_name) &&
+        std::string_view(entry->d_name).starts_with(caller)) {
+      ++count;
     }
   }
-  closedir(stream);
   return count;
 }
 
@@ -133,71 +144,77 @@ std::optional<Slice> readSlice() {
   return slice;
 }
 
-int PartialFile::Open(uid_t caller, const Slice& slice, const char* directory, uint64_t& received,
-                      std::unique_ptr<PartialFile>& file) {
-  received = 0;
-  const UniqueFd records = openPrivateDir(Paths::kSliceDir, true);
+int PartialFile::Open(uid_t caller, const Slice& slice, std::unique_ptr<PartialFile>& file) {
+  file.reset();
+  UniqueFd records = openPrivateDir(Paths::kSliceDir, true);
   if (!records) {
-    return QELO_UPLOAD_NO_FILE;
+    return resultOf(errno);
   }
   const std::string owner = std::to_string(caller) + "-";
   const std::string name = owner + slice.id;
   const int count = sweep(records.Get(), owner);
-  UniqueFd record = openRecord(records.Get(), name.c_str(), directory != nullptr ? O_CREAT : 0);
+  UniqueFd record = openRecord(records.Get(), name.c_str(), O_CREAT);
   if (!record) {
-    return errno == EWOULDBLOCK ? QELO_UPLOAD_BUSY : errno == ENOENT ? 0 : resultOf(errno);
+    return errno == EWOULDBLOCK ? QELO_UPLOAD_BUSY : resultOf(errno);
   }
-  std::unique_ptr<PartialFile> opened(new PartialFile(std::move(record), name, slice.size));
-  if (opened->Continue()) {
-    received = opened->received_;
-  } else if (directory == nullptr || slice.offset != 0 || count >= kMostOfACaller) {
-    opened->Forget(records.Get());
-    return directory == nullptr ? 0
-           : slice.offset != 0  ? QELO_UPLOAD_WRONG_SLICE
-                                : QELO_UPLOAD_TOO_LARGE;
-  } else if (const int fault = opened->Begin(records.Get(), directory); fault != 0) {
-    return fault;
-  }
-  if (directory != nullptr && slice.offset != received) {
-    return QELO_UPLOAD_WRONG_SLICE;
-  }
-  file = std::move(opened);
+  file.reset(new PartialFile(std::move(records), std::move(record), name, slice.size));
+  file->isOneTooMany_ = !file->FindBytes() && count >= kMostOfACaller;
   return 0;
 }
 
-void PartialFile::Forget(int records) const {
-  unlinkat(records, recordName_.c_str(), 0);
+PartialFile::~PartialFile() {
+  struct stat info {};
+  if (opener_ == getpid() && fstat(record_.Get(), &info) == 0 && info.st_size == 0) {
+    unlinkat(records_.Get(), recordName_.c_str(), 0);  // while it is locked
+  }
+}
+
+void PartialFile::Forget() const {
+  [[maybe_unused]] const int result = ftruncate(record_.Get(), 0);  // room is not needed
 }
 
 /// Opens the bytes that there are. @return false when there are none, or of a file of another size
-bool PartialFile::Continue() {
+bool PartialFile::FindBytes() {
   Record record;
   auto folder = std::make_shared<TemporaryFolder>();
   if (!readRecord(record_.Get(), record) || !folder->Open(record.folder.c_str())) {
+    Forget();
     return false;
   }
   UniqueFd file(openat(folder->Descriptor(), record.name.c_str(),
                        O_RDWR | O_APPEND | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK));
   struct stat info {};
-  const bool isOurs = file && fstat(file.Get(), &info) == 0 && S_ISREG(info.st_mode) &&
-                      info.st_uid == geteuid() && info.st_nlink == 1;
-  if (!isOurs || record.size != size_) {
+  const bool isFile =
+      file && fstat(file.Get(), &info) == 0 && S_ISREG(info.st_mode) && info.st_nlink == 1;
+  if (!isFile || record.size != size_) {
     removeFile(record);
+    Forget();
     return false;
   }
   futimens(record_.Get(), nullptr);  // it is waited for anew
   received_ = static_cast<uint64_t>(info.st_size);
+  fileOwner_ = info.st_uid;
   folder_ = std::move(folder);
-  name_ = record.name;
+  name_ = std::move(record.name);
   file_ = std::move(file);
   return true;
 }
 
-int PartialFile::Begin(int records, const char* directory) {
+int PartialFile::GoOn(uint64_t offset, const char* directory) {
+  // Another account's bytes are of another method, whatever their name.
+  if (offset != received_ || (file_ && fileOwner_ != geteuid())) {
+    return QELO_UPLOAD_WRONG_SLICE;
+  }
+  if (file_) {
+    return 0;
+  }
+  return isOneTooMany_ ? static_cast<int>(QELO_UPLOAD_TOO_LARGE) : Begin(directory);
+}
+
+int PartialFile::Begin(const char* directory) {
   auto folder = std::make_shared<TemporaryFolder>();
   const std::string secret = makeSecret();
   if (secret.empty() || !folder->Open(directory)) {
-    Forget(records);
     return QELO_UPLOAD_NO_FILE;
   }
   name_ = kPrefix + secret;
@@ -210,9 +227,10 @@ int PartialFile::Begin(int records, const char* directory) {
   }
   if (!file_) {
     const int error = errno;
-    Forget(records);
+    Forget();
     return resultOf(error);
   }
+  fileOwner_ = geteuid();
   folder_ = std::move(folder);
   return 0;
 }
@@ -233,9 +251,8 @@ int PartialFile::Write(std::string_view bytes) {
 std::unique_ptr<TemporaryFile> PartialFile::Finish(const std::optional<FileOwner>& owner) {
   std::unique_ptr<TemporaryFile> whole =
       TemporaryFile::Adopt(folder_, std::move(file_), name_, owner);
-  const UniqueFd records = openPrivateDir(Paths::kSliceDir, false);
-  if (whole != nullptr && records) {
-    Forget(records.Get());
+  if (whole != nullptr) {
+    Forget();
   }
   return whole;
 }

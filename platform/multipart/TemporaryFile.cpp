@@ -20,6 +20,10 @@ constexpr mode_t kMode = S_IRUSR | S_IWUSR;
 constexpr int kMostLookedAt = 4096;  ///< entries of a directory that one sweep reads
 constexpr int kMostAttempts = 8;
 
+struct Close {
+  void operator()(DIR* stream) const { closedir(stream); }
+};
+
 std::string makeName() {
   const std::string secret = makeSecret();
   if (secret.empty()) {
@@ -99,13 +103,14 @@ bool TemporaryFolder::Open(const char* path) {
 
 void TemporaryFolder::Sweep() const {
   UniqueFd readable(openat(directory_.Get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  DIR* stream = readable ? fdopendir(readable.Get()) : nullptr;
+  const std::unique_ptr<DIR, Close> stream(readable ? fdopendir(readable.Get()) : nullptr);
   if (stream == nullptr) {
     return;
   }
-  readable.Release();  // closedir closes it
+  readable.Release();  // the stream closes it
   const dirent* entry = nullptr;
-  for (int count = 0; count < kMostLookedAt && (entry = readdir(stream)) != nullptr; ++count) {
+  for (int count = 0; count < kMostLookedAt && (entry = readdir(stream.get())) != nullptr;
+       ++count) {
     UniqueFd file;
     struct stat info {};
     if (isTemporaryName(entry->d_name) &&
@@ -114,7 +119,6 @@ void TemporaryFolder::Sweep() const {
       unlinkat(directory_.Get(), entry->d_name, 0);
     }
   }
-  closedir(stream);
 }
 
 std::unique_ptr<TemporaryFile> TemporaryFile::Create(std::shared_ptr<const TemporaryFolder> folder,
@@ -129,9 +133,9 @@ std::unique_ptr<TemporaryFile> TemporaryFile::Create(std::shared_ptr<const Tempo
     return nullptr;
   }
   std::unique_ptr<TemporaryFile> made(new TemporaryFile(std::move(folder), std::move(file)));
-  made->name_ = name;
-  if (!name.empty()) {
-    LastWords::Add(made->folder_->Descriptor(), name);
+  made->name_ = std::move(name);
+  if (!made->name_.empty()) {
+    LastWords::Add(made->folder_->Descriptor(), made->name_);
   }
   if (!give(made->file_.Get(), owner)) {
     const int error = errno;
@@ -145,7 +149,7 @@ std::unique_ptr<TemporaryFile> TemporaryFile::Adopt(std::shared_ptr<const Tempor
                                                     UniqueFd file, const std::string& name,
                                                     const std::optional<FileOwner>& owner) {
   const int directory = folder->Descriptor();
-  const std::string own = makeName();
+  std::string own = makeName();
   if (own.empty() || flock(file.Get(), LOCK_EX | LOCK_NB) != 0 || !give(file.Get(), owner)) {
     return nullptr;
   }
@@ -157,7 +161,7 @@ std::unique_ptr<TemporaryFile> TemporaryFile::Adopt(std::shared_ptr<const Tempor
     errno = error;
     return nullptr;
   }
-  made->name_ = own;
+  made->name_ = std::move(own);
   return made;
 }
 

@@ -15,6 +15,8 @@
 #include "PluginTable.h"
 #include "webapi/APIUpload.h"
 
+constexpr off_t kMostSummed = 32 << 20;  // bytes
+
 /// What stands in a file, or its first bytes, as hexadecimal digits, and whose it is.
 static void describeFile(Json::Value& file) {
   struct stat info {};
@@ -24,6 +26,9 @@ static void describeFile(Json::Value& file) {
   }
   file["mode"] = info.st_mode & 07777U;
   file["uid"] = info.st_uid;
+  if (info.st_size > kMostSummed) {
+    return;
+  }
   std::ifstream stream(path, std::ios::binary);
   unsigned long long sum = 14695981039346656037ULL;  // FNV-1a
   for (std::istreambuf_iterator<char> each(stream), end; each != end; ++each) {
@@ -63,8 +68,12 @@ static void defer(QELO::APIRequest* request, QELO::APIResponse* response) {
       result = upload.GetUploadParam(params);
     }
   }
+  if (result == QELO::APIUpload::PARTIAL) {
+    response->SetSuccess(upload.GetSlice());
+    return;
+  }
   if (result != QELO::APIUpload::DONE) {
-    Json::Value errors;
+    Json::Value errors = upload.GetSlice();
     errors["upload_err"] = result;
     response->SetError(400, errors);
     return;

@@ -2,6 +2,7 @@
 
 #include <cstdio>
 #include <cstring>
+#include <new>
 
 #include "tests/support/FakePlatform.h"
 #include "webapi/platform/Core.h"
@@ -40,8 +41,13 @@ void QeloCgiUploadOwnerSet(uid_t uid, gid_t gid) {
   fake().group = gid;
 }
 
-void QeloCgiUploadCallerSet(uid_t uid) {
-  fake().caller = uid;
+int QeloCgiUploadCallerSet(uid_t uid) {
+  FakePlatform::Get().calls.push_back("QeloCgiUploadCallerSet(" +
+                                      std::to_string(static_cast<int>(uid)) + ")");
+  if (uid != static_cast<uid_t>(-1)) {
+    fake().caller = uid;
+  }
+  return 0;
 }
 
 int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size) {
@@ -61,6 +67,9 @@ int QeloCgiLoadUploadAll(QLIBSZHASH** parameters, QLIBSZHASH** files, const char
   fake().directory = directory;
   fill(fake().parameters, parameters);
   fill(fake().files, files);
+  if (fake().runsShort) {
+    throw std::bad_alloc();
+  }
   return fake().all;
 }
 

@@ -9,6 +9,7 @@
 struct FakeUpload {
   std::map<std::string, std::string> parameters;  ///< that each loader adds
   std::map<std::string, std::string> files;       ///< that the loader of all adds
+  bool runsShort = false;                         ///< the loader of all gets no memory in the end
   int all = 1;                                    ///< results
   int fields = 1;
   int params = 1;

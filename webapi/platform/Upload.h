@@ -49,10 +49,14 @@ typedef void (*QeloCgiUploadProgress)(unsigned long long done, unsigned long lon
 WEBAPI_API void QeloCgiUploadOwnerSet(uid_t uid, gid_t gid);
 
 /// Whose slices the request has: a file is put together from the slices of one caller. Without it
-/// slices are refused.
-WEBAPI_API void QeloCgiUploadCallerSet(uid_t uid);
+/// slices are refused. What there is of the file is looked for at once, with the rights that the
+/// process has now: a method that receives its upload itself may have fewer.
+/// @param uid  4294967295: nobody's; what was open is let go, and is another request's to add to
+/// @return 0, also when the request has none; else why the loaders will refuse it, a negative
+///         QeloUploadResult
+WEBAPI_API int QeloCgiUploadCallerSet(uid_t uid);
 /// Of a request with a slice, how much of its file there is.
-/// @return 1, and 0 when none was loaded
+/// @return 1, and 0 when it has none of anybody's
 WEBAPI_API int QeloCgiUploadSliceGet(unsigned long long* received, unsigned long long* size);
 
 /// Reads some of a body that is no form, which comes as the limits of a slow client allow.
@@ -82,7 +86,8 @@ WEBAPI_API int QeloCgiLoadUploadAll(QLIBSZHASH** parameters, QLIBSZHASH** files,
 WEBAPI_API int QeloCgiLoadUploadNumParams(QeloCgiContext* context, int needed, int reserved,
                                           unsigned long long positions[2], char* part, int size);
 
-/// Loads the fields up to the next file.
+/// Loads the fields up to the next file. Where the request has slices and its body none, the result
+/// is QELO_UPLOAD_PARTIAL: it asks how much of the file there is.
 /// @param part   receives the file's header, cut to `partSize`; "" when no file follows
 /// @param field  receives the file's field; "" likewise. One that does not fit is beyond its limit,
 /// @param file   and so is its name
@@ -91,7 +96,8 @@ WEBAPI_API int QeloCgiLoadUploadParams(QLIBSZHASH** parameters, QeloCgiUploadPro
                                        QeloCgiUploadState* state, char* part, int partSize,
                                        char* field, int fieldSize, char* file, int fileSize);
 
-/// Loads the file that the three texts tell of, which are empty afterwards.
+/// Loads the file that the three texts tell of, which are empty afterwards. Of a slice it is the
+/// file that came in slices, when this was the last, and otherwise nothing, by QELO_UPLOAD_PARTIAL.
 /// @param parameters  receives the temporary file's path under the file's field
 /// @return a QeloUploadResult, which is in the state too
 WEBAPI_API int QeloCgiLoadUploadFileToDir(QLIBSZHASH** parameters, const char* directory,

@@ -64,8 +64,12 @@ bool mayCome(Call& call, const Target& target, const std::string& name) {
   return true;
 }
 
-bool refuseUpload(Call& call, int result) {
-  Json::Value errors(Json::objectValue);
+bool endUpload(Call& call, const APIUpload& upload, int result) {
+  Json::Value errors = upload.GetSlice();
+  if (result == APIUpload::PARTIAL) {
+    call.Response().SetSuccess(errors);  // more of the file is to come
+    return false;
+  }
   errors["upload_err"] = result;
   call.Response().SetError(QELO::WEBAPI_ERR_UPLOAD_FAILED, errors);
   return false;
@@ -79,7 +83,7 @@ bool takeFile(Call& call, APIUpload& upload, const Target& target, Json::Value& 
     return false;
   }
   if (const int result = upload.GetUploadFile(params); result != APIUpload::DONE) {
-    return refuseUpload(call, result);
+    return endUpload(call, upload, result);
   }
   const Json::Value files = upload.GetFiles();
   const std::string temporary =
@@ -119,7 +123,7 @@ void upload(APIRequest* request, APIResponse* response) {
   Call call(request, response);
   Target target;
   if (result != APIUpload::DONE) {
-    refuseUpload(call, result);
+    endUpload(call, upload, result);
     return;
   }
   if (!upload.HasFile()) {
@@ -143,7 +147,7 @@ void upload(APIRequest* request, APIResponse* response) {
       return;
     }
     if (result = upload.GetUploadParam(fields); result != APIUpload::DONE) {
-      refuseUpload(call, result);
+      endUpload(call, upload, result);
       addItems(call, data["items"]);
       return;
     }

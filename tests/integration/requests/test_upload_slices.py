@@ -1,10 +1,11 @@
 """One file in several requests, as docs/uploads.md has them."""
 
+import os
 import subprocess
 
 import pytest
 
-from conftest import ENTRY, session_of
+from conftest import ENTRY, ROOT, session_of
 from upload import API, TYPE, Form, checksum, left_behind, post, uploading
 
 ID = "0123456789abcdef"
@@ -35,11 +36,12 @@ def sid(client):
     return session_of(client, "alice")["sid"]
 
 
-def test_Slices_MakeOneFile(client, sid):
+@pytest.mark.parametrize("method", ["user", "defer"])
+def test_Slices_MakeOneFile(client, sid, method):
     for offset in (0, 100_000):
-        data = send(client, sid, offset, CONTENT[offset:offset + 100_000]).data
+        data = send(client, sid, offset, CONTENT[offset:offset + 100_000], method).data
         assert data == {"received": offset + 100_000, "size": len(CONTENT)}
-    (file,) = send(client, sid, 200_000, CONTENT[200_000:]).data["files"]
+    (file,) = send(client, sid, 200_000, CONTENT[200_000:], method).data["files"]
     assert (file["size"], file["sum"], file["name"]) == (len(CONTENT), checksum(CONTENT), "x.bin")
     assert left_behind() == []
 
@@ -56,6 +58,20 @@ def test_SliceThatBreaksOff_GoesOnWhereItEnded(client, sid):
     (file,) = send(client, sid, received, CONTENT[received:]).data["files"]
     assert file["sum"] == checksum(CONTENT)
     assert left_behind() == []
+
+
+def test_SliceForAMethodThatReadsIt_GoesOnWhereItEnded(client, sid):
+    send(client, sid, 0, CONTENT[:1000], "defer")
+    answer = send(client, sid, 999, CONTENT[999:], "defer")
+    assert answer.json["error"] == {"code": 400, "errors": {
+        "upload_err": -10, "received": 1000, "size": len(CONTENT)}}
+    question = post(client, Form().field("a", "1"), "defer", headers=headers(0), _sid=sid)
+    assert question.data == {"received": 1000, "size": len(CONTENT)}
+    (file,) = send(client, sid, 1000, CONTENT[1000:], "defer").data["files"]
+    assert file["sum"] == checksum(CONTENT)
+    assert left_behind() == []
+    records = ROOT / "var/lib/webapi/uploads"
+    assert [path.stat().st_size for path in records.iterdir()] == [0]  # for the next one to remove
 
 
 def test_SliceAtAnotherPlace_IsToldTheRightOne(client, sid):

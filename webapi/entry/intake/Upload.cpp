@@ -50,19 +50,13 @@ void takeFields(Json::Value&& params, APIRequest& request) {
 
 /// What became of an upload that the method is not called for: a failure, or a slice of a file that
 /// more of is to come.
-void answerUnfinished(int result, APIResponse& response) {
-  Json::Value told(Json::objectValue);
-  unsigned long long received = 0;
-  unsigned long long size = 0;
-  if (QeloCgiUploadSliceGet(&received, &size) == 1) {
-    told["received"] = Json::UInt64{received};
-    told["size"] = Json::UInt64{size};
-  }
+void answerUnfinished(int result, const APIUpload& upload, APIResponse& response) {
+  Json::Value told = upload.GetSlice();
   if (result == APIUpload::PARTIAL) {
     response.SetSuccess(told);
     return;
   }
-  told["upload_err"] = result;
+  told["upload_err"] = result;  // an object, also where there was no slice
   response.SetError(WEBAPI_ERR_UPLOAD_FAILED, told);
 }
 
@@ -84,18 +78,19 @@ bool WebEntry::HandleUpload(APIRequest* request, APIResponse* response) {
     return false;
   }
   hasUpload_ = true;
+  setCaller(*request);
   if (GetMethodAttr(request, "deferUpload")) {
     return true;
   }
   setOwner(*request,
            GetMethod(request->GetAPIClass(), request->GetAPIVersion(), request->GetAPIMethod()));
-  setCaller(*request);
   Json::Value params(Json::objectValue);
   Json::Value& fields = params[Literal("postParam")];
   fields = Json::Value(Json::objectValue);
-  const int result = APIUpload(request).GetUploadAll(fields, &temporaryFiles_);
+  APIUpload upload(request);
+  const int result = upload.GetUploadAll(fields, &temporaryFiles_);
   if (result != APIUpload::DONE) {
-    answerUnfinished(result, *response);
+    answerUnfinished(result, upload, *response);
     return false;
   }
   takeFields(std::move(params), *request);
@@ -111,6 +106,9 @@ void WebEntry::RemoveUpload() {
     temporaryFiles_.append(file["path"]);
   }
   RemoveTemporaryFiles(temporaryFiles_);
+  if (Request()->IsSliceUploadRequest()) {
+    QeloCgiUploadCallerSet(kNobody);
+  }
 }
 
 }  // namespace QELO

@@ -41,6 +41,10 @@ std::string APIUpload::GetFileName() const {
   return private_->FileName();
 }
 
+Json::Value APIUpload::GetSlice() const {
+  return private_->Slice();
+}
+
 Json::Value APIUpload::GetFiles() const {
   return private_->Files();
 }

@@ -3,7 +3,7 @@
 #include <sys/stat.h>
 
 #include <algorithm>
-#include <memory>
+#include <new>
 #include <utility>
 
 #include "webapi/APIRequest.h"
@@ -35,10 +35,15 @@ uint64_t restOfSlices(const APIRequest& request) {
   return size - std::min(size, JsonHelper::asUInt64(request.GetEnv("HTTP_X_SLICE_OFFSET", 0), 0));
 }
 
-struct FreeHash {
-  void operator()(QLIBSZHASH* hash) const { QLIBCSzHashFree(hash); }
+/// One that loaders fill, and may make anew meanwhile.
+struct Hash {
+  Hash() = default;
+  Hash(const Hash&) = delete;
+  Hash& operator=(const Hash&) = delete;
+  ~Hash() { QLIBCSzHashFree(hash); }
+
+  QLIBSZHASH* hash = QLIBCSzHashAlloc(kHashSize);
 };
-using Hash = std::unique_ptr<QLIBSZHASH, FreeHash>;
 
 uint64_t sizeOf(const std::string& path) {
   struct stat info {};
@@ -59,7 +64,7 @@ void forEach(const QLIBSZHASH* hash, Call call) {
 
 }  // namespace
 
-int APIUploadPrivate::GetUploadAll(Json::Value& params, Json::Value* tmpFiles) {
+int APIUploadPrivate::GetUploadAll(Json::Value& params, Json::Value* tmpFiles) try {
   const uint64_t length =
       request_ == nullptr ? 0 : JsonHelper::asUInt64(request_->GetEnv("CONTENT_LENGTH", 0), 0);
   if (length == 0) {
@@ -69,35 +74,34 @@ int APIUploadPrivate::GetUploadAll(Json::Value& params, Json::Value* tmpFiles) {
   if (!ChooseTemporaryDirectory(withMargin(std::max(length, restOfSlices(*request_))), directory)) {
     return APIUpload::NO_DIRECTORY;
   }
-  Hash parameters(QLIBCSzHashAlloc(kHashSize));
-  Hash files(QLIBCSzHashAlloc(kHashSize));
-  if (parameters == nullptr || files == nullptr) {
+  Hash parameters;
+  Hash files;
+  if (parameters.hash == nullptr || files.hash == nullptr) {
     WEBAPI_LOG("APIUpload.cpp", "cannot alloc memory for hash!");
     return APIUpload::NO_MEMORY;
   }
-  QLIBSZHASH* loaded = parameters.release();
-  QLIBSZHASH* loadedFiles = files.release();
-  const int result = QeloCgiLoadUploadAll(&loaded, &loadedFiles, directory.c_str(), 0);
-  parameters.reset(loaded);
-  files.reset(loadedFiles);
+  const int result = QeloCgiLoadUploadAll(&parameters.hash, &files.hash, directory.c_str(), 0);
   if (tmpFiles != nullptr && (tmpFiles->isNull() || tmpFiles->isArray())) {
-    forEach(loadedFiles, [&](const char*, const char* path) { tmpFiles->append(path); });
+    forEach(files.hash, [&](const char*, const char* path) { tmpFiles->append(path); });
   }
   if (result != APIUpload::DONE) {
     return result;
   }
   Json::Value fields(params);
-  if (!WebAPIUtil::SzHashToJsonObj(loaded, fields) ||
-      !WebAPIUtil::SzHashToJsonObj(loadedFiles, fields)) {
+  if (!WebAPIUtil::SzHashToJsonObj(parameters.hash, fields) ||
+      !WebAPIUtil::SzHashToJsonObj(files.hash, fields)) {
     WEBAPI_LOG("APIUpload.cpp", "cannot convert hash to Json object!");
     return APIUpload::NO_MEMORY;
   }
-  params.swap(fields);
-  forEach(loadedFiles, [&](const char* field, const char* path) {
-    const char* name = QLIBCSzHashGetValue(loaded, field);
+  forEach(files.hash, [&](const char* field, const char* path) {
+    const char* name = QLIBCSzHashGetValue(parameters.hash, field);
     AddFile(field, name != nullptr ? name : "", path);
   });
+  params.swap(fields);
   return result;
+} catch (const std::bad_alloc&) {
+  WEBAPI_LOG("APIUpload.cpp", "cannot alloc memory for hash!");
+  return APIUpload::NO_MEMORY;
 }
 
 bool APIUploadPrivate::TakeParameters(Json::Value& params) {
@@ -133,16 +137,19 @@ int APIUploadPrivate::GetUploadFile(Json::Value& params) {
     return state_.result = APIUpload::NOTHING_LEFT;
   }
   std::string directory;
-  if (!ChooseTemporaryDirectory(withMargin(state_.left), directory)) {
+  const uint64_t coming = std::max<uint64_t>(state_.left, restOfSlices(*request_));
+  if (!ChooseTemporaryDirectory(withMargin(coming), directory)) {
     return state_.result = APIUpload::NO_DIRECTORY;
   }
   const std::string field = field_;
   const std::string name = file_;
   const int loaded = QeloCgiLoadUploadFileToDir(&parameters_, directory.c_str(), progress_, &state_,
                                                 part_, field_, file_);
-  if (loaded > 0) {
+  if (loaded == APIUpload::DONE) {
     const char* path = QLIBCSzHashGetValue(parameters_, field.c_str());
     AddFile(field, name, path != nullptr ? path : "");
+  }
+  if (loaded > 0) {
     TakeParameters(params);
   }
   return state_.result;
@@ -164,6 +171,17 @@ void APIUploadPrivate::AddFile(const std::string& field, const std::string& name
   file["path"] = path;
   file["size"] = Json::UInt64{sizeOf(path)};
   files.append(std::move(file));
+}
+
+Json::Value APIUploadPrivate::Slice() {
+  Json::Value slice;
+  unsigned long long received = 0;
+  unsigned long long size = 0;
+  if (QeloCgiUploadSliceGet(&received, &size) == 1) {
+    slice["received"] = Json::UInt64{received};
+    slice["size"] = Json::UInt64{size};
+  }
+  return slice;
 }
 
 Json::Value APIUploadPrivate::Files() const {

@@ -25,6 +25,7 @@ class APIUploadPrivate {
   std::string Field() const { return HasFile() ? field_ : ""; }
   std::string FileName() const { return HasFile() ? file_ : ""; }
   Json::Value Files() const;
+  static Json::Value Slice();
 
  private:
   void AddFile(const std::string& field, const std::string& name, const std::string& path);

@@ -1,5 +1,7 @@
 // Uploads: whether the web entry reads one or leaves it to the method, and what becomes of it.
 
+#include <algorithm>
+
 #include "tests/support/CgiFixture.h"
 
 namespace QELO {
@@ -178,6 +180,22 @@ TEST_F(UploadIntake, SliceIsItsCallers) {
   Post("--x\r\nbody");
   Serve();
   EXPECT_EQ(platform->upload.caller, 1000U);
+  // Afterwards it is another request's to go on with.
+  EXPECT_EQ(platform->calls.back(), "QeloCgiUploadCallerSet(-1)");
+}
+
+TEST_F(UploadIntake, SliceOfAMethodThatReadsItIsItsCallersToo) {
+  platform->authorized = 1;
+  platform->authorizedUser = "alice";
+  Set("HTTP_COOKIE", "id=S");
+  Set("HTTP_X_TYPE_NAME", "SLICEUPLOAD");
+  Describe(R"({"authLevel": 1, "allowUser": ["normal.local"]})",
+           R"({"allowUpload": true, "deferUpload": true, "grantByDefault": true})");
+  Post("--x\r\nbody");
+  Set("QUERY_STRING", "api=QELO.Test.Good&version=1&method=echo");
+  Serve();
+  EXPECT_EQ(platform->upload.caller, 1000U);
+  EXPECT_EQ(std::ranges::count(platform->calls, "QeloCgiUploadCallerSet(-1)"), 1);
 }
 
 TEST_F(UploadIntake, UploadToAMethodThatTakesNoneSets115) {

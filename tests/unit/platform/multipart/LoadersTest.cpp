@@ -10,8 +10,10 @@
 #include <csignal>
 #include <cstring>
 #include <filesystem>
+#include <fstream>
 
 #include "platform/multipart/Limits.h"
+#include "tests/support/Sanitizer.h"
 #include "tests/unit/multipart/Form.h"
 #include "tests/unit/platform/PrivateRoot.h"
 #include "webapi/base/UniqueFd.h"
@@ -82,6 +84,19 @@ class Loaders : public PrivateRoot {
   std::string Uploaded(const char* name) const {
     const char* path = QLIBCSzHashGetValue(files, name);
     return path == nullptr ? "(none)" : Read(std::string(path).substr(Path().size()));
+  }
+  /// Leaves no block of 16 KiB or more to this process.
+  static void ExhaustMemory() {
+    unsigned long pages = 0;
+    std::ifstream("/proc/self/statm") >> pages;
+    const rlim_t bytes = pages * static_cast<rlim_t>(sysconf(_SC_PAGESIZE));
+    const rlimit none{bytes, RLIM_INFINITY};
+    ASSERT_EQ(setrlimit(RLIMIT_AS, &none), 0);
+    for (size_t size = 1 << 20; size >= 16 << 10; size /= 2) {
+      while (void* block = malloc(size)) {
+        static_cast<volatile char*>(block)[0] = 1;
+      }
+    }
   }
   int Count() const { return CountFiles("temp"); }
 
@@ -250,6 +265,29 @@ TEST_F(Loaders, FullDiskIsTold) {
                          : 1;
             }),
             0);
+}
+
+TEST_F(Loaders, WithoutMemoryAnUploadHasFailedAndLeavesNothing) {
+  if (IsSanitized()) {
+    GTEST_SKIP() << "the sanitizer's memory cannot be made scarce";
+  }
+  Give(Form::File("f", "x", "1") + Form::Field("a", std::string(900'000, 'x')) + Form::End());
+  EXPECT_EQ(InChild([&] {
+              ExhaustMemory();
+              return LoadAll() == QELO_UPLOAD_NO_MEMORY ? 0 : 1;
+            }),
+            0);
+  lseek(STDIN_FILENO, 0, SEEK_SET);
+  EXPECT_EQ(
+      InChild([&] {
+        if (LoadParams() != QELO_UPLOAD_DONE || LoadFile() != QELO_UPLOAD_DONE) {
+          return 1;
+        }
+        ExhaustMemory();
+        return LoadParams() == QELO_UPLOAD_NO_MEMORY && LoadAll() == QELO_UPLOAD_NO_MEMORY ? 0 : 2;
+      }),
+      0);
+  EXPECT_EQ(Count(), 0);
 }
 
 TEST_F(Loaders, DeferredUploadComesPartAfterPart) {

@@ -45,13 +45,16 @@ class Slices : public PrivateRoot {
     QLIBCSzHashFree(files);
   }
 
-  int Load(const std::string& body, size_t length = 0) {
+  static void Give(const std::string& body, size_t length = 0) {
     const int fd = memfd_create("body", MFD_CLOEXEC);
     EXPECT_EQ(write(fd, body.data(), body.size()), static_cast<ssize_t>(body.size()));
     lseek(fd, 0, SEEK_SET);
     dup2(fd, STDIN_FILENO);
     close(fd);
     setenv("CONTENT_LENGTH", std::to_string(length == 0 ? body.size() : length).c_str(), 1);
+  }
+  int Load(const std::string& body, size_t length = 0) {
+    Give(body, length);
     QLIBCHashRemoveAll(fields);
     QLIBCHashRemoveAll(files);
     const int result = QeloCgiLoadUploadAll(&fields, &files, Path("temp").c_str(), 0);
@@ -59,6 +62,37 @@ class Slices : public PrivateRoot {
     received = 0;
     QeloCgiUploadSliceGet(&received, &size);
     return result;
+  }
+  /// Loads what was given, part after part.
+  int TakeAll() {
+    QeloCgiUploadState state{};
+    char part[256];
+    char field[64];
+    char file[491];
+    const auto next = [&] {
+      return QeloCgiLoadUploadParams(&fields, nullptr, &state, part, sizeof part, field,
+                                     sizeof field, file, sizeof file);
+    };
+    int result = next();
+    while (result == QELO_UPLOAD_DONE && *part != '\0') {
+      result = QeloCgiLoadUploadFileToDir(&fields, Path("temp").c_str(), nullptr, &state, part,
+                                          field, file);
+      EXPECT_EQ(state.result, result);
+      result = result == QELO_UPLOAD_DONE ? next() : result;
+    }
+    unsigned long long size = 0;
+    received = 0;
+    QeloCgiUploadSliceGet(&received, &size);
+    return result;
+  }
+  int TakeBody(const std::string& body) {
+    Give(body);
+    QLIBCHashRemoveAll(fields);
+    return TakeAll();
+  }
+  int Take(size_t offset, const std::string& content) {
+    Say(std::to_string(offset), "9");
+    return TakeBody(Form::File("f", "x", content) + Form::End());
   }
   static void Say(const std::string& offset, const std::string& size, const std::string& id = kId) {
     setenv("HTTP_X_SLICE_OFFSET", offset.c_str(), 1);
@@ -257,6 +291,91 @@ TEST_F(Slices, FilesOfACallerHaveALimit) {
   EXPECT_EQ(Add(1, "2", "some-file-number-7"), QELO_UPLOAD_PARTIAL);
   QeloCgiUploadCallerSet(kBob);
   EXPECT_EQ(Add(0, "1"), QELO_UPLOAD_PARTIAL);
+}
+
+TEST_F(Slices, OfAMethodThatReadsItselfMakeOneFile) {
+  EXPECT_EQ(Take(0, "1234"), QELO_UPLOAD_PARTIAL);
+  EXPECT_EQ(received, 4U);
+  EXPECT_EQ(Take(4, ""), QELO_UPLOAD_PARTIAL);
+  EXPECT_EQ(Take(5, "6"), QELO_UPLOAD_WRONG_SLICE);
+  EXPECT_EQ(received, 4U);
+  EXPECT_EQ(Take(4, "56789"), QELO_UPLOAD_DONE);
+  const char* path = QLIBCSzHashGetValue(fields, "f");
+  ASSERT_NE(path, nullptr);
+  EXPECT_EQ(Read(std::string(path).substr(Path().size())), "123456789");
+  EXPECT_EQ(Files(), 1);
+  QeloCgiUploadCallerSet(static_cast<uid_t>(-1));
+  EXPECT_EQ(Records(), 0);
+}
+
+TEST_F(Slices, QuestionOfAMethodThatReadsItselfIsAnswered) {
+  EXPECT_EQ(Take(0, "1234"), QELO_UPLOAD_PARTIAL);
+  Say("0", "9");
+  EXPECT_EQ(TakeBody(Form::Field("a", "1") + Form::End()), QELO_UPLOAD_PARTIAL);
+  EXPECT_EQ(received, 4U);
+  Say("0", "9", "nothing-came-of-this");
+  EXPECT_EQ(TakeBody(Form::Field("a", "1") + Form::End()), QELO_UPLOAD_PARTIAL);
+  EXPECT_EQ(received, 0U);
+  QeloCgiUploadCallerSet(static_cast<uid_t>(-1));
+  EXPECT_EQ(Records(), 1);
+}
+
+TEST_F(Slices, SecondFileOfAMethodThatReadsItselfIsMalformed) {
+  Say("0", "9");
+  EXPECT_EQ(TakeBody(Form::File("f", "x", "1") + Form::File("g", "y", "2") + Form::End()),
+            QELO_UPLOAD_MALFORMED);
+  Say("0", "1", "another-file-of-hers");
+  EXPECT_EQ(TakeBody(Form::File("f", "x", "1") + Form::File("g", "y", "2") + Form::End()),
+            QELO_UPLOAD_MALFORMED);
+}
+
+TEST_F(Slices, AreOpenedWithTheRightsOfTheOneWhoNamesTheCaller) {
+  if (!IsRoot()) {
+    GTEST_SKIP() << "an ordinary user has the same rights throughout";
+  }
+  for (const auto& [offset, content, result] :
+       {std::tuple(0, "1234", QELO_UPLOAD_PARTIAL), std::tuple(4, "56789", QELO_UPLOAD_DONE)}) {
+    Say(std::to_string(offset), "9");
+    Give(Form::File("f", "x", content) + Form::End());
+    EXPECT_EQ(QeloCgiUploadCallerSet(kAlice), 0);
+    ASSERT_EQ(seteuid(kAlice), 0);
+    EXPECT_EQ(TakeAll(), result);
+    ASSERT_EQ(seteuid(0), 0);
+    if (result == QELO_UPLOAD_PARTIAL) {
+      struct stat info {};
+      ASSERT_EQ(stat(fs::directory_iterator(Path("temp"))->path().c_str(), &info), 0);
+      EXPECT_EQ(info.st_uid, kAlice);
+    }
+    QeloCgiUploadCallerSet(static_cast<uid_t>(-1));
+  }
+  EXPECT_EQ(Records(), 0);
+  const char* path = QLIBCSzHashGetValue(fields, "f");
+  ASSERT_NE(path, nullptr);
+  EXPECT_EQ(Read(std::string(path).substr(Path().size())), "123456789");
+}
+
+TEST_F(Slices, BytesOfAnotherAccountAreNotGoneOnWith) {
+  if (!IsRoot()) {
+    GTEST_SKIP() << "an ordinary user has no other account";
+  }
+  EXPECT_EQ(Add(0, "1234"), QELO_UPLOAD_PARTIAL);
+  const fs::path file = fs::directory_iterator(Path("temp"))->path();
+  ASSERT_EQ(chown(file.c_str(), kBob, kBob), 0);
+  EXPECT_EQ(Add(4, "56789"), QELO_UPLOAD_WRONG_SLICE);
+  EXPECT_EQ(fs::file_size(file), 4U);
+}
+
+TEST_F(Slices, RecordThatAKilledProcessLeftEmptyIsNoFileAndGoesAway) {
+  EXPECT_EQ(Add(0, "1"), QELO_UPLOAD_PARTIAL);
+  for (int number = 0; number < 20; ++number) {
+    Write("var/lib/webapi/uploads/1002-left-behind-number-" + std::to_string(number), "");
+  }
+  EXPECT_EQ(Add(0, "1", "some-other-file-of-hers"), QELO_UPLOAD_PARTIAL);
+  for (int number = 0; number < 20; ++number) {
+    Age("var/lib/webapi/uploads/1002-left-behind-number-" + std::to_string(number), 100);
+  }
+  EXPECT_EQ(Add(1, "2"), QELO_UPLOAD_PARTIAL);
+  EXPECT_EQ(Records(), 2);
 }
 
 TEST_F(Slices, DirectoryThatIsNoneBeginsNothing) {

@@ -80,6 +80,15 @@ TEST_F(WholeUpload, WithoutMemoryForAHashIsLogged) {
   EXPECT_EQ(CountCalls("QeloCgiLoadUploadAll"), 0);
 }
 
+TEST_F(WholeUpload, LoaderThatRunsShortOfMemoryLeavesNoHash) {
+  fake.parameters = {{"n", std::string(1000, 'x')}};
+  fake.files = {{"f", "/tmp/one"}};
+  fake.runsShort = true;
+  EXPECT_EQ(APIUpload(&request).GetUploadAll(params, &files), -9);
+  EXPECT_TRUE(params.empty());
+  EXPECT_EQ(SyslogCapture::Count(" cannot alloc memory for hash!"), 1);
+}
+
 TEST_F(WholeUpload, FilesComeAfterParametersOfTheSameName) {
   fake.parameters = {{"n", "5"}, {"f", "a.txt"}, {"t", "text"}};
   fake.files = {{"f", "/tmp/one"}};
