@@ -38,6 +38,21 @@ std::string adviceOnUsers() {
   return names.empty() ? "--user names another" : "--user takes one of " + names;
 }
 
+/// Has an upload go on where the same call was ended before.
+void resume(const Options& options, const std::string& user, UploadBody& upload) {
+  uid_t uid = 0;
+  gid_t gid = 0;
+  if (upload.IsEmpty() || QELOUserGetUGID(user.c_str(), &uid, &gid) != 0) {
+    return;
+  }
+  upload.Resume(uid, options.api + " " + std::to_string(options.version) + " " + options.method);
+  if (upload.There() > 0) {
+    fprintf(stderr, "webapi-exec: %s: goes on behind %llu bytes that are there\n",
+            options.uploads.front().second.c_str(),
+            static_cast<unsigned long long>(upload.There()));
+  }
+}
+
 /// Whether the caller may call as this user. No permission is checked behind this.
 /// @return why not, or ""
 std::string checkUser(const std::string& user) {
@@ -56,8 +71,7 @@ std::string checkUser(const std::string& user) {
 Json::Value requestOf(const UploadBody& upload, const OutputFile& output) {
   Json::Value request(Json::objectValue);
   if (!upload.IsEmpty()) {
-    request["CONTENT_TYPE"] = upload.Type();
-    request["CONTENT_LENGTH"] = std::to_string(upload.Length());
+    request = upload.Request();
   }
   if (output.There() > 0) {
     request["HTTP_RANGE"] = "bytes=" + std::to_string(output.There()) + "-";
@@ -84,6 +98,7 @@ std::string makeCall(const Options& options, Json::Value& answer) {
   if (!unreadable.empty()) {
     return unreadable;
   }
+  resume(options, user, upload);
   // What a downloading method prints is never mixed with the answer.
   OutputFile output;
   const int closed = output.Open(options.output);

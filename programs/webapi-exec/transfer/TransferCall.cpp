@@ -33,7 +33,7 @@ bool TransferCall::HandleUpload(APIRunner& runner, APIRequest* request, APIRespo
   params["postParam"] = Json::Value(Json::objectValue);
   const int result = APIUpload(request).GetUploadAll(params["postParam"], nullptr);
   if (result != APIUpload::DONE) {
-    Json::Value errors(Json::objectValue);
+    Json::Value errors = APIUpload(request).GetSlice();
     errors["upload_err"] = result;
     response->SetError(WEBAPI_ERR_UPLOAD_FAILED, errors);
     return false;

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <sys/random.h>
 #include <sys/sendfile.h>
 #include <sys/wait.h>
@@ -37,10 +38,11 @@ std::string quoted(const std::string& text) {
   return '"' + safe + '"';
 }
 
-bool sendFile(int pipe, int file, off_t length, ByteProgress& progress) {
-  off_t position = 0;
-  while (position < length) {
-    const auto wanted = static_cast<size_t>(std::min(length - position, kAtOnce));
+bool sendFile(int pipe, int file, off_t start, off_t length, ByteProgress& progress) {
+  off_t position = start;
+  const off_t end = start + length;
+  while (position < end) {
+    const auto wanted = static_cast<size_t>(std::min(end - position, kAtOnce));
     const ssize_t count = TEMP_FAILURE_RETRY(sendfile(pipe, file, &position, wanted));
     if (count <= 0) {
       return false;
@@ -79,6 +81,25 @@ std::string UploadBody::Open(const std::vector<std::pair<std::string, std::strin
   return "";
 }
 
+void UploadBody::Resume(uid_t caller, const std::string& call) {
+  struct stat info {};
+  if (parts_.size() != 1 || fstat(parts_.front().file.Get(), &info) != 0) {
+    return;
+  }
+  Part& part = parts_.front();
+  slice_.Find(caller, call, info);
+  part.start = static_cast<off_t>(slice_.There());
+  part.length -= part.start;
+}
+
+Json::Value UploadBody::Request() const {
+  Json::Value request(Json::objectValue);
+  request["CONTENT_TYPE"] = Type();
+  request["CONTENT_LENGTH"] = std::to_string(Length());
+  slice_.Tell(request);
+  return request;
+}
+
 uint64_t UploadBody::Length() const {
   uint64_t length = boundary_.size() + 8;  // with the line end before it and its dashes
   for (const Part& part : parts_) {
@@ -105,13 +126,14 @@ bool UploadBody::Start() {
 }
 
 void UploadBody::Write(int pipe) const {
-  signal(SIGPIPE, SIG_IGN);  // a method that needs no more of it
+  signal(SIGPIPE, SIG_IGN);          // a method that needs no more of it
+  prctl(PR_SET_PDEATHSIG, SIGKILL);  // a call that is ended has sent no more than this
   ByteProgress progress(true);
-  progress.Begin(0, Length());
+  progress.Begin(There(), There() + Length());
   bool isGood = true;
   for (const Part& part : parts_) {
     isGood = isGood && WriteText(pipe, part.head) &&
-             sendFile(pipe, part.file.Get(), part.length, progress);
+             sendFile(pipe, part.file.Get(), part.start, part.length, progress);
     progress.Add(isGood ? part.head.size() : 0);
   }
   const std::string end = "\r\n--" + boundary_ + "--\r\n";

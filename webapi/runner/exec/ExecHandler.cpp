@@ -105,6 +105,16 @@ void setUploadOwner(APIRunner& runner, APIRequest& request) {
   }
 }
 
+/// A file in slices is put together for one caller alone.
+void setUploadCaller(const APIRequest& request) {
+  uid_t uid = 0;
+  gid_t gid = 0;
+  if (request.IsSliceUploadRequest() &&
+      QELOUserGetUGID(request.GetLoginUserName().c_str(), &uid, &gid) == 0) {
+    QeloCgiUploadCallerSet(uid);
+  }
+}
+
 }  // namespace
 
 class ExecHandler::Runner : public APIRunner {
@@ -114,6 +124,7 @@ class ExecHandler::Runner : public APIRunner {
  protected:
   bool HandleUpload(APIRequest* request, APIResponse* response) override {
     setUploadOwner(*this, *request);
+    setUploadCaller(*request);
     return handler_.HandleUpload(*this, request, response);
   }
 
