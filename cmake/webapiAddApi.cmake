@@ -4,7 +4,6 @@
 #
 # - the library NAME.so, which links webapi::webapi and the LIBRARIES; a function that is nowhere
 #   defined is an error of the build, and not of a call;
-# - the target NAME_objects, what it is made of, for tests to link;
 # - the description NAME.lib, made of a file whose name ends with ".in" by putting variables in the
 #   place of @VARIABLE@; @webapi_API_LIBRARY@ is where the library is installed;
 # - a part of every build that checks the description against the library (webapi check), unless the
@@ -17,13 +16,9 @@ function(webapi_add_api name)
     message(FATAL_ERROR "webapi_add_api(NAME SOURCES FILE... DESCRIPTION FILE [LIBRARIES LIBRARY...])")
   endif()
 
-  add_library(${name}_objects OBJECT ${api_SOURCES})
-  set_target_properties(${name}_objects PROPERTIES POSITION_INDEPENDENT_CODE ON)
-  target_compile_features(${name}_objects PUBLIC cxx_std_20)
-  target_include_directories(${name}_objects PUBLIC ${CMAKE_CURRENT_SOURCE_DIR})
-  target_link_libraries(${name}_objects PUBLIC webapi::webapi ${api_LIBRARIES})
-  add_library(${name} MODULE $<TARGET_OBJECTS:${name}_objects>)
-  set_target_properties(${name} PROPERTIES PREFIX "" LINKER_LANGUAGE CXX)
+  add_library(${name} MODULE ${api_SOURCES})
+  set_target_properties(${name} PROPERTIES PREFIX "" WEBAPI_LIBRARIES "${api_LIBRARIES}")
+  target_compile_features(${name} PUBLIC cxx_std_20)
   target_link_libraries(${name} PRIVATE webapi::webapi ${api_LIBRARIES})
   target_link_options(${name} PRIVATE -Wl,--no-undefined)
 
@@ -49,4 +44,48 @@ function(webapi_add_api name)
 
   install(TARGETS ${name} LIBRARY DESTINATION ${webapi_API_DIR})
   install(FILES ${description} DESTINATION ${webapi_DESCRIPTION_DIR})
+endfunction()
+
+# webapi_add_api_test(NAME SOURCES FILE... [LIBRARIES LIBRARY...])
+#
+# A GoogleTest program NAME_test of such an API library, in the same CMakeLists.txt: the API's own
+# sources and the test's, with webapi::testing in the place of webapi::webapi
+# (find_package(webapi COMPONENTS testing)). API_DESCRIPTION is the description's path in it. Building
+# the target "check" builds all and runs the tests.
+
+# Testing is enabled for the scope that asks for it, so this is no function.
+macro(webapi_add_api_test)
+  enable_testing()
+  webapi_make_api_test(${ARGN})
+endmacro()
+
+function(webapi_make_api_test name)
+  cmake_parse_arguments(PARSE_ARGV 1 test "" "" "SOURCES;LIBRARIES")
+  if(test_UNPARSED_ARGUMENTS OR NOT test_SOURCES OR NOT TARGET ${name})
+    message(FATAL_ERROR "webapi_add_api_test(NAME SOURCES FILE... [LIBRARIES LIBRARY...]), "
+                        "behind webapi_add_api(NAME ...)")
+  endif()
+  if(NOT TARGET webapi::testing)
+    message(FATAL_ERROR "tests need find_package(webapi REQUIRED COMPONENTS testing)")
+  endif()
+  find_package(GTest REQUIRED)
+
+  get_target_property(sources ${name} SOURCES)
+  get_target_property(libraries ${name} WEBAPI_LIBRARIES)
+  add_executable(${name}_test ${sources} ${test_SOURCES})
+  target_compile_features(${name}_test PRIVATE cxx_std_20)
+  target_include_directories(${name}_test PRIVATE ${CMAKE_CURRENT_SOURCE_DIR})
+  target_link_libraries(${name}_test PRIVATE webapi::testing GTest::gtest_main ${libraries}
+                                             ${test_LIBRARIES})
+  target_compile_definitions(
+    ${name}_test PRIVATE API_DESCRIPTION="${CMAKE_CURRENT_BINARY_DIR}/${name}.lib")
+  add_test(NAME ${name}_test COMMAND ${name}_test)
+
+  if(NOT TARGET check)
+    add_custom_target(check COMMAND ${CMAKE_CTEST_COMMAND} --output-on-failure --no-tests=error)
+  endif()
+  add_dependencies(check ${name} ${name}_test)
+  if(TARGET ${name}_check)
+    add_dependencies(check ${name}_check)
+  endif()
 endfunction()

@@ -4,11 +4,12 @@
 #include <set>
 
 #include "programs/webapi/Arguments.h"
-#include "programs/webapi/check/CheckSchema.h"
 #include "programs/webapi/check/TypeName.h"
 #include "programs/webapi/check/Words.h"
+#include "programs/webapi/text/Pointer.h"
 #include "webapi/APIDescription.h"
 #include "webapi/JsonHelper.h"
+#include "webapi/MethodDescription.h"
 #include "webapi/base/Number.h"
 #include "webapi/base/Text.h"
 
@@ -110,9 +111,20 @@ class APICheck {
       return Refuse(attributes, std::string("a method's attributes are an object, not ") +
                                     NameOfType(attributes));
     }
+    const size_t errors = findings_.Errors();
     CheckMembers(attributes, DescriptionKeys::kAttributes, Others::kNone, "a method", options_,
                  findings_);
+    if (findings_.Errors() == errors) {
+      Told(attributes);
+    }
     Contradictions(attributes);
+  }
+
+  /// What is told of parameters and results, as those see it who check calls by it.
+  void Told(const Json::Value& attributes) {
+    for (const MethodDescription::Fault& fault : MethodDescription(attributes).Faults()) {
+      Refuse(ValueAt(attributes, fault.path), Quoted(fault.path) + " " + fault.message);
+    }
   }
 
   /// Attributes of which one makes another useless.

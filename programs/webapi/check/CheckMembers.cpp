@@ -86,6 +86,16 @@ void checkAccount(const Json::Value& value, const CheckOptions& options, Finding
   }
 }
 
+void checkIsolation(const Json::Value& value, Findings& findings) {
+  const std::vector<std::string_view> known(std::begin(DescriptionKeys::kIsolations),
+                                            std::end(DescriptionKeys::kIsolations));
+  const std::string name = value.isString() ? value.asString() : "";
+  if (std::find(known.begin(), known.end(), name) == known.end()) {
+    findings.Add(Findings::kError, value,
+                 "there is no isolation " + Quoted(name) + Suggestion(name, known));
+  }
+}
+
 void checkNumber(const Json::Value& value, int lowest, int highest, Findings& findings) {
   const int number = value.isInt() ? value.asInt() : 0;
   if (!value.isInt() || number < lowest || number > highest) {
@@ -103,6 +113,8 @@ void checkValue(const Key& key, const Json::Value& value, const CheckOptions& op
     checkClasses(value, findings);
   } else if (key.name == "runAs") {
     checkAccount(value, options, findings);
+  } else if (key.name == "isolation") {
+    checkIsolation(value, findings);
   } else if (key.name == "authLevel") {
     checkNumber(value, APIDescription::AUTH_NONE, APIDescription::AUTH_SKIP, findings);
   } else if (key.name == "priority") {

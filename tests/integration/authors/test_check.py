@@ -101,6 +101,30 @@ def test_Check_WarnsOfWhatIsOfNoUse(check, good, bad, finding):
     assert check(GOOD.replace(good, bad, 1)) == ([finding], 0)
 
 
+@pytest.mark.parametrize("attributes,finding", [
+    ('"params": {"typ": "object"}', '9:41: error: no schema has "typ"; did you mean "type"?'),
+    ('"params": {"type": "array"}', '9:49: error: parameters are an object: "type" is "object"'),
+    ('"params": {"properties": {"a": {"minimum": "1"}}}', '9:73: error: "minimum" is a number'),
+    ('"params": [1]', '9:40: error: a schema is an object, not a list'),
+    ('"returns": {"items": {"type": "txt"}}', '9:60: error: there is no type "txt"'),
+    ('"isolation": "wroker"', '9:43: error: there is no isolation "wroker"; did you mean "worker"?'),
+    ('"summary": 5', '9:41: error: "summary" is a text, not an integer'),
+    ('"errors": {"399": "x"}', '9:48: error: "/errors/399" codes of an API are integers from 400 on'),
+    ('"params": {"$ref": "#/definitions/x"}', None),
+])
+def test_Check_OfWhatIsToldOfParameters_FindsWithPlace(check, attributes, finding):
+    lines, status = check(GOOD.replace('"grantByUser": true', attributes))
+    assert status == 1
+    assert finding in lines if finding else lines, lines
+
+
+def test_Check_OfGoodSchemas_FindsNothing(check):
+    told = """"summary": "S", "description": "D", "errors": {"400": "none"}, "example": {"n": 5},
+        "params": {"type": "object", "properties": {"n": {"type": "integer", "minimum": 1}}},
+        "returns": {"type": "array", "items": {"$ref": "#/definitions/x"}, "definitions": {"x": {}}}"""
+    assert check(GOOD.replace('"grantByUser": true', told)) == ([], 0)
+
+
 def test_Check_MembersOfTheApisOwn_AreGood(check):
     assert check(GOOD.replace('"authLevel": 1', '"shares": "/etc/webapi/shares.json"')) == ([], 0)
 

@@ -8,8 +8,7 @@ from author_program import webapi
 from conftest import DESCRIPTIONS
 
 NAME = "QELO.Photo.Album"
-FILES = {"CMakeLists.txt", "README.md", "Methods.h", "Methods.cpp", "Table.cpp", f"{NAME}.lib.in",
-         "tests/MethodsTest.cpp"}
+FILES = {"CMakeLists.txt", "README.md", "Methods.cpp", f"{NAME}.lib.in", "tests/MethodsTest.cpp"}
 
 
 def files_of(directory):
@@ -21,7 +20,7 @@ def test_New_WritesAllFiles_WithTheirNamesPutIn(root, tmp_path):
     assert (result.returncode, result.stderr) == (0, "")
     assert files_of(tmp_path / "album") == FILES
     texts = "".join((tmp_path / "album" / file).read_text() for file in FILES)
-    assert NAME in texts and "namespace album_api" in texts
+    assert NAME in texts and "album_api_" in texts
     assert "@NAME@" not in texts and "@PROJECT@" not in texts
     assert "@webapi_API_LIBRARY@" in texts
 

@@ -31,7 +31,7 @@ def test_FiveCommands_EndWithAnAnswer(stage, tmp_path):
         f"{{\n{step(INSTALLING, 'install')}\n}} > /dev/null",
         f"mkdir {tmp_path}/empty && cd {tmp_path}/empty",
         *commands,
-        f"webapi call --api {NAME} --method count --param to=1 --follow",
+        f"webapi call --api {NAME} --method count --param total=1 --follow",
         f"webapi check /usr/qelo/qeloman/webapi/{NAME}.lib && echo good",
     ])
     lines = run("unshare", "-m", "bash", "-c", script, cwd=SOURCE).splitlines()
@@ -89,9 +89,8 @@ def test_Build_FailsWhenAFunctionIsMissing(project, build):
     source = project / "Methods.cpp"
     good = source.read_text()
     try:
-        source.write_text(good.replace("void greet(", "void elsewhere(QELO::APIRequest* request,\n"
-                                       "               QELO::APIResponse* response);\nvoid greet(")
-                          .replace("  response->SetSuccess(data);\n", "  elsewhere(request, response);\n", 1))
+        source.write_text(good.replace("Greeting greet(", "}  // namespace\nvoid elsewhere();\nnamespace {\nGreeting greet(")
+                          .replace('  return {"Hello', '  elsewhere();\n  return {"Hello', 1))
         result = build("--target", NAME)
         assert result.returncode != 0
         assert "undefined reference" in result.stdout + result.stderr

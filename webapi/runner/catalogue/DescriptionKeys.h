@@ -58,6 +58,13 @@ inline constexpr Key kAttributes[] = {
     {"disableSocket", Type::kBoolean},
     {"allowSharing", Type::kBoolean},
     {"skipSharingAppCheck", Type::kBoolean},
+    {"isolation", Type::kText},
+    {"summary", Type::kText},
+    {"description", Type::kText},
+    {"params", Type::kSchema},
+    {"returns", Type::kSchema},
+    {"errors", Type::kObject},
+    {"example", Type::kObject},
 };
 
 /// Members of lib.def; its "methods" are attributes.
@@ -72,6 +79,9 @@ inline constexpr Key kDefaults[] = {
 inline constexpr std::string_view kUserClasses[] = {
     "admin.local", "admin.domain", "admin.ldap", "normal.local", "normal.domain", "normal.ldap",
 };
+
+/// What "isolation" may be.
+inline constexpr std::string_view kIsolations[] = {"process", "worker"};
 
 inline constexpr int kMaxPriority = 10;  ///< of "priority", and below 0 its opposite
 
