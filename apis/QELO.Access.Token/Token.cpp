@@ -1,22 +1,16 @@
 // QELO.Access.Token: the access tokens of who calls.
 
-#include <webapi/APIRequest.h>
-#include <webapi/APIResponse.h>
-#include <webapi/APITable.h>
 #include <webapi/AccessToken.h>
-#include <webapi/WebAPIError.h>
+#include <webapi/Method.h>
 
 #include <string>
 
 namespace {
 
 using QELO::AccessToken;
-using QELO::APIRequest;
-using QELO::APIResponse;
+using QELO::Call;
 
-constexpr char kApi[] = "QELO.Access.Token";
-
-enum Error : int {
+enum Code : int {
   kBadTerms = 400,
   kUnavailable = 401,
   kTooMany = 402,
@@ -24,85 +18,64 @@ enum Error : int {
   kNoSuchToken = 404
 };
 
-int errorOf(AccessToken::Result result) {
+void Expect(AccessToken::Result result) {
   switch (result) {
+    case AccessToken::TOKEN_OK:
+      return;
     case AccessToken::TOKEN_BAD_TERMS:
-      return kBadTerms;
+      throw QELO::Error{kBadTerms};
     case AccessToken::TOKEN_TOO_MANY:
-      return kTooMany;
+      throw QELO::Error{kTooMany};
     case AccessToken::TOKEN_NONE:
-      return kNoSuchToken;
+      throw QELO::Error{kNoSuchToken};
     default:
-      return kUnavailable;
+      throw QELO::Error{kUnavailable};
   }
 }
 
 /// Who has come by an access token has no session.
-bool cameBySession(const APIRequest& request, APIResponse* response) {
-  if (request.GetSessionID().empty()) {
-    response->SetError(kSessionOnly);
-    return false;
+void ExpectSession(const Call& call) {
+  if (call.Request().GetSessionID().empty()) {
+    throw QELO::Error{kSessionOnly};
   }
-  return true;
 }
 
-void Create(APIRequest* request, APIResponse* response) {
+Json::Value Create(const Call& call) {
   Json::Value terms(Json::objectValue);
   Json::Value record;
   std::string token;
-  if (!cameBySession(*request, response)) {
-    return;
-  }
+  ExpectSession(call);
   for (const char* name : {"name", "scopes", "readOnly", "address", "days"}) {
-    if (request->HasParam(name)) {
-      terms[name] = request->GetParam(name);
+    if (call.Has(name)) {
+      terms[name] = call.Request().GetParam(name);
     }
   }
-  const auto result = AccessToken::Create(request->GetLoginUserName(), terms, record, token);
-  if (result != AccessToken::TOKEN_OK) {
-    response->SetError(errorOf(result));
-    return;
-  }
+  Expect(AccessToken::Create(call.User(), terms, record, token));
   record["token"] = token;
-  response->SetSuccess(record);
+  return record;
 }
 
-void List(APIRequest* request, APIResponse* response) {
+Json::Value List(const Call& call) {
   Json::Value data(Json::objectValue);
-  const auto result = AccessToken::List(request->GetLoginUserName(), data["tokens"]);
-  if (result != AccessToken::TOKEN_OK) {
-    response->SetError(errorOf(result));
-    return;
-  }
-  response->SetSuccess(data);
+  Expect(AccessToken::List(call.User(), data["tokens"]));
+  return data;
 }
 
-void Revoke(APIRequest* request, APIResponse* response) {
-  const auto id = request->GetAndCheckIntegral<long long>("id");
-  if (!cameBySession(*request, response)) {
-    return;
-  }
+void Revoke(const Call& call) {
+  const auto id = call.Request().GetAndCheckIntegral<long long>("id");
+  ExpectSession(call);
   if (id.IsInvalid() || !id.IsSet()) {
-    response->SetError(QELO::WEBAPI_ERR_BAD_REQUEST);
-    return;
+    throw QELO::Error{QELO::WEBAPI_ERR_BAD_REQUEST};
   }
-  const auto result = AccessToken::Revoke(request->GetLoginUserName(), id.Get());
-  if (result != AccessToken::TOKEN_OK) {
-    response->SetError(errorOf(result));
-    return;
-  }
-  response->SetSuccess();
+  Expect(AccessToken::Revoke(call.User(), id.Get()));
 }
-
-QELO::_tag_API_TABLE table[] = {
-    {kApi, 1, "create", Create},
-    {kApi, 1, "list", List},
-    {kApi, 1, "revoke", Revoke},
-    {nullptr, 0, nullptr, nullptr},
-};
 
 }  // namespace
 
 extern "C" WEBAPI_API QELO::_tag_API_TABLE* GetAPITable() {
-  return table;
+  using QELO::Method;
+  static auto table = QELO::MethodTable(
+      "QELO.Access.Token", 1,
+      {{"create", Method<Create>}, {"list", Method<List>}, {"revoke", Method<Revoke>}});
+  return table.data();
 }

@@ -2,9 +2,7 @@
 
 #include <sys/sysinfo.h>
 #include <unistd.h>
-#include <webapi/APIRequest.h>
-#include <webapi/APIResponse.h>
-#include <webapi/APITable.h>
+#include <webapi/Method.h>
 
 #include <climits>
 #include <cstdlib>
@@ -53,23 +51,19 @@ Json::Value Memory() {
   return memory;
 }
 
-void Get(QELO::APIRequest*, QELO::APIResponse* response) {
+Json::Value Get() {
   Json::Value data(Json::objectValue);
   data["hostName"] = HostName();
   data["uptime"] = Uptime();
   data["load"] = Load();
   data["memory"] = Memory();
   data["volumes"] = hostinfo::Volumes(".");  // a call stands in the system's own directory
-  response->SetSuccess(data);
+  return data;
 }
-
-QELO::_tag_API_TABLE table[] = {
-    {"QELO.Host.Info", 1, "get", Get},
-    {nullptr, 0, nullptr, nullptr},
-};
 
 }  // namespace
 
 extern "C" WEBAPI_API QELO::_tag_API_TABLE* GetAPITable() {
-  return table;
+  static auto table = QELO::MethodTable("QELO.Host.Info", 1, {{"get", QELO::Method<Get>}});
+  return table.data();
 }

@@ -98,12 +98,16 @@ constexpr bool HasFiles(const std::tuple<Ts...>&) {
 /// @return false when the parameters are not what the struct declares: error 101 has been answered
 template <Described T>
 bool ReadParameters(const Call& call, T& parameters) {
+  if constexpr (std::same_as<T, NoParameters>) {
+    return true;
+  }
   Faults faults;
   Json::Value files;
   if constexpr (HasFiles(decltype(T::Fields())())) {
     files = APIUpload(&call.Request()).GetFiles();
   }
-  ReadFields(call.Request().GetParam(""), files, Path(), parameters, faults);
+  const Json::Value none;
+  ReadFields(call.Request().GetParamRef("", none), files, Path(), parameters, faults);
   if (faults.Count() > 0) {
     call.Response().SetError(WEBAPI_ERR_BAD_REQUEST, faults.List());
   }

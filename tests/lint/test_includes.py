@@ -145,7 +145,7 @@ def test_Architecture_HasTheSameTable():
 
 def test_Layers_AreTheFoldersThatThereAre():
     folders = {folder_of(path) for path in files("*.cpp", "*.h")}
-    folders = {folder for folder in folders if folder.split("/")[0] not in ("tests", "bench", "fuzz")}
+    folders = {folder for folder in folders if folder.split("/")[0] not in ("tests", "bench", "fuzz", "examples")}
     assert folders - set(ALLOWED) == set()
 
 
@@ -211,7 +211,7 @@ def test_SharedLibraries_OfTheCommonRoad_IncludeNoHeavyLibrary():
     wrong = [
         f"{name(path)}:{number}: {header}"
         for path in cpp_files()
-        if not name(path).startswith(("apis/", "tests/", "bench/")) and "/module/" not in name(path)
+        if not name(path).startswith(("apis/", "examples/", "tests/", "bench/")) and "/module/" not in name(path)
         for number, header in includes(path)
         if heavy.match(header)
     ]

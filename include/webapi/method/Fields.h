@@ -70,7 +70,7 @@ struct Bounds {
 };
 template <typename V>
 requires(!Number<V>) struct Bounds<V> {
-  bool hasRange = false;  ///< of its size: characters of a text, values of a list
+  bool hasRange = false;  ///< of its size: characters of a text, values of a list, bytes of a file
   size_t low = 0;
   size_t high = SIZE_MAX;
 };
@@ -89,6 +89,7 @@ struct Field {
   const char* words[kMostWords] = {};
   bool (*check)(const Value&) = nullptr;
   const char* wanted = "";
+  bool isLine = false;
 
   /// From `low` to `high`, both included.
   constexpr Field Between(Value low, Value high) const requires Number<Value> {
@@ -96,9 +97,16 @@ struct Field {
     field.bounds = {true, low, high};
     return field;
   }
-  /// So many characters (code points) at least and at most.
-  constexpr Field Length(size_t low, size_t high) const requires std::same_as<Value, std::string> {
+  /// So many characters (code points) at least and at most; bytes of a file.
+  constexpr Field Length(size_t low, size_t high)
+      const requires std::same_as<Value, std::string> || std::same_as<Value, UploadedFile> {
     return Sized(low, high);
+  }
+  /// As Length(), and without control characters: no ends of lines, no tabs.
+  constexpr Field Line(size_t low, size_t high) const requires std::same_as<Value, std::string> {
+    Field field = Sized(low, high);
+    field.isLine = true;
+    return field;
   }
   /// So many values at least and at most.
   constexpr Field Count(size_t low, size_t high) const requires kIsList<Value> {

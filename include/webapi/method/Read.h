@@ -23,6 +23,9 @@ inline size_t SizeOf(const std::string& text) {
   }
   return characters;
 }
+inline size_t SizeOf(const UploadedFile& file) {
+  return file.size;
+}
 template <typename T>
 size_t SizeOf(const std::vector<T>& list) {
   return list.size();
@@ -120,8 +123,8 @@ Json::Value NumberOf(V value) {
 
 template <typename V>
 void CheckSize(const V& value, const Bounds<V>& bounds, const Path& path, Faults& faults) {
-  constexpr bool kText = std::same_as<V, std::string>;
-  const char* what = kText ? " characters" : " values";
+  constexpr bool kText = !kIsList<V>;
+  const char* what = !kText ? " values" : std::same_as<V, std::string> ? " characters" : " bytes";
   if (const size_t size = SizeOf(value); size < bounds.low) {
     faults.Add(path, kText ? "minLength" : "minItems", "wants at least ", bounds.low, what);
   } else if (size > bounds.high) {
@@ -141,6 +144,15 @@ inline void CheckWord(const std::string& value, const char* const* words, const 
   faults.Add(path, "enum", "wants one of: " + all);
 }
 
+inline void CheckLine(const std::string& value, const Path& path, Faults& faults) {
+  for (const char c : value) {
+    if (const auto byte = static_cast<unsigned char>(c); byte < 0x20 || byte == 0x7F) {
+      faults.Add(path, "pattern", "wants one line, without control characters");
+      return;
+    }
+  }
+}
+
 /// What the field asks of a value of the right type.
 template <typename S, typename T>
 void CheckValue(const Field<S, T>& field, const typename Field<S, T>::Value& value,
@@ -153,7 +165,7 @@ void CheckValue(const Field<S, T>& field, const typename Field<S, T>::Value& val
     } else if (field.bounds.hasRange && !(value <= field.bounds.high)) {
       faults.Add(path, "maximum", "wants at most ", NumberOf(field.bounds.high));
     }
-  } else if constexpr (std::same_as<V, std::string> || kIsList<V>) {
+  } else if constexpr (requires { SizeOf(value); }) {
     if (field.bounds.hasRange) {
       CheckSize(value, field.bounds, path, faults);
     }
@@ -161,6 +173,9 @@ void CheckValue(const Field<S, T>& field, const typename Field<S, T>::Value& val
   if constexpr (std::same_as<V, std::string>) {
     if (field.words[0] != nullptr) {
       CheckWord(value, field.words, path, faults);
+    }
+    if (field.isLine) {
+      CheckLine(value, path, faults);
     }
   }
   if (field.check != nullptr && !field.check(value)) {
@@ -194,10 +209,12 @@ void ReadFiles(const Field<S, T>& field, const Json::Value& files, const Path& a
   if (!isThere && field.isRequired) {
     faults.Add(path, "required", "wants a file");
   }
-  if constexpr (!kIsOptional<T>) {
-    if (isThere || field.isRequired) {
-      CheckValue(field, result.*field.member, path, faults);
+  if constexpr (kIsOptional<T>) {
+    if (isThere) {
+      CheckValue(field, *(result.*field.member), path, faults);
     }
+  } else if (isThere) {
+    CheckValue(field, result.*field.member, path, faults);
   }
 }
 

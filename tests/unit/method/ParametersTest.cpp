@@ -177,6 +177,20 @@ struct Choice {
   }
 };
 
+struct Line {
+  std::string text;
+  static constexpr auto Fields() { return QELO::Fields(Required("text", &Line::text).Line(1, 5)); }
+};
+
+TEST_F(MethodParameters, LineHasNoControlCharacters) {
+  const Function method = Method<[](const Line&) {}>;
+  EXPECT_EQ(Faults(method, R"({"text":"ä b"})"), "");
+  EXPECT_EQ(Faults(method, R"({"text":""})"), "/text minLength");
+  for (const char* text : {R"(a\tb)", R"(a\n)", R"(\u0000)", R"(\u007f)"}) {
+    EXPECT_EQ(Faults(method, R"({"text":")" + std::string(text) + "\"}"), "/text pattern") << text;
+  }
+}
+
 void choose(const Choice&) {}
 
 TEST_F(MethodParameters, WordsAndChecksDecide) {
@@ -192,7 +206,8 @@ struct Import {
   std::optional<UploadedFile> picture;
   std::vector<UploadedFile> more;
   static constexpr auto Fields() {
-    return QELO::Fields(Required("file", &Import::file), Optional("picture", &Import::picture),
+    return QELO::Fields(Required("file", &Import::file).Length(1, 10),
+                        Optional("picture", &Import::picture).Length(0, 3),
                         Optional("more", &Import::more).Count(0, 2));
   }
 };
@@ -223,6 +238,11 @@ TEST_F(MethodParameters, UploadedFilesArrive) {
   EXPECT_EQ(Faults(withFiles<filesOf>, R"({"files":[{"field":"more"},{"field":"more"},
                                                     {"field":"more"}]})"),
             "/file required, /more maxItems");
+  EXPECT_EQ(Faults(withFiles<filesOf>, R"({"files":[{"field":"file","size":11},
+                                                    {"field":"picture","size":4}]})"),
+            "/file maxLength, /picture maxLength");
+  EXPECT_EQ(Faults(withFiles<filesOf>, R"({"files":[{"field":"file","size":0}]})"),
+            "/file minLength");
 }
 
 TEST_F(MethodParameters, ParameterIsNoUploadedFile) {
