@@ -148,7 +148,8 @@ class WEBAPI_API APIRunner {
   /// @param path  as descriptions name it, with a "/"
   /// @return false, with the reason logged, when it was not loaded: runners load it themselves then
   static bool PreloadLibrary(const std::string& path);
-  /// Loads those anew whose files are others by now.
+  /// Loads those anew whose files are others by now. To be called every second or so: what the
+  /// process has in memory is measured, too, for those that are forked.
   static void RefreshLibraries();
 
  protected:

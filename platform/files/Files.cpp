@@ -81,6 +81,11 @@ int QLIBCFileCheckKeyValue(const char* file, const char* key, const char* value,
 
 int QELOFSMkdirP(const char* path, int keepExistingOwner, int, uid_t uid, gid_t gid, mode_t mode) {
   const Directory wanted{uid, gid, withSearch(mode), keepExistingOwner != 0};
+  struct stat info {};
+  if ((keepExistingOwner != 0 || !hasOwner(wanted)) && stat(path, &info) == 0 &&
+      S_ISDIR(info.st_mode)) {
+    return 0;  // nothing is left to do, and no attempt on each parent
+  }
   const std::string whole = path;
   size_t end = 0;
   while (end < whole.size()) {
@@ -93,7 +98,6 @@ int QELOFSMkdirP(const char* path, int keepExistingOwner, int, uid_t uid, gid_t 
       break;
     }
   }
-  struct stat info {};
   return stat(path, &info) == 0 && S_ISDIR(info.st_mode) ? 0 : -1;
 }
 

@@ -19,6 +19,7 @@ class DaemonService : public Service {
 
   bool Admits(const Connection& connection) override;
   Arrival Take(Connection& connection) override;
+  bool UsesNotes() const override { return true; }
   int Serve(Connection& connection, Note& note) override;
   std::string Refuse(Refusal reason) override;
   void Ended(const Note& note, const End& end) override;

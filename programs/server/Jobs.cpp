@@ -46,17 +46,26 @@ std::chrono::microseconds lengthOf(const timeval& time) {
 }  // namespace
 
 void Jobs::NoteEnd::operator()(Note* note) const {
-  munmap(note, sizeof(Note));
+  if (isShared) {
+    munmap(note, sizeof(Note));
+  } else {
+    delete note;
+  }
 }
 
-Jobs::HeldNote Jobs::MakeNote() {
+Jobs::HeldNote Jobs::MakeNote(bool isShared) {
+  if (!isShared) {
+    return HeldNote(new Note{}, NoteEnd(false));
+  }
   void* memory =
       mmap(nullptr, sizeof(Note), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
-  return HeldNote(memory == MAP_FAILED ? nullptr : new (memory) Note{});
+  return HeldNote(memory == MAP_FAILED ? nullptr : new (memory) Note{}, NoteEnd());
 }
 
 void Jobs::Add(Job job) {
-  madvise(job.note.get(), sizeof(Note), MADV_DONTFORK);
+  if (job.note.get_deleter().isShared) {
+    madvise(job.note.get(), sizeof(Note), MADV_DONTFORK);
+  }
   const pid_t pid = job.pid;
   jobs_.emplace(pid, std::move(job));
 }

@@ -16,7 +16,10 @@ class Jobs {
  public:
   /// Gives a note's memory back.
   struct NoteEnd {
+    NoteEnd() : NoteEnd(true) {}
+    explicit NoteEnd(bool shared) : isShared(shared) {}
     void operator()(Note* note) const;
+    bool isShared;
   };
   using HeldNote = std::unique_ptr<Note, NoteEnd>;
 
@@ -31,8 +34,9 @@ class Jobs {
     std::chrono::microseconds processor{};  ///< that it took, once it has ended
   };
 
-  /// A blank note, which the next process that is forked shares; null without memory.
-  static HeldNote MakeNote();
+  /// A blank note; null without memory.
+  /// @param isShared  the next process that is forked has the same one, and not a copy
+  static HeldNote MakeNote(bool isShared);
   /// Takes up a process that has been forked. No other one has its note: what a call leaves running
   /// must not see the calls after it.
   void Add(Job job);

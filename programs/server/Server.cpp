@@ -256,7 +256,7 @@ void Server::StartWaiting() {
 
 void Server::Start(Held connection) {
   Jobs::Job job;
-  job.note = Jobs::MakeNote();
+  job.note = Jobs::MakeNote(service_.UsesNotes());
   std::fflush(nullptr);
   const ServerClock::time_point begin = ServerClock::now();
   job.pid = job.note == nullptr ? -1 : fork();

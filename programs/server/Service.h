@@ -34,8 +34,10 @@ class Service {
   /// Takes what has come of the header, without waiting and nothing of what follows it. kAnswered:
   /// no process is needed, the connection has the answer.
   virtual Arrival Take(Connection& connection) = 0;
+  /// Whether Serve() tells anything by its note, which then is memory that both sides have.
+  virtual bool UsesNotes() const = 0;
   /// Serves the request; in a process of its own, which has the connection alone and ends with
-  /// this call's result.
+  /// this call's result. Without UsesNotes() the note is nobody's.
   virtual int Serve(Connection& connection, Note& note) = 0;
   /// What the other side is told in place of an answer; "" for nothing.
   virtual std::string Refuse(Refusal reason) = 0;

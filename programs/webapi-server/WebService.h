@@ -30,6 +30,7 @@ class WebService : public Service {
 
   bool Admits(const Connection& connection) override;
   Arrival Take(Connection& connection) override;
+  bool UsesNotes() const override { return false; }
   int Serve(Connection& connection, Note& note) override;
   std::string Refuse(Refusal reason) override;
   void Ended(const Note& note, const End& end) override;

@@ -1,7 +1,7 @@
 // Prints to standard output, where the answer goes, in every way there is: while it is loaded, in
 // its method and when it is closed.
 //
-// Tests: ExecutionTest.cpp, test_faulty_libraries.py
+// Tests: ExecutionTest.cpp, PreloadTest.cpp, test_faulty_libraries.py
 
 #include <unistd.h>
 

@@ -14,6 +14,7 @@ namespace {
 
 rlimit former{};
 bool isSet = false;
+size_t measured = 0;  ///< by the process that this one was forked from; 0: not
 
 /// Bytes of address space that the process has, 0 when that cannot be told.
 size_t usedSpace() {
@@ -30,7 +31,7 @@ size_t usedSpace() {
 
 void MemoryBound::Set([[maybe_unused]] size_t bytes) {
 #ifndef __SANITIZE_ADDRESS__
-  const size_t used = isSet ? 0 : usedSpace();
+  const size_t used = isSet ? 0 : measured != 0 ? measured : usedSpace();
   if (used == 0 || getrlimit(RLIMIT_AS, &former) != 0 || former.rlim_cur <= used + bytes) {
     return;
   }
@@ -39,6 +40,10 @@ void MemoryBound::Set([[maybe_unused]] size_t bytes) {
 #else
   static_cast<void>(usedSpace);
 #endif
+}
+
+void MemoryBound::Measure() {
+  measured = usedSpace();
 }
 
 void MemoryBound::Lift() {

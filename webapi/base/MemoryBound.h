@@ -16,6 +16,9 @@ class MemoryBound {
   /// has. Builds with the address sanitizer, whose own use is without bound, have none.
   /// @param bytes  of address space beyond what the process has now
   static void Set(size_t bytes);
+  /// Measures what the process has, for the children that it forks from now on: Set() takes theirs
+  /// for the same, since asking costs a request more than anything else that it asks the kernel.
+  static void Measure();
   /// Gives the former limit back. Nothing without Set(), and the second time.
   static void Lift();
 };

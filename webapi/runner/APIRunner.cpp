@@ -15,6 +15,7 @@
 #include "webapi/JsonHelper.h"
 #include "webapi/WebAPIError.h"
 #include "webapi/base/Log.h"
+#include "webapi/base/MemoryBound.h"
 #include "webapi/runner/APIRunnerPrivate.h"
 #include "webapi/runner/CallName.h"
 #include "webapi/runner/Callbacks.h"
@@ -318,6 +319,7 @@ bool APIRunner::PreloadLibrary(const std::string& path) {
 
 void APIRunner::RefreshLibraries() {
   PreloadedLibraries::Refresh();
+  MemoryBound::Measure();
 }
 
 bool APIRunner::GetTableFunc(void* handle, _tag_API_TABLE** table) {

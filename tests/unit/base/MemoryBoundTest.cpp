@@ -74,6 +74,18 @@ TEST_F(MemoryBoundTest, LiftingGivesTheFormerLimitsBack) {
             0);
 }
 
+TEST_F(MemoryBoundTest, WhatWasMeasuredBeforehandIsWhatItIsBeyond) {
+  EXPECT_EQ(inChild([] {
+              MemoryBound::Measure();
+              void* volatile memory = malloc(kBound);
+              MemoryBound::Set(2 * kBound);
+              const bool isBound = canAllocate(kBound / 2) && !canAllocate(kBound + kBound / 2);
+              MemoryBound::Lift();
+              return memory != nullptr && isBound;
+            }),
+            0);
+}
+
 TEST_F(MemoryBoundTest, LowerLimitStays) {
   EXPECT_EQ(inChild([] {
               const rlimit lower{kBound / 2, kBound / 2};

@@ -7,6 +7,7 @@
 #include "webapi/base/Log.h"
 #include "webapi/runner/execution/Fence.h"
 #include "webapi/runner/library/LoadLibrary.h"
+#include "webapi/runner/library/PreloadedLibraries.h"
 
 namespace QELO {
 namespace {
@@ -118,7 +119,9 @@ bool LibraryCache::GetCheckTableFunc(void* handle, _tag_API_CHECK_TABLE** checkT
 
 void LibraryCache::CloseLib() {
   for (const auto& [path, handle] : libraries_) {
-    dlclose(handle);
+    if (!PreloadedLibraries::Close(handle)) {
+      dlclose(handle);
+    }
   }
   libraries_.clear();
   functions_.clear();

@@ -2,6 +2,8 @@
 
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <link.h>
+#include <malloc.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -53,6 +55,8 @@ struct Copy {
   time_t tried;  ///< when that was
 };
 
+/// What Find() has given and Close() has not had.
+std::vector<void*>* taken = nullptr;
 /// Null until the first is loaded: a process that loads none pays nothing.
 std::map<std::string, Copy>* copies = nullptr;
 /// Each copy's memory. Kept open, since the loader knows a copy by the descriptor's number.
@@ -115,12 +119,46 @@ std::string load(const std::string& path, Copy& copy) {
   return copy.handle != nullptr ? "" : dlerror();
 }
 
+/// As the loader does: the array from its end to its start, then the single function.
+void runDestructors(void* handle) {
+  using Destructor = void (*)();
+  const link_map* map = nullptr;
+  if (dlinfo(handle, RTLD_DI_LINKMAP, &map) != 0) {
+    return;
+  }
+  ElfW(Addr) array = 0;
+  ElfW(Addr) single = 0;
+  size_t count = 0;
+  for (const ElfW(Dyn)* entry = map->l_ld; entry->d_tag != DT_NULL; ++entry) {
+    switch (entry->d_tag) {
+      case DT_FINI_ARRAY:
+        array = map->l_addr + entry->d_un.d_ptr;
+        break;
+      case DT_FINI_ARRAYSZ:
+        count = entry->d_un.d_val / sizeof(Destructor);
+        break;
+      case DT_FINI:
+        single = map->l_addr + entry->d_un.d_ptr;
+        break;
+      default:
+        break;
+    }
+  }
+  while (array != 0 && count > 0) {
+    reinterpret_cast<const Destructor*>(array)[--count]();
+  }
+  if (single != 0) {
+    reinterpret_cast<Destructor>(single)();
+  }
+}
+
 }  // namespace
 
 bool PreloadedLibraries::Load(const std::string& path) {
   if (copies == nullptr) {
     copies = new std::map<std::string, Copy>;
     memories = new std::vector<UniqueFd>;
+    taken = new std::vector<void*>;
   }
   const std::optional<Version> version = versionOf(path);
   if (!version) {
@@ -139,6 +177,7 @@ bool PreloadedLibraries::Load(const std::string& path) {
            LogText(path).c_str(), LogText(fault).c_str());
   }
   copies->insert_or_assign(path, copy);
+  malloc_trim(0);  // each page that is kept, that of the file's text too, makes each fork dearer
   return copy.handle != nullptr;
 }
 
@@ -168,8 +207,19 @@ void* PreloadedLibraries::Find(const std::string& path) {
     return nullptr;
   }
   const std::optional<Version> now = versionOf(path);
-  return now && *now == found->second.version ? std::exchange(found->second.handle, nullptr)
-                                              : nullptr;
+  if (!now || !(*now == found->second.version)) {
+    return nullptr;
+  }
+  taken->push_back(found->second.handle);
+  return std::exchange(found->second.handle, nullptr);
+}
+
+bool PreloadedLibraries::Close(void* handle) {
+  if (taken == nullptr || std::erase(*taken, handle) == 0) {
+    return false;
+  }
+  runDestructors(handle);
+  return true;
 }
 
 }  // namespace QELO

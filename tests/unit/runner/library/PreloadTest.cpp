@@ -40,6 +40,23 @@ TEST_F(Preloading, RunnerHasThePrivateCopyOnce) {
   EXPECT_EQ(FileOf(path), path);  // the first runner has closed it
 }
 
+TEST_F(Preloading, ClosingRunsTheDestructorsOnceAndLeavesTheLibrary) {
+  const std::string path = PathTo("printing");
+  testing::internal::CaptureStdout();
+  ASSERT_TRUE(APIRunner::PreloadLibrary(path));
+  testing::internal::GetCapturedStdout();
+  testing::internal::CaptureStdout();
+  const std::string copy = FileOf(path);
+  const std::string printed = testing::internal::GetCapturedStdout();
+  const size_t first = printed.find("<descriptor>");
+  EXPECT_NE(first, std::string::npos);
+  EXPECT_EQ(printed.find("<descriptor>", first + 1), std::string::npos);
+  EXPECT_EQ(copy.rfind("/proc/self/fd/", 0), 0u);
+  void* there = dlopen(copy.c_str(), RTLD_LAZY | RTLD_NOLOAD);
+  ASSERT_NE(there, nullptr);
+  dlclose(there);
+}
+
 TEST_F(Preloading, FileThatHasNotChangedIsNotCopiedAgain) {
   const std::string path = PathTo("state");
   const auto descriptors = [] {
