@@ -7,6 +7,7 @@
 #include "programs/webapi/Arguments.h"
 #include "programs/webapi/check/Check.h"
 #include "programs/webapi/diff/Diff.h"
+#include "programs/webapi/doctor/Doctor.h"
 #include "programs/webapi/new/New.h"
 
 using namespace QELO::AuthorProgram;
@@ -18,6 +19,7 @@ constexpr char kHelp[] =
     "    call    calls an API of this host; webapi-exec is another name of it\n"
     "    check   checks descriptions of APIs, and that their libraries have what they list\n"
     "    diff    tells what callers of an old description meet in a new one\n"
+    "    doctor  tells what calls need on this host and lack\n"
     "    new     writes a new API library, with tests\n"
     "webapi COMMAND --help\n"
     "    tells more of a command.\n";
@@ -30,6 +32,7 @@ struct Command {
 constexpr Command kCommands[] = {
     {"check", Check},
     {"diff", Diff},
+    {"doctor", Doctor},
     {"new", New},
 };
 

@@ -44,6 +44,8 @@ IMPLEMENTED_IN = {
 EXCEPTIONS = {
     ("programs/webapi-token/Commands.cpp", "platform"):
         "the administrators' program for the token database, which is the embedded platform's own",
+    ("programs/webapi/doctor/Host.cpp", "platform"):
+        "the administrators' program looks at the places that the embedded platform alone knows",
     ("webapi/runner/APIRunner.cpp", "webapi/batch"):
         "a compound request is one of a call's three roads, and its entries are dispatched "
         "again: the circle is the call's own",

@@ -86,6 +86,11 @@ void checkContent(const std::string& path, const Json::Value& root, const CheckO
     if (baseName(path).ends_with(kSuffix)) {
       checkFileName(path, it.name(), *it, findings);
     }
+    const std::string tooMuch = TooMuchIn(*it);
+    if (!tooMuch.empty()) {
+      findings.AddAtName(Findings::kError, *it, tooMuch);
+      continue;
+    }
     CheckAPI(*it, options, findings);
     libraries.Check(path, it.name(), *it, findings);
   }

@@ -19,8 +19,6 @@ namespace {
 using JsonHelper::hasMember;
 using JsonHelper::member;
 
-constexpr int kMostVersions = 1000;
-
 class APICheck {
  public:
   APICheck(const Json::Value& description, const CheckOptions& options, Findings& findings)
@@ -164,8 +162,8 @@ class APICheck {
     if (first < 1) {
       Refuse(least, "versions begin with 1");
     }
-    if (static_cast<int64_t>(last) - first >= kMostVersions) {
-      return Refuse(most, "that makes more than " + std::to_string(kMostVersions) + " versions");
+    if (static_cast<int64_t>(last) - first >= static_cast<int64_t>(kMostEntries)) {
+      return Refuse(most, "that makes more than " + std::to_string(kMostEntries) + " versions");
     }
     for (int version = std::max(first, 1); version <= last; ++version) {
       if (!hasMember(methods, std::to_string(version))) {

@@ -35,7 +35,8 @@ std::string read(const std::string& path, DescriptionText& text) {
     return Shown(path) + ": it must be an object";
   }
   for (auto it = text.Root().begin(); it != text.Root().end(); ++it) {
-    const std::string fault = APIDescription(*it).Fault();
+    std::string fault = APIDescription(*it).Fault();
+    fault = fault.empty() ? TooMuchIn(*it) : fault;
     if (!fault.empty()) {
       return PlaceText(path, text.PositionAt(static_cast<size_t>(it->getOffsetStart()))) +
              "error: no description of " + Quoted(it.name()) + ": " + fault;

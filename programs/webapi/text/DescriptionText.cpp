@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "programs/webapi/Arguments.h"
+#include "webapi/JsonHelper.h"
 #include "webapi/base/TextFile.h"
 #include "webapi/json/Reader.h"
 
@@ -13,6 +14,20 @@ namespace QELO::AuthorProgram {
 std::string PlaceText(const std::string& path, const JsonHelper::Position& position) {
   return Shown(path) + ":" + std::to_string(position.line) + ":" + std::to_string(position.column) +
          ": ";
+}
+
+std::string TooMuchIn(const Json::Value& description) {
+  const Json::Value& methods = JsonHelper::member(description, "methods");
+  const std::string most = "more than " + std::to_string(kMostEntries);
+  if (methods.isObject() && methods.size() > kMostEntries) {
+    return "it has " + most + " versions";
+  }
+  for (auto it = methods.begin(); methods.isObject() && it != methods.end(); ++it) {
+    if (it->isArray() && it->size() > kMostEntries) {
+      return "version " + Shown(it.name()) + " has " + most + " methods";
+    }
+  }
+  return "";
 }
 
 std::string DescriptionText::ReadFile(const std::string& path) {

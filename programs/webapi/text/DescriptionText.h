@@ -36,6 +36,12 @@ class DescriptionText {
   std::vector<Twice> twices_;
 };
 
+/// Versions of an API, and methods of a version, that are looked at.
+inline constexpr Json::ArrayIndex kMostEntries = 1000;
+
+/// What is too much in an API's description to be looked at; "" when nothing is.
+std::string TooMuchIn(const Json::Value& description);
+
 /// "FILE:LINE:COLUMN: "
 std::string PlaceText(const std::string& path, const JsonHelper::Position& position);
 

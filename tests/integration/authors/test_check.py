@@ -166,10 +166,19 @@ def test_Check_OfHostileFile_SaysWhatItIs(check, text, finding):
 
 
 def test_Check_OfManyErrors_EndsAfterAHundred(check):
-    methods = ", ".join(f'{{"m{i}": {{"no": 1}}}}' for i in range(5000))
+    methods = ", ".join(f'{{"m{i}": {{"no": 1}}}}' for i in range(900))
     lines, status = check(GOOD.replace('"echo"', methods))
     assert (len(lines), status) == (101, 1)
     assert "that is enough" in lines[-1]
+
+
+def test_Check_OfTooMuch_SaysSo(check):
+    methods = ", ".join(f'"m{i}"' for i in range(1001))
+    assert check(GOOD.replace('"echo"', methods)) == (["2:3: error: version 1 has more than 1000 methods"], 1)
+    versions = ", ".join(f'"{i}": ["x"]' for i in range(2, 1002))
+    assert check(GOOD.replace('"1": [', versions + ', "1": [')) == (["2:3: error: it has more than 1000 versions"], 1)
+    lines, _ = check(GOOD.replace('"maxVersion": 1', '"maxVersion": 2000000000'))
+    assert lines == ["5:19: error: that makes more than 1000 versions"]
 
 
 def test_Check_OfControlCharacters_PrintsNone(check):

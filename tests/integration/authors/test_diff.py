@@ -200,6 +200,8 @@ def test_Diff_TellsThePlaces(diff, tmp_path):
     ("[" * 10000, "new.lib:1:257: error: no JSON from here on"),
     ("[]", "new.lib: it must be an object"),
     ('{"A.B": {}}', 'new.lib:1:9: error: no description of "A.B": "lib" is no string'),
+    (json.dumps({"A.B": {**api(), "methods": {"1": ["x"] * 1001}}}),
+     'new.lib:1:9: error: no description of "A.B": version 1 has more than 1000 methods'),
     (None, "new.lib: No such file or directory"),
 ])
 def test_Diff_OfWhatIsNoDescription_SaysWhy(tmp_path, new, reason):
