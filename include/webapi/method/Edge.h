@@ -27,7 +27,9 @@ inline void Answer(APIResponse&, const Answered&) {}
 inline void Answer(APIResponse& response, const Download& file) {
   if (const int error = Send(response, file); error != 0) {
     Answer(response, Error{file.unreadable, ReasonOf(error)});
+    return;
   }
+  response.SetSuccess();  // calls from code would get 117
 }
 
 template <typename T>

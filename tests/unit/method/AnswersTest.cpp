@@ -163,6 +163,11 @@ TEST_F(MethodAnswers, DownloadIsSent) {
             "HTTPFileOutputer::Output(stream, , type/of-book.csv)");
 }
 
+TEST_F(MethodAnswers, DownloadThatWasSentIsASuccessForCallsFromCode) {
+  EXPECT_EQ(Answer(Method<report>), R"({"success":true})");
+  EXPECT_FALSE(response->IsEnableOutput());
+}
+
 TEST_F(MethodAnswers, DownloadThatCannotBeSentIsAnError) {
   FakePlatform::Get().fileOutput = -1;
   EXPECT_EQ(
