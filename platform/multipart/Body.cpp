@@ -1,5 +1,6 @@
 #include "platform/multipart/Body.h"
 
+#include <fcntl.h>
 #include <poll.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -13,6 +14,11 @@
 namespace QELO::Platform {
 namespace {
 
+constexpr uint64_t kUsualRoom = 64 << 10;  ///< bytes that a pipe holds
+/// Bytes that one may hold: what is read at once, which saves the server and this process three of
+/// four turns.
+constexpr int kPipeRoom = 256 << 10;
+
 bool hasAWriter(int descriptor) {
   struct stat info {};
   return fstat(descriptor, &info) != 0 || !S_ISREG(info.st_mode);
@@ -25,7 +31,11 @@ Body::Body(int descriptor, uint64_t length, const PaceLimits& limits)
       length_(length),
       left_(length),
       pace_(limits),
-      mayBlock_(hasAWriter(descriptor)) {}
+      mayBlock_(hasAWriter(descriptor)) {
+  if (length > kUsualRoom) {
+    fcntl(descriptor, F_SETPIPE_SZ, kPipeRoom);  // not where it is no pipe, or there is no room
+  }
+}
 
 int64_t Body::Read(char* buffer, size_t size) {
   const size_t wanted = static_cast<size_t>(std::min<uint64_t>(size, left_));

@@ -1,6 +1,5 @@
 // The body of a request as it arrives, into the unfinished file.
 
-#include <fcntl.h>
 #include <unistd.h>
 #include <webapi/APIUpload.h>
 
@@ -36,12 +35,6 @@ int writeAll(int file, const char* data, size_t size, uint64_t at) {
   return 0;
 }
 
-/// Where the body comes by a pipe, it may hold as much as is read at once, which saves the server
-/// and this process three of four turns.
-void widenPipe() {
-  fcntl(STDIN_FILENO, F_SETPIPE_SZ, static_cast<int>(kPiece));
-}
-
 /// The bytes of the request's body; without an end where the server does not know them.
 uint64_t announcedLength(const std::string& header) {
   uint64_t length = std::numeric_limits<uint64_t>::max();
@@ -56,7 +49,6 @@ uint64_t announcedLength(const std::string& header) {
 int receive(int file, uint64_t end, uint64_t left, Digest* digest, uint64_t& length, bool& isMore) {
   const std::unique_ptr<char[]> buffer(new char[kPiece]);
   isMore = false;
-  widenPipe();
   while (left > 0 && !isMore) {
     // One more than there may be shows whether there is more.
     const size_t room = std::min({uint64_t{kPiece}, end - length + 1, left});

@@ -73,6 +73,14 @@ TEST_F(BodyOnAPipe, ClientThatIsTooSlowIsGivenUpThoughBytesCome) {
   EXPECT_LT(taken, 20);
 }
 
+TEST_F(BodyOnAPipe, LargeOneHasMoreRoomThere) {
+  const int usual = fcntl(out.Get(), F_GETPIPE_SZ);
+  const Body small(out.Get(), 60'000, idle(10));
+  EXPECT_EQ(fcntl(out.Get(), F_GETPIPE_SZ), usual);
+  const Body large(out.Get(), 1'000'000, idle(10));
+  EXPECT_EQ(fcntl(out.Get(), F_GETPIPE_SZ), 256 << 10);
+}
+
 TEST_F(BodyOnAPipe, EarlyEndIsABreak) {
   Body body(out.Get(), 10, idle(1000));
   Send("1234");
