@@ -11,24 +11,11 @@ from urllib.parse import urlencode
 import pytest
 
 from conftest import ENTRY, answer_of, needs_root
-from files import API, alice, bob, common, give, give_folder, home, put  # noqa: F401  (fixtures)
+from files import (API, BAD_NAMES, alice, bob, common, give, give_folder, home,  # noqa: F401
+                   outside, put)
 
 WAYS_OUT = ["/own/..", "/own/../bob", "/own/a/../../bob", "/..", "../etc", "/own/./a", "//etc",
             "/own//a", "", "home", "/etc/../home", "/own/\x00/a", "/own/a\x00"]
-BAD_NAMES = ["", ".", "..", "a/b", "../x", "/x", "a\x00b", "a\nb", "a\rb", "\x07", "\x1b[2J", "a\x7f",
-             "x" * 256, "ü" * 128, ".qelo-part-x"]
-
-
-@pytest.fixture
-def outside(tmp_path):
-    """Somewhere that all may write and no call may reach."""
-    (tmp_path / "secret").write_text("secret")
-    (tmp_path / "secret").chmod(0o666)
-    tmp_path.chmod(0o777)
-    before = sorted(path.name for path in tmp_path.iterdir())
-    yield tmp_path
-    assert sorted(path.name for path in tmp_path.iterdir()) == before
-    assert (tmp_path / "secret").read_text() == "secret"
 
 
 @pytest.mark.parametrize("path", WAYS_OUT)

@@ -10,6 +10,9 @@ from accounts import account
 from conftest import ROOT, session_of
 
 API = "QELO.Files.Item"
+# What nothing may be called.
+BAD_NAMES = ["", ".", "..", "a/b", "../x", "/x", "a\x00b", "a\nb", "a\rb", "\x07", "\x1b[2J", "a\x7f",
+             "x" * 256, "ü" * 128, ".qelo-part-x"]
 
 
 class Visitor:
@@ -56,6 +59,18 @@ def home(root):
 def common(root):
     """The folder that alice and bob share."""
     yield from emptied(root / "srv" / "common")
+
+
+@pytest.fixture
+def outside(tmp_path):
+    """Somewhere that all may write and no call may reach."""
+    (tmp_path / "secret").write_text("secret")
+    (tmp_path / "secret").chmod(0o666)
+    tmp_path.chmod(0o777)
+    before = sorted(path.name for path in tmp_path.iterdir())
+    yield tmp_path
+    assert sorted(path.name for path in tmp_path.iterdir()) == before
+    assert (tmp_path / "secret").read_text() == "secret"
 
 
 def emptied(folder):
