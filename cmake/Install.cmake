@@ -20,7 +20,8 @@ endif()
 install(TARGETS webapi EXPORT webapi-targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
 # Who may start the CGI program, and that it takes root's rights. Where no group was configured, a
 # program that is replaced hands on what it had, so that an upgrade locks nobody out.
-set(webapi_entry "\$ENV{DESTDIR}${CMAKE_INSTALL_FULL_LIBEXECDIR}/webapi/entry.cgi")
+foreach(program entry.cgi rest.cgi)
+set(webapi_entry "\$ENV{DESTDIR}${CMAKE_INSTALL_FULL_LIBEXECDIR}/webapi/${program}")
 install(CODE "
   set(webapi_group [[${WEBAPI_CGI_GROUP}]])
   execute_process(COMMAND stat -c %a:%g \"${webapi_entry}\"
@@ -28,7 +29,7 @@ install(CODE "
   if(NOT webapi_group AND webapi_before MATCHES \"^4750:([0-9]+)\$\")
     set(webapi_group \${CMAKE_MATCH_1})
   endif()")
-install(TARGETS entry.cgi RUNTIME DESTINATION ${CMAKE_INSTALL_LIBEXECDIR}/webapi)
+install(TARGETS ${program} RUNTIME DESTINATION ${CMAKE_INSTALL_LIBEXECDIR}/webapi)
 install(CODE "
   if(webapi_group)
     message(STATUS \"Set-user-id for the group \${webapi_group}: ${webapi_entry}\")
@@ -38,6 +39,7 @@ install(CODE "
   else()
     message(STATUS \"No web server may use it yet (-DWEBAPI_CGI_GROUP): ${webapi_entry}\")
   endif()")
+endforeach()
 install(DIRECTORY include/webapi DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}
         FILES_MATCHING PATTERN *.h)
 

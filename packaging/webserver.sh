@@ -7,9 +7,9 @@ webserver_helper_pid=
 webserver_account=www-data  # Apache's, where root starts it: it serves nothing as root
 webserver_packaging=$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd)
 
-# webserver_start DIR PORT ENTRY PID [EXTRA]: serves ENTRY as /webapi/entry.cgi, with configuration
-# and logs in DIR; PID is the file for its process id, EXTRA one of further configuration. The
-# server ends with this shell, however that ends. Says why when it cannot start.
+# webserver_start DIR PORT ENTRY PID [EXTRA]: serves ENTRY as /webapi/entry.cgi, and the rest.cgi
+# beside it as /webapi/rest, with configuration and logs in DIR; PID is the file for its process id,
+# EXTRA one of further configuration. The server ends with this shell, however that ends. Says why when it cannot start.
 webserver_start() {
   local dir=$1 port=$2 entry=$3 pid=$4 extra=${5:-} tries command=()
   mkdir -p "$dir/www" "$dir/uploads"
@@ -48,13 +48,14 @@ webserver_as_root() {
   [[ $(id -u) -ne 0 ]] || printf ' %s' "$1"
 }
 
-# webserver_lend DIR ENTRY: lets Apache's account start ENTRY as root, as DIR/entry.cgi.
+# webserver_lend DIR ENTRY: lets Apache's account start ENTRY, and the rest.cgi beside it, as root from
+# DIR.
 webserver_lend() {
   local dir=$1 entry=$2
-  install -m 0755 "$entry" "$dir/entry.cgi"
+  install -m 0755 "$entry" "${entry%/*}/rest.cgi" "$dir"
   [[ $(id -u) -eq 0 ]] || return 0
-  chgrp "$webserver_account" "$dir/entry.cgi"
-  chmod 4750 "$dir/entry.cgi"
+  chgrp "$webserver_account" "$dir/entry.cgi" "$dir/rest.cgi"
+  chmod 4750 "$dir/entry.cgi" "$dir/rest.cgi"
   if ! setpriv --reuid "$webserver_account" --regid "$webserver_account" --clear-groups \
       test -x "$dir/entry.cgi"; then
     echo "Apache runs as $webserver_account, which may not enter $dir; choose another server." >&2
@@ -67,7 +68,8 @@ webserver_start_fcgiwrap() {
   local dir=$1 entry=$2 tries
   rm -f "$dir/fcgiwrap.sock"
   # A group of its own, since it leaves its processes behind.
-  setsid setpriv --pdeathsig TERM /usr/sbin/fcgiwrap -f -c 8 -p "$entry" -s "unix:$dir/fcgiwrap.sock" \
+  setsid setpriv --pdeathsig TERM /usr/sbin/fcgiwrap -f -c 8 -p "$entry" -p "${entry%/*}/rest.cgi" \
+    -s "unix:$dir/fcgiwrap.sock" \
     >> "$dir/cgi.log" 2>&1 &
   webserver_helper_pid=$!
   for ((tries = 0; tries < 100; tries++)); do
@@ -84,7 +86,7 @@ webserver_start_fcgiwrap() {
 webserver_configure() {
   local dir=$1 port=$2 entry=$3 pid=$4 extra=$5 name=$webserver_kind
   [[ $name != apache ]] || name=apache2
-  sed -e "s|@DIR@|$dir|g; s|@PORT@|$port|g; s|@ENTRY@|$entry|g; s|@PID@|$pid|g" \
+  sed -e "s|@DIR@|$dir|g; s|@PORT@|$port|g; s|@ENTRY@|$entry|g; s|@REST@|${entry%/*}/rest.cgi|g; s|@PID@|$pid|g" \
     "$webserver_packaging/$name.conf.in" > "$dir/$name.conf"
   [[ -n $extra ]] || return 0
   if [[ $webserver_kind == nginx ]]; then  # into its server

@@ -119,6 +119,8 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// Opens the section's AES envelope, whose members are gone afterwards; true when it has none.
   bool DecryptAESParam(Json::Value& section);
 
+  /// From here on errors are told by the HTTP status, too: for programs whose clients go by it.
+  void TellErrorsByStatus() { tellsStatus_ = true; }
   /// Print the response to standard output, whatever IsEnableOutput() says: header lines, cookies
   /// and those that go with every answer; then the body as JSON, bytes that are no UTF-8 replaced.
   /// A client that is gone is no failure.
@@ -141,8 +143,9 @@ class WEBAPI_API WebEntry : public APIRunner {
 
   Json::Value temporaryFiles_;                   ///< paths of the upload's files, a list
   alignas(void*) unsigned char cgiContext_[60];  ///< the CGI library's, see Context()
-  Json::Value permission_;  ///< "permResult": authorisation results, by CheckPermission(bool)
-  bool hasUpload_ = false;  ///< there may be temporary files
+  Json::Value permission_;    ///< "permResult": authorisation results, by CheckPermission(bool)
+  bool hasUpload_ = false;    ///< there may be temporary files
+  bool tellsStatus_ = false;  ///< errors have an HTTP status
   std::unique_ptr<PermissionCheck> check_;  ///< over the members above
   std::unique_ptr<LinkCheck> links_;        ///< likewise; made by the first call by a link
 };

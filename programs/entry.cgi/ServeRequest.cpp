@@ -20,8 +20,7 @@ void closeAnswer() {
   PutNullOver({STDOUT_FILENO});
 }
 
-void serve(int argc, char** argv) {
-  WebEntry entry;
+void serve(WebEntry& entry, int argc, char** argv) {
   entry.SetArgs(argc, argv);
   entry.Run(Json::Value());
   closeAnswer();
@@ -29,14 +28,19 @@ void serve(int argc, char** argv) {
 
 }  // namespace
 
-int ServeRequest(int argc, char** argv) {
+int ServeRequest(int argc, char** argv, std::unique_ptr<WebEntry> (*make)()) {
   WebEntry::GuardProcess();
   if (chdir(Paths::kDescriptionDir) != 0) {
     std::perror(Paths::kDescriptionDir);
     return 1;
   }
   try {
-    serve(argc, argv);
+    if (make != nullptr) {
+      serve(*make(), argc, argv);
+    } else {
+      WebEntry entry;
+      serve(entry, argc, argv);
+    }
     return 0;
   } catch (
       const std::exception& error) {  // before or after the answer, which has a guard of its own

@@ -17,6 +17,7 @@
 #include "webapi/entry/intake/Intake.h"
 #include "webapi/entry/intake/UnreadBody.h"
 #include "webapi/entry/output/AnswerText.h"
+#include "webapi/entry/output/ErrorStatus.h"
 #include "webapi/entry/output/WriteAnswer.h"
 #include "webapi/entry/permission/PermissionCheck.h"
 #include "webapi/entry/sharing/LinkCheck.h"
@@ -165,6 +166,9 @@ bool WebEntry::Run(const Json::Value&) {
   UnreadBody body = UnreadBody::OfRequest();
   if (!guarded([this] { Serve(); })) {
     guarded([this] { Response()->SetError(WEBAPI_ERR_NO_ANSWER); });
+  }
+  if (tellsStatus_) {
+    guarded([this] { SetErrorStatus(*Request(), *Response()); });
   }
   guarded([this] { RemoveUpload(); });  // a client that has its answer may have the process ended
   if (!guarded([&] { answer(*Response(), body); })) {

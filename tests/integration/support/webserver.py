@@ -35,7 +35,7 @@ class WebServer:
         if "@SOCKET@" in text:  # in a directory that nobody but root may write
             self.socket = Path(tempfile.mkdtemp(prefix="webapi-socket-")) / "server.sock"
             self.socket.parent.chmod(0o755)
-        values = {"SOCKET": self.socket, "DIR": directory, "PORT": self.port, "ENTRY": entry, "PID": pid or f"{directory}/pid"}
+        values = {"SOCKET": self.socket, "DIR": directory, "PORT": self.port, "ENTRY": entry, "REST": Path(entry).with_name("rest.cgi"), "PID": pid or f"{directory}/pid"}
         for name, value in values.items():
             text = text.replace(f"@{name}@", str(value))
         self.entry = entry
@@ -146,7 +146,7 @@ class Nginx(WebServer):
         path = self.directory / "fcgiwrap.sock"
         with open(self.directory / "cgi.log", "ab") as log:
             helper = subprocess.Popen(
-                ["/usr/sbin/fcgiwrap", "-f", "-c", str(self.processes), "-p", self.entry,
+                ["/usr/sbin/fcgiwrap", "-f", "-c", str(self.processes), "-p", self.entry, "-p", Path(self.entry).with_name("rest.cgi"),
                  "-s", f"unix:{path}"],
                 stdin=subprocess.DEVNULL, stdout=log, stderr=log, start_new_session=True, **identity,
             )

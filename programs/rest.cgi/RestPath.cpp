@@ -1,0 +1,25 @@
+#include "programs/rest.cgi/RestPath.h"
+
+#include "webapi/base/Number.h"
+#include "webapi/base/Text.h"
+
+namespace QELO {
+
+bool RestPath::Read(std::string_view path, RestPath& call) {
+  if (path.substr(0, 1) != "/") {
+    return false;
+  }
+  path.remove_prefix(1);
+  const std::string_view api = TakePiece(path, "/");
+  const std::string_view version = TakePiece(path, "/");
+  int number = 0;
+  if (api.empty() || path.empty() || path.find('/') != std::string_view::npos ||
+      version.substr(0, 1) != "v" || !ParseNumber(version.substr(1), number) || number < 1 ||
+      "v" + std::to_string(number) != version) {
+    return false;
+  }
+  call = {std::string(api), number, std::string(path)};
+  return true;
+}
+
+}  // namespace QELO
