@@ -7,9 +7,14 @@
 #include <webapi/APIRunner.h>
 #include <webapi/APITable.h>
 #include <webapi/JsonHelper.h>
+#include <webapi/MethodDescription.h>
 #include <webapi/WebAPIError.h>
 
+#include <algorithm>
 #include <string>
+#include <vector>
+
+#include "OpenApi.h"
 
 namespace {
 
@@ -25,13 +30,30 @@ constexpr char kApi[] = "QELO.Catalog.API";
 /// libraries and sockets stay out.
 class Catalogue {
  public:
-  explicit Catalogue(const APIRequest& request) : request_(request) {}
+  /// @param withTexts  tells schemas and texts, too
+  Catalogue(const APIRequest& request, bool withTexts) : request_(request), withTexts_(withTexts) {}
 
   /// Every described API, callable or not.
   Json::Value All() {
     Json::Value all(Json::objectValue);
     runner_.InitLibDesc(all);
     return all;
+  }
+
+  /// The APIs whose names begin with a prefix and of which the caller may call something.
+  Json::Value Beginning(const std::string& prefix) {
+    const Json::Value all = All();
+    Json::Value apis(Json::arrayValue);
+    for (auto it = all.begin(); it != all.end(); ++it) {
+      if (it.name().compare(0, prefix.size(), prefix) != 0) {
+        continue;
+      }
+      const Json::Value api = Describe(it.name());
+      if (!api.isNull()) {
+        apis.append(api);
+      }
+    }
+    return apis;
   }
 
   /// One API with the methods that the caller may call; null when there is none.
@@ -87,10 +109,12 @@ class Catalogue {
   }
 
   /// What of a method's attributes its callers may know.
-  static Json::Value Shown(const Json::Value& attributes, bool withUsers) {
+  Json::Value Shown(const Json::Value& attributes, bool withUsers) const {
+    const std::vector<std::string>& texts = QELO::MethodDescription::Keys();
     Json::Value shown(Json::objectValue);
     for (auto it = attributes.begin(); attributes.isObject() && it != attributes.end(); ++it) {
-      if (it->isBool() || (it.name() == "allowUser" && withUsers)) {
+      const bool isText = std::find(texts.begin(), texts.end(), it.name()) != texts.end();
+      if (isText ? withTexts_ : it->isBool() || (it.name() == "allowUser" && withUsers)) {
         shown[it.name()] = *it;
       }
     }
@@ -98,26 +122,15 @@ class Catalogue {
   }
 
   const APIRequest& request_;
+  const bool withTexts_;
   APIRunner runner_;
   Json::Value found_ = Json::Value(Json::objectValue);
 };
 
 void List(APIRequest* request, APIResponse* response) {
   const std::string prefix = request->GetAndCheckString("prefix", APIRequest::PARAM_OPTIONAL).Get();
-  Catalogue catalogue(*request);
-  const Json::Value all = catalogue.All();
-  Json::Value apis(Json::arrayValue);
-  for (auto it = all.begin(); it != all.end(); ++it) {
-    if (it.name().compare(0, prefix.size(), prefix) != 0) {
-      continue;
-    }
-    const Json::Value api = catalogue.Describe(it.name());
-    if (!api.isNull()) {
-      apis.append(api);
-    }
-  }
   Json::Value data(Json::objectValue);
-  data["apis"] = apis;
+  data["apis"] = Catalogue(*request, false).Beginning(prefix);
   response->SetSuccess(data);
 }
 
@@ -128,7 +141,7 @@ void Describe(APIRequest* request, APIResponse* response) {
     response->SetError(QELO::WEBAPI_ERR_BAD_REQUEST);
     return;
   }
-  const Json::Value api = Catalogue(*request).Describe(name.Get());
+  const Json::Value api = Catalogue(*request, true).Describe(name.Get());
   if (api.isNull()) {
     response->SetError(QELO::WEBAPI_ERR_NO_SUCH_API);
     return;
@@ -136,9 +149,15 @@ void Describe(APIRequest* request, APIResponse* response) {
   response->SetSuccess(api);
 }
 
+void Document(APIRequest* request, APIResponse* response) {
+  const std::string prefix = request->GetAndCheckString("prefix", APIRequest::PARAM_OPTIONAL).Get();
+  response->SetSuccess(OpenApi(Catalogue(*request, true).Beginning(prefix)));
+}
+
 QELO::_tag_API_TABLE table[] = {
     {kApi, 1, "list", List},
     {kApi, 1, "describe", Describe},
+    {kApi, 1, "openapi", Document},
     {nullptr, 0, nullptr, nullptr},
 };
 

@@ -91,8 +91,14 @@ def test_Describe_TellsOneApi(client, alice):
     api = client.call(API, "describe", name=API, _sid=alice["sid"]).data
     assert api["api"] == API
     assert (api["minVersion"], api["maxVersion"], api["authLevel"]) == (1, 1, 1)
-    assert set(api["methods"]["1"]) == {"list", "describe"}
-    assert api == listed(client, alice)[API]
+    assert set(api["methods"]["1"]) == {"list", "describe", "openapi"}
+    told = api["methods"]["1"]["describe"]
+    assert told["params"]["required"] == ["name"]
+    assert told["summary"] and told["example"] == {"name": API}
+    for method in api["methods"]["1"].values():
+        for key in ("summary", "description", "params", "returns", "errors", "example"):
+            method.pop(key, None)
+    assert api == listed(client, alice)[API], "which has neither texts nor schemas"
 
 
 def test_Describe_OfAnUnknownOrForbiddenApi_IsNoSuchApi(client, alice, admin):
@@ -104,4 +110,6 @@ def test_Describe_OfAnUnknownOrForbiddenApi_IsNoSuchApi(client, alice, admin):
 
 def test_Describe_WithoutName_IsBadInput(client, alice):
     assert client.call(API, "describe", _sid=alice["sid"]).code == 101
-    assert client.call(API, "describe", name="[]", _sid=alice["sid"]).code == 101
+    assert client.call(API, "describe", name="[]", _sid=alice["sid"]).code == 102, "a text"
+    answer = client.call(API, "describe", _sid=alice["sid"])
+    assert [fault["path"] for fault in answer.json["error"]["errors"]] == ["/name"]
