@@ -67,6 +67,14 @@ class WEBAPI_API APIRequest {
   /// @param replace  drop the parameters there are first
   void InitParam(const Json::Value& params, bool replace);
   void InitParam(Json::Value&& params, bool replace);
+  /// Keeps a parameter line, deciphered and otherwise as it was sent, beside the parameters that it
+  /// became; and texts by name, an object. They stay with this object alone: neither a copy nor the
+  /// record has them, and parameters that are replaced have none.
+  void KeepSentLine(std::string&& line);
+  void KeepSentTexts(Json::Value&& texts);
+  /// What was kept, an object of texts by name.
+  Json::Value GetSentTexts() const;
+  void ForgetSentTexts();
   /// Replaces the API's description.
   void InitAPIInfo(const Json::Value& description);
   /// Replaces what is known of the caller, the cached user id and user classes included.

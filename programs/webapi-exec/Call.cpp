@@ -106,12 +106,17 @@ std::string makeCall(const Options& options, Json::Value& answer) {
     return options.output + ": " + strerror(closed);
   }
   const bool isBatch = !options.batch.empty();
+  Json::Value attributes(Json::objectValue);
+  if (!isBatch) {  // whose entries have parameters of their own
+    attributes["_sent_texts"] = options.sent;
+  }
   ExecParam param;
   param.SetParams(options.params)
       .SetAPI(isBatch ? kBatchAPI : options.api)
       .SetVersion(options.version != 0 ? options.version : 1)
       .SetMethod(isBatch ? kBatchMethod : options.method)
       .SetEnv(requestOf(upload, output))
+      .SetAttr(attributes)
       .SetRunner(user)
       .SetOutputFd(output.Descriptor());
   TransferCall call(param, output, !options.output.empty());

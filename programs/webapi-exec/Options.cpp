@@ -85,7 +85,8 @@ std::string readVersion(const std::string& text, int& version) {
 }
 
 /// Reads "name=value" by the rule for parameters on the wire.
-std::string readParam(const std::string& text, Json::Value& params) {
+/// @param sent  receives the value as it was given
+std::string readParam(const std::string& text, Json::Value& params, Json::Value& sent) {
   const size_t equals = text.find('=');
   if (equals == std::string::npos || equals == 0) {
     return "--param takes NAME=VALUE";
@@ -93,6 +94,7 @@ std::string readParam(const std::string& text, Json::Value& params) {
   const std::string line = WebAPIUtil::URLEncode(text.substr(0, equals)) + "=" +
                            WebAPIUtil::URLEncode(text.substr(equals + 1));
   WebAPIUtil::strPairToJsonObj(line, params, true, true);
+  WebAPIUtil::strPairToJsonObj(line, sent, true, false);
   return "";
 }
 
@@ -192,7 +194,7 @@ std::string take(int option, const std::string& argument, Options& options, std:
       // An empty name, as of a variable that is not set, must not mean the caller, who may be root.
       return takeWord(argument, "--user takes a name", options.user);
     case kParam:
-      return readParam(argument, options.params);
+      return readParam(argument, options.params, options.sent);
     case kJson:
       return takeWord(argument, "--json takes a file", json);
     case kUpload:

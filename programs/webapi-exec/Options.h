@@ -27,6 +27,7 @@ struct Options {
   std::string method;
   std::string user;
   Json::Value params{Json::objectValue};
+  Json::Value sent{Json::objectValue};  ///< texts of parameters, for methods that declare texts
   std::vector<std::pair<std::string, std::string>> uploads;  ///< fields and files
   std::string output;   ///< file for what the method prints, "" for none
   std::string batch;    ///< file of calls, "" for a single call

@@ -24,6 +24,7 @@
 #include "webapi/runner/counter/UsageCounter.h"
 #include "webapi/runner/daemon/DaemonCall.h"
 #include "webapi/runner/execution/Execution.h"
+#include "webapi/runner/execution/ParamCheck.h"
 #include "webapi/runner/library/LibraryCache.h"
 #include "webapi/runner/library/PreloadedLibraries.h"
 
@@ -190,7 +191,9 @@ bool APIRunner::ProcessSocket(APIRequest* request, APIResponse* response) {
     return false;
   }
   const CallName call(*request);
-  return TakeUpload(request, response, GetMethod(call.api, call.version, call.method)) &&
+  const Json::Value& attributes = GetMethod(call.api, call.version, call.method);
+  return TakeUpload(request, response, attributes) &&
+         ParamCheck::Passes(*request, *response, attributes) &&
          DaemonCall(*this, request).Run(response);
 }
 
@@ -207,6 +210,7 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
     IncreaseCounter(request);
   }
   return TakeUpload(request, response, attributes) &&
+         ParamCheck::Passes(*request, *response, attributes) &&
          Execution(*this, request, response).Run(attributes);
 }
 

@@ -13,11 +13,9 @@ from pathlib import Path
 
 import pytest
 
-from webserver import SOURCE
-
 API = "QELO.Catalog.API"
 TOOLS = Path(os.environ.get("WEBAPI_OPENAPI_TOOLS", "/none"))
-CLIENT = SOURCE / "tests" / "integration" / "support" / "openapi_client.ts"
+CLIENT = Path(__file__).with_name("openapi_client.ts")
 
 needs_tools = pytest.mark.skipif(
     not (TOOLS / "openapi-fetch").exists() or shutil.which("node") is None,

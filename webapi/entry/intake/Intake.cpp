@@ -100,7 +100,7 @@ bool Intake::InitGetParam(Json::Value& section) {
     response_.SetError(WEBAPI_ERR_BAD_REQUEST);
     return false;
   }
-  return DetectAndDecryptParamLine(JsonHelper::asString(query), section);
+  return ReadAndKeep(JsonHelper::asString(query), section);
 }
 
 bool Intake::InitPostParam(Json::Value& section) {
@@ -113,7 +113,7 @@ bool Intake::InitPostParam(Json::Value& section) {
     std::string body;
     const bool received = RequestBody::Read(STDIN_FILENO, length, bodyPace(), body);
     RequestBody::CloseStandardInput();
-    return received && !body.empty() && ReadLine(std::move(body), section);
+    return received && !body.empty() && ReadAndKeep(std::move(body), section);
   } catch (const std::exception& error) {
     syslog(LOG_ERR, "%s:%d %s", "WebEntry", kExceptionLine, LogText(error.what()).c_str());
     return false;
@@ -144,7 +144,14 @@ bool Intake::DetectAndDecryptParamLine(const std::string& line, Json::Value& sec
   return ReadLine(line, section);
 }
 
-bool Intake::ReadLine(std::string line, Json::Value& section) {
+bool Intake::ReadAndKeep(std::string line, Json::Value& section) {
+  std::string read;
+  const bool isRead = ReadLine(std::move(line), section, &read);
+  request_.KeepSentLine(std::move(read));
+  return isRead;
+}
+
+bool Intake::ReadLine(std::string line, Json::Value& section, std::string* read) {
   // Deciphered in place: the text ends at its first NUL, before and after.
   if (QeloCgiDetectAndDecryptParamLine(line.data()) == 0) {
     return false;
@@ -153,9 +160,16 @@ bool Intake::ReadLine(std::string line, Json::Value& section) {
   if (!CipherEnvelope::addLine(line, section)) {
     return false;
   }
+  if (read != nullptr) {
+    read->swap(line);
+  }
   line = std::string();  // a body is as large as all that was made of it
-  if (section.size() != 0 && !DecryptAESParam(section)) {
+  std::string opened;
+  if (section.size() != 0 && !CipherEnvelope::openAes(section, &opened)) {
     return false;
+  }
+  if (read != nullptr && !opened.empty()) {
+    *read += "&" + opened;
   }
   if (!JsonHelper::hasMember(JsonHelper::member(section, kEnvelope), CipherEnvelope::kCipherText)) {
     return true;

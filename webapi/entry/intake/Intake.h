@@ -32,7 +32,10 @@ class Intake {
 
  private:
   /// DetectAndDecryptParamLine() of a line that nobody needs any longer.
-  static bool ReadLine(std::string line, Json::Value& section);
+  /// @param read  unless null, receives the line that was read
+  static bool ReadLine(std::string line, Json::Value& section, std::string* read = nullptr);
+  /// As that, and keeps the line with the request.
+  bool ReadAndKeep(std::string line, Json::Value& section);
 
   APIRequest& request_;
   APIResponse& response_;

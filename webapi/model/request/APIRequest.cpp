@@ -56,6 +56,22 @@ void APIRequest::InitParam(Json::Value&& params, bool replace) {
   private_->InitParam(std::move(params), replace);
 }
 
+void APIRequest::KeepSentLine(std::string&& line) {
+  private_->Sent().AddLine(std::move(line));
+}
+
+void APIRequest::KeepSentTexts(Json::Value&& texts) {
+  private_->Sent().AddTexts(std::move(texts));
+}
+
+Json::Value APIRequest::GetSentTexts() const {
+  return private_->Sent().Read();
+}
+
+void APIRequest::ForgetSentTexts() {
+  private_->Sent().Forget();
+}
+
 void APIRequest::InitAPIInfo(const Json::Value& description) {
   private_->InitAPIInfo(description);
 }

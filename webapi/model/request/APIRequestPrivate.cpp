@@ -53,6 +53,7 @@ void APIRequestPrivate::InitEnv(Json::Value env) {
 void APIRequestPrivate::InitParam(Json::Value params, bool replace) {
   if (replace) {
     ClearData("param", "");
+    sent_.Forget();
   }
   for (const char* source : {"getParam", "postParam"}) {
     if (JsonHelper::hasMember(params, source)) {
@@ -74,6 +75,7 @@ void APIRequestPrivate::InitSession(Json::Value session) {
 
 void APIRequestPrivate::Restore(Json::Value& record) {
   Deserialize(record);
+  sent_.Forget();
   InitSharing();
 }
 

@@ -8,6 +8,7 @@
 #include "webapi/APIParameter.h"
 #include "webapi/APIRequest.h"
 #include "webapi/model/APIBase.h"
+#include "webapi/model/request/SentTexts.h"
 #include "webapi/platform/Sharing.h"
 
 namespace QELO {
@@ -71,6 +72,8 @@ class APIRequestPrivate : public APIBase {
   APIParameter<Json::Value> GetAndCheckUnitArrayParam(const std::string& name, bool required,
                                                       bool (*validator)(const Json::Value&)) const;
 
+  SentTexts& Sent() { return sent_; }
+
   const std::string& sharingId() const { return sharingId_; }
   const std::string& sharingSid() const { return sharingSid_; }
   const sharing::record::Entry& sharingEntry() const { return sharingEntry_; }
@@ -79,6 +82,7 @@ class APIRequestPrivate : public APIBase {
   int sharingUrlType() const { return sharingUrlType_; }
 
  private:
+  void Keep(bool isOfParameters, std::string& opened);
   void ParseProtocol();
   bool ParseHostAndPort();
   bool ParsePathAndName();
@@ -90,6 +94,7 @@ class APIRequestPrivate : public APIBase {
   sharing::record::Entry sharingEntry_;
   sharing::record::Session sharingSession_;
   sharing::record::Token sharingToken_;
+  SentTexts sent_;
   int sharingUrlType_ = 0;  ///< a sharing::_tag_SHARING_URL_TYPE
 };
 

@@ -1,5 +1,7 @@
 #include "webapi/model/request/CipherEnvelope.h"
 
+#include <cstring>
+
 #include "webapi/JsonHelper.h"
 #include "webapi/platform/Cgi.h"
 #include "webapi/platform/Credential.h"
@@ -25,11 +27,19 @@ bool addLine(const std::string& line, Json::Value& section) {
   return WebAPIUtil::strPairToJsonObj(line, section, true, true);
 }
 
-bool openText(std::string text, Json::Value& section) {
-  return QeloCgiDecryptParam(text.data()) != 0 && addLine(text.c_str(), section);
+bool openText(std::string text, Json::Value& section, std::string* opened) {
+  if (QeloCgiDecryptParam(text.data()) == 0) {
+    return false;
+  }
+  text.resize(strlen(text.c_str()));
+  const bool isAdded = addLine(text, section);
+  if (opened != nullptr) {
+    opened->swap(text);
+  }
+  return isAdded;
 }
 
-bool openAes(Json::Value& section) {
+bool openAes(Json::Value& section, std::string* opened) {
   if (!JsonHelper::hasMember(section, kAesToken) || !JsonHelper::hasMember(section, kAesText)) {
     return true;
   }
@@ -43,7 +53,14 @@ bool openAes(Json::Value& section) {
     return false;
   }
   std::string plain;
-  return CredRequestUtil::GetDecryptAESString(key, text, plain) && addLine(plain, section);
+  if (!CredRequestUtil::GetDecryptAESString(key, text, plain)) {
+    return false;
+  }
+  const bool isAdded = addLine(plain, section);
+  if (opened != nullptr) {
+    opened->swap(plain);
+  }
+  return isAdded;
 }
 
 }  // namespace QELO::CipherEnvelope

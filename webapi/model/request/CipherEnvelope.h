@@ -20,9 +20,11 @@ std::string take(Json::Value& section, const char* name);
 bool addLine(const std::string& line, Json::Value& section);
 
 /// Deciphers a line of the platform's own cipher, which ends at its first NUL, before and after.
-bool openText(std::string text, Json::Value& section);
+/// @param opened  unless null, receives the line
+bool openText(std::string text, Json::Value& section, std::string* opened = nullptr);
 
 /// Opens the section's AES envelope; true when it has none.
-bool openAes(Json::Value& section);
+/// @param opened  unless null, receives the line, and stays as it is without an envelope
+bool openAes(Json::Value& section, std::string* opened = nullptr);
 
 }  // namespace QELO::CipherEnvelope

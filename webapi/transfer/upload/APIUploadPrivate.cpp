@@ -93,6 +93,9 @@ int APIUploadPrivate::GetUploadAll(Json::Value& params, Json::Value* tmpFiles) t
     WEBAPI_LOG("APIUpload.cpp", "cannot convert hash to Json object!");
     return APIUpload::NO_MEMORY;
   }
+  Json::Value texts(Json::objectValue);
+  forEach(parameters.hash, [&texts](const char* name, const char* text) { texts[name] = text; });
+  request_->KeepSentTexts(std::move(texts));
   forEach(files.hash, [&](const char* field, const char* path) {
     const char* name = QLIBCSzHashGetValue(parameters.hash, field);
     AddFile(field, name != nullptr ? name : "", path);
