@@ -1,11 +1,11 @@
 #include <signal.h>
-#include <sqlite3.h>
 #include <time.h>
 #include <unistd.h>
 
 #include <chrono>
 #include <string>
 
+#include "tests/unit/platform/DatabaseProgram.h"
 #include "tests/unit/platform/tasks/Fixture.h"
 
 using ARDO::Task;
@@ -157,13 +157,13 @@ TEST_F(TaskClearing, ListOfTasksThatRunWritesNothing) {
 TEST_F(TaskClearing, ListDoesNotWaitForWriters) {
   const std::string old = NewTask("alice");
   FinishedAt(old, kWeekAgo);
-  sqlite3* writer = nullptr;
-  ASSERT_EQ(sqlite3_open(Store(geteuid(), "tasks.db").c_str(), &writer), SQLITE_OK);
-  ASSERT_EQ(sqlite3_exec(writer, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr), SQLITE_OK);
-  const auto start = std::chrono::steady_clock::now();
-  EXPECT_EQ(TaskMgr("alice").getAllTaskId(nullptr).size(), 1U);
-  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(3));
-  EXPECT_EQ(sqlite3_close(writer), SQLITE_OK);
+  {
+    const DatabaseProgram writer(Store(geteuid(), "tasks.db"), "BEGIN IMMEDIATE");
+    ASSERT_EQ(writer.Error(), "");
+    const auto start = std::chrono::steady_clock::now();
+    EXPECT_EQ(TaskMgr("alice").getAllTaskId(nullptr).size(), 1U);
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(3));
+  }
   EXPECT_EQ(TaskMgr("alice").getAllTaskId(nullptr).size(), 0U);
 }
 
