@@ -25,7 +25,8 @@ constexpr char kUsage[] =
     "usage: qeloapid [--calls N] [--queue N] [--time-limit SECONDS]\n"
     "  --calls N       calls at once (32)\n"
     "  --queue N       calls that wait for their turn (256)\n"
-    "  --time-limit S  longest time of a call (300)\n";
+    "  --time-limit S  longest time of a call (300)\n"
+    "  --help, -h      show this\n";
 
 bool readOptions(int argc, char** argv, QELO::ServerLimits& limits) {
   QELO::Options options;
@@ -44,6 +45,10 @@ bool readOptions(int argc, char** argv, QELO::ServerLimits& limits) {
 }  // namespace
 
 int main(int argc, char** argv) {
+  if (QELO::Options::AskForHelp(argc, argv)) {
+    fputs(kUsage, stdout);
+    return 0;
+  }
   QELO::ServerLimits limits;
   if (!readOptions(argc, argv, limits)) {
     return 2;

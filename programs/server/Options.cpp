@@ -1,5 +1,6 @@
 #include "programs/server/Options.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "webapi/base/Number.h"
@@ -39,6 +40,11 @@ bool Options::Read(int argc, char** argv, std::string& error) const {
     }
   }
   return true;
+}
+
+bool Options::AskForHelp(int argc, char** argv) {
+  return std::any_of(argv + 1, argv + argc,
+                     [](const std::string& word) { return word == "--help" || word == "-h"; });
 }
 
 }  // namespace QELO

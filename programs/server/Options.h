@@ -20,6 +20,8 @@ class Options {
               std::function<void(unsigned)> take);
   /// @param error  receives what is wrong, in words
   bool Read(int argc, char** argv, std::string& error) const;
+  /// @return whether "--help" or "-h" is among the words; no value of an option is one
+  static bool AskForHelp(int argc, char** argv);
 
  private:
   struct Option {

@@ -34,6 +34,7 @@ constexpr char kUsage[] =
     "  --client ACCOUNT   the web server's account: it may use the socket, beside root\n"
     "  --metrics PATH     local socket that the server's figures are read by\n"
     "  --reader ACCOUNT   may read them, beside root\n"
+    "  --help, -h         shows this\n"
     "limits:\n"
     "  --requests N       requests at once (32)\n"
     "  --queue N          requests that wait for their turn (256)\n"
@@ -140,6 +141,10 @@ bool listen(QELO::Server& server, const Settings& settings, const std::vector<in
 }  // namespace
 
 int main(int argc, char** argv) {
+  if (QELO::Options::AskForHelp(argc, argv)) {
+    fputs(kUsage, stdout);
+    return 0;
+  }
   Settings settings;
   if (!readOptions(argc, argv, settings)) {
     return 2;

@@ -199,3 +199,9 @@ def test_WrongOptions_AreRefused(root, tmp_path, options):
     done = subprocess.run([program, *options], capture_output=True, text=True, timeout=10, check=False)
     assert done.returncode == 2
     assert options[0] in done.stderr and "usage: qeloapid" in done.stderr
+
+
+def test_Help_IsAnAnswer(root, tmp_path):
+    program = Service(tmp_path, "qeloapid").program
+    done = subprocess.run([program, "--help"], capture_output=True, text=True, timeout=10, check=False)
+    assert (done.returncode, done.stderr) == (0, "") and done.stdout.startswith("usage: qeloapid")

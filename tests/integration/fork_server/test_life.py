@@ -154,6 +154,12 @@ def test_WrongOptions_AreRefused(root, options):
     assert done.returncode in (1, 2) and "usage: webapi-server" in done.stderr
 
 
+def test_Help_IsAnAnswer(root):
+    done = subprocess.run([BUILD / "programs" / "webapi-server", "--help"], capture_output=True,
+                          text=True, timeout=10, check=False)
+    assert (done.returncode, done.stderr) == (0, "") and done.stdout.startswith("usage: webapi-server")
+
+
 def test_SocketsOfTheServiceManager_AreServedAndLeft(start, tmp_path):
     path = tmp_path / "handed.sock"
     server = ForkServer(tmp_path)

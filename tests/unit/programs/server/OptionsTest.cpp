@@ -23,6 +23,11 @@ class ServerOptions : public testing::Test {
 
   unsigned number = 5;
   std::string text = "default";
+  static bool AskForHelp(std::vector<const char*> words) {
+    words.insert(words.begin(), "program");
+    return Options::AskForHelp(static_cast<int>(words.size()), const_cast<char**>(words.data()));
+  }
+
   std::string error;
 };
 
@@ -54,6 +59,13 @@ TEST_F(ServerOptions, UnknownAndIncompleteOnesAreNamed) {
   EXPECT_EQ(error, "--calls needs another value");
   EXPECT_FALSE(Read({"--name", "bad"}));
   EXPECT_EQ(error, "--name needs another value");
+}
+
+TEST_F(ServerOptions, HelpIsAskedForInTwoWaysAnywhere) {
+  EXPECT_TRUE(AskForHelp({"--help"}));
+  EXPECT_TRUE(AskForHelp({"--calls", "1", "-h"}));
+  EXPECT_FALSE(AskForHelp({}));
+  EXPECT_FALSE(AskForHelp({"--calls", "help", "--helper"}));
 }
 
 }  // namespace
