@@ -1,12 +1,9 @@
 // QELO.Access.Session: logging in and out, and who the caller is.
 
 #include <webapi/APIAuth.h>
-#include <webapi/APIRequest.h>
-#include <webapi/APIResponse.h>
-#include <webapi/APITable.h>
 #include <webapi/JsonHelper.h>
 #include <webapi/LoginSession.h>
-#include <webapi/WebAPIError.h>
+#include <webapi/Method.h>
 
 #include <string>
 
@@ -14,13 +11,14 @@ namespace {
 
 using QELO::APIRequest;
 using QELO::APIResponse;
+using QELO::Call;
 using QELO::LoginSession;
 namespace JsonHelper = QELO::JsonHelper;
 
 constexpr char kApi[] = "QELO.Access.Session";
 constexpr char kCookie[] = "id";
 
-enum Error : int {
+enum Code : int {
   kWrong = 400,
   kUnavailable = 401,
   kOtherSite = 403,
@@ -40,112 +38,100 @@ bool IsSecure(const APIRequest& request) {
 }
 
 /// The check before a login finds nobody logged in and says so in a header, which is no news.
-void ForgetFailedCheck(APIResponse* response) {
-  response->Serialize()["headers"].removeMember("x-request-error");
+void ForgetFailedCheck(APIResponse& response) {
+  response.Serialize()["headers"].removeMember("x-request-error");
 }
 
-void AddSessionCookie(const APIRequest& request, APIResponse* response, const std::string& id) {
-  if (!response->AddCookie(kCookie, id, "/", 0, "", IsSecure(request), true)) {
+void AddSessionCookie(const Call& call, const std::string& id) {
+  if (!call.Response().AddCookie(kCookie, id, "/", 0, "", IsSecure(call.Request()), true)) {
     return;
   }
-  Json::Value& cookies = response->Serialize()["setCookie"];
+  Json::Value& cookies = call.Response().Serialize()["setCookie"];
   Json::Value& cookie = cookies[cookies.size() - 1];
   cookie = JsonHelper::asString(cookie) + "; samesite=strict";
 }
 
-void AnswerTicket(const APIRequest& request, APIResponse* response,
-                  const LoginSession::Ticket& ticket) {
-  AddSessionCookie(request, response, ticket.id);
+Json::Value DataOf(const LoginSession::Ticket& ticket) {
   Json::Value data(Json::objectValue);
   data["sid"] = ticket.id;
   data["token"] = ticket.token;
   data["user"] = ticket.user;
-  response->SetSuccess(data);
+  return data;
 }
 
-void AnswerTooMany(APIResponse* response, int retryAfter) {
+QELO::Error TooMany(const Call& call, int retryAfter) {
   Json::Value errors(Json::objectValue);
   errors["retry_after"] = retryAfter;
-  response->SetHeader("Retry-After", std::to_string(retryAfter));
-  response->SetError(kTooMany, errors);
+  call.Response().SetHeader("Retry-After", std::to_string(retryAfter));
+  return {kTooMany, errors};
 }
 
-void Login(APIRequest* request, APIResponse* response) {
-  ForgetFailedCheck(response);
-  const std::string account = TextParam(*request, "account");
-  const std::string password = TextParam(*request, "password");
+Json::Value Login(const Call& call) {
+  ForgetFailedCheck(call.Response());
+  const std::string account = TextParam(call.Request(), "account");
+  const std::string password = TextParam(call.Request(), "password");
   if (account.empty() || password.empty()) {
-    response->SetError(QELO::WEBAPI_ERR_BAD_REQUEST);
-    return;
+    throw QELO::Error{QELO::WEBAPI_ERR_BAD_REQUEST};
   }
   LoginSession::Ticket ticket;
-  switch (LoginSession::Login(*request, account, password, ticket)) {
+  switch (LoginSession::Login(call.Request(), account, password, ticket)) {
     case LoginSession::LOGIN_OK:
-      AnswerTicket(*request, response, ticket);
-      return;
+      AddSessionCookie(call, ticket.id);
+      return DataOf(ticket);
     case LoginSession::LOGIN_WRONG:
-      response->SetError(kWrong);
-      return;
+      throw QELO::Error{kWrong};
     case LoginSession::LOGIN_TOO_MANY:
-      AnswerTooMany(response, ticket.retryAfter);
-      return;
+      throw TooMany(call, ticket.retryAfter);
     case LoginSession::LOGIN_NOT_POST:
-      response->SetError(kNotPost);
-      return;
+      throw QELO::Error{kNotPost};
     case LoginSession::LOGIN_OTHER_SITE:
-      response->SetError(kOtherSite);
-      return;
+      throw QELO::Error{kOtherSite};
     case LoginSession::LOGIN_FAILED:
-      response->SetError(kUnavailable);
-      return;
+      break;
   }
+  throw QELO::Error{kUnavailable};
 }
 
-void Logout(APIRequest* request, APIResponse* response) {
-  if (!LoginSession::Logout(request->GetSessionID())) {
-    response->SetError(QELO::WEBAPI_ERR_NOT_AUTHENTICATED);
-    return;
+void Logout(const Call& call) {
+  if (!LoginSession::Logout(call.Request().GetSessionID())) {
+    throw QELO::Error{QELO::WEBAPI_ERR_NOT_AUTHENTICATED};
   }
-  response->AddCookie(kCookie, "", "/", -1, "", IsSecure(*request), true);
-  response->SetSuccess();
+  call.Response().AddCookie(kCookie, "", "/", -1, "", IsSecure(call.Request()), true);
 }
 
-void Current(APIRequest* request, APIResponse* response) {
-  const std::string user = request->GetLoginUserName();
+Json::Value Current(const Call& call) {
+  const std::string user = call.User();
   Json::Value data(Json::objectValue);
   data["user"] = user;
-  data["class"] = QELO::APIAuth::GetUserClass(request->IsAdmin(), user);
-  data["isAdmin"] = request->IsAdmin();
-  data["language"] = request->GetUILanguage();
+  data["class"] = QELO::APIAuth::GetUserClass(call.IsAdmin(), user);
+  data["isAdmin"] = call.IsAdmin();
+  data["language"] = call.Request().GetUILanguage();
   data["secondsLeft"] =
-      static_cast<Json::Int64>(LoginSession::SecondsLeft(request->GetSessionID()));
-  data["address"] = request->GetRemoteIP();
-  response->SetSuccess(data);
+      static_cast<Json::Int64>(LoginSession::SecondsLeft(call.Request().GetSessionID()));
+  data["address"] = call.Request().GetRemoteIP();
+  return data;
 }
 
 /// The API runs for callers who are not logged in, for the sake of login. The other methods stop
 /// here, with the error that the permission check has set.
-int CheckLoggedIn(APIRequest* request, APIResponse*) {
-  return request->IsAuthorized() ? 1 : 0;
+bool IsLoggedIn(const Call& call) {
+  return call.Request().IsAuthorized();
 }
 
-QELO::_tag_API_TABLE table[] = {
-    {kApi, 1, "login", Login},
-    {kApi, 1, "logout", Logout},
-    {kApi, 1, "current", Current},
-    {nullptr, 0, nullptr, nullptr},
-};
-
 QELO::_tag_API_CHECK_TABLE checkTable[] = {
-    {kApi, 1, "logout", CheckLoggedIn, {nullptr, nullptr}},
-    {kApi, 1, "current", CheckLoggedIn, {nullptr, nullptr}},
+    {kApi, 1, "logout", QELO::Check<IsLoggedIn>, {nullptr, nullptr}},
+    {kApi, 1, "current", QELO::Check<IsLoggedIn>, {nullptr, nullptr}},
     {nullptr, 0, nullptr, nullptr, {nullptr, nullptr}},
 };
 
 }  // namespace
 
 extern "C" WEBAPI_API QELO::_tag_API_TABLE* GetAPITable() {
-  return table;
+  using QELO::Method;
+  static auto table = QELO::MethodTable(
+      kApi, 1,
+      {{"login", Method<Login>}, {"logout", Method<Logout>}, {"current", Method<Current>}});
+  return table.data();
 }
 extern "C" WEBAPI_API QELO::_tag_API_CHECK_TABLE* GetAPICheckTable() {
   return checkTable;

@@ -62,9 +62,12 @@ def build_with_pkg_config(prefix, directory):
 
 
 def test_Install_HoldsEveryHeader(prefix):
-    names = {path.name for path in (SOURCE / "include" / "webapi").glob("*.h")}
-    assert names
-    assert {path.name for path in (prefix / "include" / "webapi").glob("*.h")} == names
+    def headers(directory):
+        return {str(path.relative_to(directory)) for path in directory.rglob("*.h")}
+
+    names = headers(SOURCE / "include" / "webapi")
+    assert {"APIRequest.h", "method/Call.h", "testing/TestHost.h"} <= names
+    assert headers(prefix / "include" / "webapi") == names
 
 
 def test_Install_HoldsLibraryProgramsAndDescriptions(stage, prefix):
