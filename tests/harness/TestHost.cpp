@@ -1,5 +1,6 @@
 #include "webapi/testing/TestHost.h"
 
+#include <dlfcn.h>
 #include <fcntl.h>
 #include <signal.h>
 #include <sys/mman.h>
@@ -7,6 +8,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -20,6 +22,7 @@
 #include "tests/support/FakePlatform.h"
 #include "tests/support/FakeTask.h"
 #include "tests/support/SyslogCapture.h"
+#include "webapi/APIAuth.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebEntry.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -46,6 +49,22 @@ struct Account {
   uid_t uid;
   bool isAdmin;
 };
+
+/// Where the file with this code is in memory.
+void* fileWith(void* code) {
+  Dl_info info{};
+  return dladdr(code, &info) != 0 ? info.dli_fbase : nullptr;
+}
+
+/// A test program with the shared library too may have its functions from there, and its calls
+/// would go to the host itself.
+void expectOneFramework() {
+  if (fileWith(reinterpret_cast<void*>(&APIAuth::GetUserClass)) !=
+      fileWith(reinterpret_cast<void*>(&AnswerOf))) {
+    std::fputs("link webapi::testing in place of webapi::webapi, not beside it\n", stderr);
+    std::abort();
+  }
+}
 
 bool isIn(const std::string& line, const std::string& text) {
   return line.find(text) != std::string::npos;
@@ -137,6 +156,7 @@ TestAnswer TestHost::State::Serve() {
 }
 
 TestHost::TestHost() : state_(std::make_unique<State>()) {
+  expectOneFramework();
   FakePlatform::Reset();
   FakeTask::Reset();
   SyslogCapture::Clear();

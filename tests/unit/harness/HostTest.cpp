@@ -2,10 +2,12 @@
 
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/wait.h>
 #include <unistd.h>
 #include <webapi/testing/TestHost.h>
 
 #include <chrono>
+#include <cstdio>
 #include <filesystem>
 #include <sstream>
 
@@ -183,6 +185,16 @@ TEST(HostAlone, KnowsNoFileThatIsNone) {
   TestHost host;
   EXPECT_FALSE(host.Describe("/nonexistent.lib"));
   EXPECT_FALSE(host.Describe(__FILE__));
+}
+
+TEST(HostAlone, RefusesTheSharedLibraryBesideIt) {
+  std::FILE* program = popen("exec " LINKED_TWICE " 2>&1", "r");
+  ASSERT_NE(program, nullptr);
+  char text[256] = "";
+  EXPECT_NE(std::fgets(text, sizeof text, program), nullptr);
+  EXPECT_STREQ(text, "link webapi::testing in place of webapi::webapi, not beside it\n");
+  const int status = pclose(program);
+  EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGABRT) << status;
 }
 
 TEST(HostAlone, LeavesNothing) {

@@ -1,0 +1,6 @@
+#include <webapi/testing/TestHost.h>
+
+int main() {
+  const QELO::TestHost host;
+  return 0;
+}
