@@ -34,7 +34,11 @@ inline void Answer(APIResponse& response, const Download& file) {
 
 template <typename T>
 void Answer(APIResponse& response, const T& value) {
-  response.SetSuccess(ToJson(value));
+  if constexpr (std::same_as<T, Json::Value>) {
+    response.SetSuccess(value);
+  } else {
+    response.SetSuccess(ToJson(value));
+  }
 }
 
 template <typename T>
