@@ -1,8 +1,6 @@
 """What clients of the fork server may ask for at most, and that nobody waits for another."""
 
-import os
 import socket
-import threading
 import time
 
 import pytest
@@ -143,54 +141,6 @@ def test_AnswerThatHasBegun_EndsWithoutAnother(start):
     assert answer.startswith(b"Content-type: application/json") and b"Status:" not in answer
     assert len(answer) < 5_000_000
     server.log_line("time over: 1")
-
-
-def test_Soak_LosesNoAnswerAndLeavesNothing(start):
-    """Good requests among slow senders, hang-ups and headers that are too long. Longer and with more
-    clients by WEBAPI_SOAK_SECONDS and WEBAPI_SOAK_CLIENTS."""
-    clients = int(os.environ.get("WEBAPI_SOAK_CLIENTS", "40"))
-    server = start("--requests", 8, "--header-limit", 2)
-    assert server.call(QUERY + "echo&n=0")["success"]
-    descriptors = len(os.listdir(f"/proc/{server.process.pid}/fd"))
-    end = time.monotonic() + float(os.environ.get("WEBAPI_SOAK_SECONDS", "3"))
-    wrong, good = [], []
-
-    def ask(number):
-        while time.monotonic() < end:
-            answer = server.request(f"{QUERY}echo&n={number}")
-            if b'"n":%d' % number in answer:
-                good.append(1)
-            else:
-                wrong.append(answer)
-
-    def annoy(number):
-        while time.monotonic() < end:
-            try:
-                with server.connect() as connection:
-                    if number % 4 == 0:
-                        connection.sendall(b"600000:")
-                    elif number % 4 == 1:
-                        connection.sendall(header(variables(QUERY + "slow&ms=20")))
-                    elif number % 4 == 2:
-                        connection.sendall(header(variables(QUERY + "echo"))[:40])
-                        time.sleep(0.3)
-                    else:
-                        connection.sendall(b"\0" * 100)
-            except OSError:
-                pass
-            time.sleep(0.02)
-
-    threads = [threading.Thread(target=ask, args=(n,)) for n in range(clients * 2 // 5)]
-    threads += [threading.Thread(target=annoy, args=(n,)) for n in range(clients * 3 // 5)]
-    for thread in threads:
-        thread.start()
-    for thread in threads:
-        thread.join()
-    assert wrong == []
-    assert len(good) > 50
-    assert wait_for(lambda: server.children() == [], 10)
-    time.sleep(0.3)
-    assert len(os.listdir(f"/proc/{server.process.pid}/fd")) <= descriptors + 1
 
 
 def test_Port_IsServedOnTheLoopbackAddressAlone(start, tmp_path):
