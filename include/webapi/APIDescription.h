@@ -49,6 +49,9 @@ class WEBAPI_API APIDescription {
   const Json::Value* Attributes(int version, const std::string& method) const;
   /// Whether an attribute is set. Attributes that are no object set none.
   static bool IsSet(const Json::Value& attributes, std::string_view attribute);
+  /// Whether calls of the method may share a process that stays: its "isolation" is "worker".
+  /// Anything else, of whatever type, is the strictest: a process for each call.
+  static bool SharesProcess(const Json::Value& attributes);
 
   /// An AuthLevel, or another integer, which asks for a login too. So does a level that is missing
   /// or no integer, be it the text "0" or false: it is AUTH_LOGIN.

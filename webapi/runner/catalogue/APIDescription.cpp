@@ -102,6 +102,10 @@ bool APIDescription::IsSet(const Json::Value& attributes, std::string_view attri
   return JsonHelper::asBool(JsonHelper::member(attributes, attribute));
 }
 
+bool APIDescription::SharesProcess(const Json::Value& attributes) {
+  return JsonHelper::isText(JsonHelper::member(attributes, "isolation"), "worker");
+}
+
 int APIDescription::GetAuthLevel() const {
   const Json::Value& level = JsonHelper::member(description_, "authLevel");
   const bool isInteger = level.type() == Json::intValue || level.type() == Json::uintValue;

@@ -124,5 +124,14 @@ TEST_F(Description, AnyValueCanBeAsked) {
   }
 }
 
+TEST_F(Description, CallsShareAProcess_WhereTheWordSaysSoAlone) {
+  EXPECT_TRUE(APIDescription::SharesProcess(Parse(R"({"isolation": "worker"})")));
+  for (const char* odd : {"{}", "null", "[]", R"("worker")", R"({"isolation": "process"})",
+                          R"({"isolation": "Worker"})", R"({"isolation": "worker "})",
+                          R"({"isolation": true})", R"({"isolation": ["worker"]})"}) {
+    EXPECT_FALSE(APIDescription::SharesProcess(Parse(odd))) << odd;
+  }
+}
+
 }  // namespace
 }  // namespace QELO
