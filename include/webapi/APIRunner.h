@@ -14,6 +14,7 @@ namespace QELO {
 class APIRequest;
 class APIResponse;
 class APIRunnerPrivate;
+class CallRoad;
 class ExecParam;
 
 /// The engine that turns one prepared request into one API call.
@@ -177,6 +178,16 @@ class WEBAPI_API APIRunner {
   /// priority and credentials as the description wants them. All are given back but the credentials
   /// of a method without "grantable" and "grantByDefault", which cannot be.
   bool ProcessLib(APIRequest* request, APIResponse* response);
+  /// Has the calls of Process() go by another road than this process: what the road does not take
+  /// is left alone, and a call that it takes is permitted here and made there.
+  /// @param road  lives as long as the runner; null: as ever
+  void SetRoad(CallRoad* road);
+  CallRoad* Road() const;
+  /// Makes a call that another process has checked and permitted, in this one, which has the
+  /// account and the priority of the method already and keeps them. Directory, streams and name are
+  /// given back.
+  /// @return as ProcessLib()
+  bool ProcessPermitted(APIRequest* request, APIResponse* response);
   /// Asks the permission hooks in their order: CheckSharingPermission() for a request by a sharing
   /// link, for all others CheckPermission() when NeedPermission() says so; and what they refuse
   /// passes all the same when SkipPermission() says so. @return whether the call may go on
@@ -198,6 +209,10 @@ class WEBAPI_API APIRunner {
  private:
   friend class ExecHandler;  ///< closes the libraries of its call with the streams shut
   struct Rooms;
+
+  bool TakesRoad(APIRequest* request);
+  bool RunByRoad(APIRequest* request, APIResponse* response, const Json::Value& attributes);
+  void CountCall(APIRequest* request, const Json::Value& attributes);
 
   Json::Value libDef;
   Json::Value catalogue;

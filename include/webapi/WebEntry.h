@@ -41,6 +41,11 @@ class WEBAPI_API WebEntry : public APIRunner {
   /// exception on the way to the answer is logged and answered with 117.
   /// @return whether callbacks were started. What became of the request is in the answer.
   bool Run(const Json::Value& param) override;
+  /// Serves the request as Run() does, in a process that lives on: what of the caller's environment
+  /// is of no use is dropped, the call is made by the road, and callbacks are whose call it was. A
+  /// request that the road leaves is not answered. The environment stays as the request has left
+  /// it.
+  void RunBy(CallRoad& road);
   /// Takes the request in: CGI environment, query and body, and credentials among the parameters,
   /// which replace those of cookies and headers. The argument is not consulted.
   /// @return false with error 101 when the query or the body cannot be read, or 117 (for an access
@@ -138,6 +143,7 @@ class WEBAPI_API WebEntry : public APIRunner {
   LinkCheck& Links();
   bool GatherEnvironment();
   void Serve();
+  void ServeAndAnswer();
   bool RewriteCredentials();
   void RemoveUpload();
 

@@ -26,6 +26,7 @@
 #include "webapi/platform/Sharing.h"
 #include "webapi/platform/StringHash.h"
 #include "webapi/runner/CompoundCall.h"
+#include "webapi/runner/road/CallRoad.h"
 
 namespace QELO {
 namespace {
@@ -113,10 +114,19 @@ bool guarded(Call call) {
 }
 
 /// Prints the response, unless the method has printed its own, and drops what is left of the body.
-void answer(const APIResponse& response, UnreadBody& body) {
+void answer(const APIResponse& response, CallRoad* road, UnreadBody& body) {
+  if (road != nullptr && road->IsLeft()) {
+    return;
+  }
   // One text: what can fail does so before the first byte is out.
   const std::string text =
       response.IsEnableOutput() ? HeaderText(response) + BodyText(response) : "";
+  if (road != nullptr) {
+    road->Answer(text.size());
+    if (road->IsLeft()) {
+      return;
+    }
+  }
   const BrokenPipe tolerated;
   if (WriteAnswer(text, body)) {  // else there is nobody to keep an answer from
     body.Drop();
@@ -150,7 +160,11 @@ void WebEntry::Serve() {
     return;
   }
   if (Request()->HasParam("relay_zt")) {
-    ProcessRelay(Request(), Response());
+    if (Road() != nullptr) {
+      Road()->Leave();
+    } else {
+      ProcessRelay(Request(), Response());
+    }
   } else {
     Process(Request(), Response());
   }
@@ -161,7 +175,7 @@ void WebEntry::GuardProcess() {
   CleanEnvironment();
 }
 
-bool WebEntry::Run(const Json::Value&) {
+void WebEntry::ServeAndAnswer() {
   MemoryBound::Set(kMostMemory);
   UnreadBody body = UnreadBody::OfRequest();
   if (!guarded([this] { Serve(); })) {
@@ -171,16 +185,20 @@ bool WebEntry::Run(const Json::Value&) {
     guarded([this] { SetErrorStatus(*Request(), *Response()); });
   }
   guarded([this] { RemoveUpload(); });  // a client that has its answer may have the process ended
-  if (!guarded([&] { answer(*Response(), body); })) {
+  if (!guarded([&] { answer(*Response(), Road(), body); })) {
     // Of one of its own: what there was no memory for may stand in any part of the response.
     guarded([&] {
       Response()->SetError(WEBAPI_ERR_NO_ANSWER);
       APIResponse refusal(nullptr);
       refusal.SetError(WEBAPI_ERR_NO_ANSWER);
-      answer(refusal, body);
+      answer(refusal, Road(), body);
     });
   }
   MemoryBound::Lift();  // callbacks are methods' own
+}
+
+bool WebEntry::Run(const Json::Value&) {
+  ServeAndAnswer();
   bool isHandled = false;
   guarded([&] {
     if (Response()->GetHttpdRestart()) {

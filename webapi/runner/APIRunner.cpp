@@ -17,23 +17,18 @@
 #include "webapi/base/Log.h"
 #include "webapi/base/MemoryBound.h"
 #include "webapi/runner/APIRunnerPrivate.h"
+#include "webapi/runner/APIRunnerRooms.h"
 #include "webapi/runner/CallName.h"
 #include "webapi/runner/Callbacks.h"
 #include "webapi/runner/CompoundCall.h"
-#include "webapi/runner/catalogue/Catalogue.h"
 #include "webapi/runner/counter/UsageCounter.h"
 #include "webapi/runner/daemon/DaemonCall.h"
 #include "webapi/runner/execution/Execution.h"
 #include "webapi/runner/execution/ParamCheck.h"
-#include "webapi/runner/library/LibraryCache.h"
 #include "webapi/runner/library/PreloadedLibraries.h"
+#include "webapi/runner/road/CallRoad.h"
 
 namespace QELO {
-
-struct APIRunner::Rooms {
-  Catalogue catalogue;
-  LibraryCache libraries;
-};
 
 APIRunner::APIRunner()
     : libDef(Json::objectValue),
@@ -41,7 +36,7 @@ APIRunner::APIRunner()
       request_(std::make_unique<APIRequest>(Json::Value())),
       response_(std::make_unique<APIResponse>(request_.get())),
       private_(std::make_unique<APIRunnerPrivate>(this)),
-      rooms_(new Rooms{Catalogue(libDef, catalogue), LibraryCache(libraries_)}) {
+      rooms_(new Rooms{Catalogue(libDef, catalogue), LibraryCache(libraries_), nullptr}) {
   setsid();
   Catalogue::ReadLibDef(libDef);
 }
@@ -151,6 +146,9 @@ bool APIRunner::Process(APIRequest* request, APIResponse* response) {
     response->SetError(WEBAPI_ERR_RELAY_FAILED);
     return false;
   }
+  if (rooms_->road != nullptr && !TakesRoad(request)) {
+    return false;
+  }
   bool result = false;
   if (request->GetAPIClass() == kCompoundAPI) {
     result = ProcessEntry(request, response);
@@ -204,14 +202,21 @@ bool APIRunner::ProcessLib(APIRequest* request, APIResponse* response) {
   // Copied: a method may have descriptions loaded that take the place of its own.
   const CallName call(*request);
   const Json::Value attributes = GetMethod(call.api, call.version, call.method);
+  if (rooms_->road != nullptr) {
+    return RunByRoad(request, response, attributes);
+  }
+  CountCall(request, attributes);
+  return TakeUpload(request, response, attributes) &&
+         ParamCheck::Passes(*request, *response, attributes) &&
+         Execution(*this, request, response).Run(attributes);
+}
+
+void APIRunner::CountCall(APIRequest* request, const Json::Value& attributes) {
   if (JsonHelper::asBool(request_->GetAttr("_collector_count_webapi")) &&
       !APIDescription::IsSet(attributes, "allowTimeout") &&
       JsonHelper::asBool(request->GetAPIInfo("count", true))) {
     IncreaseCounter(request);
   }
-  return TakeUpload(request, response, attributes) &&
-         ParamCheck::Passes(*request, *response, attributes) &&
-         Execution(*this, request, response).Run(attributes);
 }
 
 bool APIRunner::TakeUpload(APIRequest* request, APIResponse* response,
@@ -251,7 +256,11 @@ bool APIRunner::SkipPermission(APIRequest*) {
 }
 
 void APIRunner::IncreaseCounter(APIRequest* request) {
-  UsageCounter::Count(*request);
+  if (rooms_->road != nullptr) {
+    UsageCounter::CountInResident(*request);
+  } else {
+    UsageCounter::Count(*request);
+  }
 }
 
 bool APIRunner::HandleCallback(APIResponse* response) {

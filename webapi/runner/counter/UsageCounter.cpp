@@ -36,6 +36,15 @@ void countIn(Json::Value& counters, const std::string& name) {
   counter["ctime"] = Json::Int64(time(nullptr));
 }
 
+bool isWanted() {
+  return QLIBCFileCheckKeyValue(Paths::kSystemInfo, "enable_data_collect", "yes", 0) != 0;
+}
+
+void count(const APIRequest& request) {
+  static UsageCounter counter(Paths::kCounterDir);
+  counter.Increase(request.GetAPIClass(), request.GetAPIMethod(), request.GetAPIVersion());
+}
+
 }  // namespace
 
 bool UsageCounter::PrepareDirectory() {
@@ -71,11 +80,15 @@ bool UsageCounter::Increase(const std::string& api, const std::string& method, i
 
 void UsageCounter::Count(const APIRequest& request) {
   // Both last as long as the process: the switch is read once, the directory made once.
-  static const bool enabled =
-      QLIBCFileCheckKeyValue(Paths::kSystemInfo, "enable_data_collect", "yes", 0) != 0;
-  static UsageCounter counter(Paths::kCounterDir);
+  static const bool enabled = isWanted();
   if (enabled) {
-    counter.Increase(request.GetAPIClass(), request.GetAPIMethod(), request.GetAPIVersion());
+    count(request);
+  }
+}
+
+void UsageCounter::CountInResident(const APIRequest& request) {
+  if (isWanted()) {
+    count(request);
   }
 }
 

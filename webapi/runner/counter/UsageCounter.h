@@ -21,6 +21,8 @@ class UsageCounter {
 
   /// Counts the request's call, if the system collects such data.
   static void Count(const APIRequest& request);
+  /// The same in a process that lives on, whose settings may change meanwhile.
+  static void CountInResident(const APIRequest& request);
 
  private:
   bool PrepareDirectory();

@@ -78,6 +78,15 @@ bool takeCredentials(APIRequest& request, const Json::Value& attributes, bool* g
   return true;
 }
 
+bool callFunction(const _tag_API_TABLE& entry, APIRequest* request, APIResponse* response) {
+  response->SetError(WEBAPI_ERR_NO_ANSWER);
+  const bool returned = Fence("method", [&] { entry.function(request, response); });
+  if (!returned) {
+    response->SetError(WEBAPI_ERR_NO_ANSWER);
+  }
+  return returned;
+}
+
 /// Calls the method with the credentials that its description asks for.
 bool callMethod(const _tag_API_TABLE& entry, const Json::Value& attributes, APIRequest* request,
                 APIResponse* response) {
@@ -93,10 +102,7 @@ bool callMethod(const _tag_API_TABLE& entry, const Json::Value& attributes, APIR
     }
     return false;
   }
-  const bool returned = Fence("method", [&] { entry.function(request, response); });
-  if (!returned) {
-    response->SetError(WEBAPI_ERR_NO_ANSWER);
-  }
+  const bool returned = callFunction(entry, request, response);
   if (giveBack) {
     saved.GiveBack();
   }
@@ -145,7 +151,8 @@ bool Execution::Run(const Json::Value& attributes) {
     response_->SetError(WEBAPI_ERR_METHOD_MISSING);
     return false;
   }
-  return callMethod(entry, attributes, request_, response_);
+  return account_ == Account::kTaken ? callFunction(entry, request_, response_)
+                                     : callMethod(entry, attributes, request_, response_);
 }
 
 }  // namespace QELO

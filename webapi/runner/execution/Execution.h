@@ -12,9 +12,13 @@ class APIRunner;
 /// standard streams, priority, credentials and working directory are as before when it has ended.
 class Execution {
  public:
+  /// Whether the method's account is taken for the call, or the process has it for good.
+  enum class Account { kWanted, kTaken };
+
   /// @param runner  opens the library
-  Execution(APIRunner& runner, APIRequest* request, APIResponse* response)
-      : runner_(runner), request_(request), response_(response) {}
+  Execution(APIRunner& runner, APIRequest* request, APIResponse* response,
+            Account account = Account::kWanted)
+      : runner_(runner), request_(request), response_(response), account_(account) {}
 
   /// @param attributes  the method's
   /// @return whether the method was called and returned; else the response has the error that the
@@ -25,6 +29,7 @@ class Execution {
   APIRunner& runner_;
   APIRequest* request_;
   APIResponse* response_;
+  const Account account_;
 };
 
 }  // namespace QELO
