@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstddef>
+#include <cstring>
 #include <string>
 
 #include "webapi/base/UniqueFd.h"
@@ -10,8 +11,19 @@ namespace QELO {
 
 using ServerClock = std::chrono::steady_clock;
 
-/// One accepted connection on its way to the process that serves it.
+/// One accepted connection on its way to the process that serves it. What the client has sent is
+/// wiped when it is needed no more: processes that are forked later are other clients'.
 struct Connection {
+  Connection() = default;
+  Connection(const Connection&) = delete;
+  Connection& operator=(const Connection&) = delete;
+  ~Connection() { Forget(); }
+
+  void Forget() {
+    explicit_bzero(header.data(), header.size());
+    header = std::string();
+  }
+
   UniqueFd socket;
   std::string listener;  ///< the path of the socket that it came by; "" for another kind
   std::string header;    ///< what has come of the request's front

@@ -70,7 +70,8 @@ void Jobs::Add(Job job) {
   jobs_.emplace(pid, std::move(job));
 }
 
-std::optional<Jobs::Job> Jobs::TakeEnded(int& status) {
+std::optional<Jobs::Job> Jobs::TakeEnded(int& status,
+                                         const std::function<void(pid_t, int)>& other) {
   rusage usage{};
   for (pid_t pid; (pid = wait4(-1, &status, WNOHANG, &usage)) > 0;) {
     const auto found = jobs_.find(pid);
@@ -80,6 +81,7 @@ std::optional<Jobs::Job> Jobs::TakeEnded(int& status) {
       job.processor = lengthOf(usage.ru_utime) + lengthOf(usage.ru_stime);
       return job;
     }
+    other(pid, status);
   }
   return std::nullopt;
 }

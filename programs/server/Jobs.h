@@ -2,6 +2,7 @@
 
 #include <sys/types.h>
 
+#include <functional>
 #include <memory>
 #include <optional>
 #include <unordered_map>
@@ -43,7 +44,8 @@ class Jobs {
   size_t Count() const { return jobs_.size(); }
   /// Takes out a job whose process has ended.
   /// @param status  receives how
-  std::optional<Job> TakeEnded(int& status);
+  /// @param other   is told of processes that serve no job
+  std::optional<Job> TakeEnded(int& status, const std::function<void(pid_t, int)>& other);
   /// Kills those whose time is over, with all that they have started.
   void KillOverdue(ServerClock::time_point now);
   void KillAll();

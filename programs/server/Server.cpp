@@ -9,7 +9,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdio>
 #include <utility>
 
 #include "programs/server/OpenFiles.h"
@@ -76,13 +75,16 @@ std::vector<std::string> Server::Paths() const {
 }
 
 bool Server::IsIdle() const {
-  return arriving_.empty() && departures_.IsEmpty() && waiting_.empty() && jobs_.Count() == 0;
+  return arriving_.empty() && departures_.IsEmpty() && waiting_.empty() && jobs_.Count() == 0 &&
+         (residents_ == nullptr || residents_->IsIdle());
 }
 
 void Server::Run() {
   while (!isStopping_ || !IsIdle()) {
     const bool isQuiet = IsIdle() && refused_ == 0;
-    for (const int descriptor : events_.Wait(isQuiet ? Events::kWithoutEnd : kSweepPause)) {
+    const std::chrono::milliseconds pause =
+        residents_ != nullptr ? std::min(kSweepPause, residents_->Patience()) : kSweepPause;
+    for (const int descriptor : events_.Wait(isQuiet ? Events::kWithoutEnd : pause)) {
       Hear(descriptor);
     }
     Sweep();
@@ -107,6 +109,9 @@ void Server::Hear(int descriptor) {
       return;
     }
   }
+  if (residents_ != nullptr) {
+    residents_->Hear(descriptor);
+  }
 }
 
 void Server::HandleSignals() {
@@ -115,12 +120,20 @@ void Server::HandleSignals() {
       service_.Reload(*this);
     } else if ((number == SIGTERM || number == SIGINT) && isStopping_) {
       jobs_.KillAll();
+      if (residents_ != nullptr) {
+        residents_->KillAll();
+      }
     } else if (number == SIGTERM || number == SIGINT) {
       Stop();
     }
   }
   int status = 0;
-  while (auto job = jobs_.TakeEnded(status)) {
+  const auto tell = [this](pid_t pid, int how) {
+    if (residents_ != nullptr) {
+      residents_->Ended(pid, how);
+    }
+  };
+  while (auto job = jobs_.TakeEnded(status, tell)) {
     EndJob(std::move(*job), status);
   }
   StartWaiting();
@@ -138,6 +151,9 @@ void Server::Stop() {
     }
   }
   listeners_.clear();
+  if (residents_ != nullptr) {
+    residents_->Stop();
+  }
 }
 
 /// @return whether there may be more
@@ -173,7 +189,9 @@ void Server::Arrive(Held connection) {
       connection->arrived = ServerClock::now();
       metrics_.arriving.Add(
           duration_cast<microseconds>(connection->arrived - connection->accepted));
-      Enqueue(std::move(connection));
+      if (residents_ == nullptr || !residents_->TakeOver(connection)) {
+        Enqueue(std::move(connection));
+      }
       return;
     case Service::Arrival::kAnswered:
       departures_.Tell(std::move(connection));
@@ -254,60 +272,13 @@ void Server::StartWaiting() {
   }
 }
 
-void Server::Start(Held connection) {
-  Jobs::Job job;
-  job.note = Jobs::MakeNote(service_.UsesNotes());
-  std::fflush(nullptr);
-  const ServerClock::time_point begin = ServerClock::now();
-  job.pid = job.note == nullptr ? -1 : fork();
-  if (job.pid < 0) {
-    WEBAPI_LOG(kSource, "cannot start a process [%m]");
-    Refuse(std::move(connection), Service::Refusal::kBusy);
-    return;
-  }
-  if (job.pid == 0) {
-    RunChild(std::move(connection), *job.note);
-  }
-  job.started = ServerClock::now();
-  metrics_.waiting.Add(duration_cast<microseconds>(begin - connection->arrived));
-  metrics_.forking.Add(duration_cast<microseconds>(job.started - begin));
-  job.deadline = job.started + limits_.request;
-  job.connection = std::move(connection);
-  job.connection->header = std::string();
-  jobs_.Add(std::move(job));
-}
-
-void Server::RunChild(Held connection, Note& note) {
-  setsid();
-  SignalQueue::Reset();
-  KeepAlone(connection->socket);
-  const int status = service_.Serve(*connection, note);
-  std::fflush(nullptr);
-  _exit(status);
-}
-
-void Server::EndJob(Jobs::Job job, int status) {
-  const int descriptor = job.connection->socket.Get();
-  const auto lasted = duration_cast<microseconds>(ServerClock::now() - job.started);
-  ++(job.isKilled ? metrics_.killed : WIFSIGNALED(status) ? metrics_.crashed : metrics_.served);
-  metrics_.serving.Add(lasted);
-  metrics_.processor += job.processor;
-  service_.Ended(*job.note,
-                 {job.pid, status, job.isKilled,
-                  duration_cast<microseconds>(job.started - job.connection->accepted), lasted});
-  if (job.isSilent) {
-    Refuse(std::move(job.connection), Service::Refusal::kTimedOut);
-    return;
-  }
-  shutdown(descriptor, SHUT_RDWR);  // whoever else may hold it: the answer ends here
-}
-
 void Server::Refuse(Held connection, Service::Refusal reason) {
   if (connection->isQuiet) {
     return;
   }
   ++refused_;
   metrics_.CountRefusal(reason);
+  connection->Forget();
   connection->answer = service_.Refuse(reason);
   departures_.Tell(std::move(connection));
 }
@@ -320,6 +291,9 @@ void Server::Sweep() {
   }
   nextSweep_ = now + kSweepPause;
   jobs_.KillOverdue(now);
+  if (residents_ != nullptr) {
+    residents_->Sweep(now);
+  }
   std::vector<int> slow;
   for (const auto& [descriptor, connection] : arriving_) {
     if (connection->deadline <= now) {

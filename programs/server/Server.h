@@ -3,9 +3,11 @@
 #include <sys/types.h>
 
 #include <deque>
+#include <functional>
 #include <memory>
 #include <string>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "programs/server/Connection.h"
@@ -17,6 +19,7 @@
 #include "programs/server/Service.h"
 #include "programs/server/SignalQueue.h"
 #include "programs/server/metrics/Metrics.h"
+#include "programs/server/processes/Residents.h"
 
 namespace QELO {
 
@@ -41,8 +44,25 @@ class Server {
   void StopListening(const std::string& path);
   std::vector<std::string> Paths() const;
 
+  /// Has processes that stay take what they can. @param residents  outlive the serving; null: none
+  void Use(Residents* residents) { residents_ = residents; }
+
   /// Serves until it is told to stop.
   void Run();
+
+  /// For residents: what they wait for, beside the server's own. Unwatched before it is closed.
+  bool Watch(int descriptor) { return events_.Watch(descriptor); }
+  void Unwatch(int descriptor) { events_.Unwatch(descriptor); }
+  /// For residents: a request that they took over has been served.
+  void CountServed(const Connection& connection);
+  /// For residents: a process that has one descriptor beside the standard ones, nothing of the
+  /// requests that are here, and ends with what `run` returns.
+  /// @param kept  closed in the server, whatever comes of it
+  /// @param run   is given the descriptor
+  /// @return below 0, with errno: none
+  pid_t Spawn(UniqueFd kept, const std::function<int(UniqueFd)>& run);
+  /// For residents: has a connection served by a process of its own after all.
+  void ServeApart(std::unique_ptr<Connection> connection) { Enqueue(std::move(connection)); }
 
  private:
   using Held = std::unique_ptr<Connection>;
@@ -56,6 +76,7 @@ class Server {
   bool DropGone();
   void StartWaiting();
   [[noreturn]] void RunChild(Held connection, Note& note);
+  void ForgetRequests();
   void Refuse(Held connection, Service::Refusal reason);
   void Hear(int descriptor);
   void EndJob(Jobs::Job job, int status);
@@ -65,6 +86,7 @@ class Server {
   bool IsIdle() const;
 
   Service& service_;
+  Residents* residents_ = nullptr;
   const ServerLimits limits_;
   Metrics& metrics_;
   SignalQueue signals_;

@@ -13,8 +13,10 @@
 #include "programs/entry.cgi/ServeRequest.h"
 #include "programs/server/ServiceManager.h"
 #include "programs/server/metrics/Page.h"
+#include "programs/webapi-server/EntryName.h"
 #include "programs/webapi-server/RequestInput.h"
 #include "programs/webapi-server/ScgiHeader.h"
+#include "programs/webapi-server/workers/WorkerHub.h"
 #include "webapi/APIRunner.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/base/Log.h"
@@ -24,8 +26,6 @@ namespace {
 
 constexpr char kSource[] = "WebService.cpp";
 constexpr std::chrono::seconds kLookPause{1};
-/// Requests go by the same name in logs, whoever starts their process.
-char programName[] = "entry.cgi";
 
 std::set<std::string> describedLibraries() {
   APIRunner runner;
@@ -57,6 +57,9 @@ void WebService::LoadLibraries() {
 void WebService::Reload(Server&) {
   ServiceManager::TellReloading();
   LoadLibraries();
+  if (workers_ != nullptr) {
+    workers_->Reload();
+  }
   ServiceManager::Tell("READY=1");
 }
 
@@ -106,7 +109,7 @@ int WebService::Serve(Connection& connection, Note&) {
     return 1;
   }
   environ = environment.data();
-  program_invocation_name = program_invocation_short_name = programName;
+  TakeEntryName();
   return ServeRequest(argc_, argv_);
 }
 

@@ -9,6 +9,8 @@
 
 namespace QELO {
 
+class WorkerHub;
+
 /// Serves the requests that a web server passes on by SCGI, each as a CGI program that was just
 /// started would: with the request's variables as its whole environment, the body on standard input
 /// and the answer on standard output.
@@ -28,6 +30,9 @@ class WebService : public Service {
   /// Loads the API libraries that the descriptions of the working directory name.
   static void LoadLibraries();
 
+  /// Has them read their descriptions anew when the server reloads. @param workers  may be null
+  void Use(WorkerHub* workers) { workers_ = workers; }
+
   bool Admits(const Connection& connection) override;
   Arrival Take(Connection& connection) override;
   bool UsesNotes() const override { return false; }
@@ -43,6 +48,7 @@ class WebService : public Service {
   const Metrics& metrics_;
   const int argc_;
   char** const argv_;
+  WorkerHub* workers_ = nullptr;
   ServerClock::time_point nextLook_;  ///< at the libraries' files
 };
 

@@ -20,6 +20,7 @@
 #include "programs/server/Surroundings.h"
 #include "programs/server/metrics/Metrics.h"
 #include "programs/webapi-server/WebService.h"
+#include "programs/webapi-server/workers/WorkerHub.h"
 #include "webapi/platform/Core.h"
 #include "webapi/platform/Paths.h"
 
@@ -41,10 +42,17 @@ constexpr char kUsage[] =
     "  --arriving N       requests that are on their way (256)\n"
     "  --header-limit S   seconds until a request's header is here (10)\n"
     "  --queue-limit S    seconds that a request waits for its turn (30)\n"
-    "  --time-limit S     seconds that a request may take (3600)\n";
+    "  --time-limit S     seconds that a request may take (3600)\n"
+    "workers, for methods whose description lets calls share a process:\n"
+    "  --fronts N         processes that take requests in for workers (0: no workers)\n"
+    "  --workers N        workers (64), a quarter of them for one account\n"
+    "  --worker-calls N   calls that a worker serves (1000)\n"
+    "  --worker-idle S    seconds that a worker waits for a call (60)\n"
+    "  --worker-memory M  MiB that a worker may have (64)\n";
 
 struct Settings {
   QELO::ServerLimits limits;
+  QELO::WorkerLimits workers;
   std::string socket;
   unsigned port = 0;
   QELO::WebService::Peers peers;
@@ -88,11 +96,19 @@ bool readOptions(int argc, char** argv, Settings& settings) {
   options.Number("header-limit", 1, 3600, seconds(limits.arrival));
   options.Number("queue-limit", 1, 3600, seconds(limits.turn));
   options.Number("time-limit", 1, 86400, seconds(limits.request));
+  QELO::WorkerLimits& workers = settings.workers;
+  options.Number("fronts", 0, 64, count(workers.fronts));
+  options.Number("workers", 1, 1024, count(workers.workers));
+  options.Number("worker-calls", 1, 1000000, count(workers.calls));
+  options.Number("worker-idle", 1, 86400, seconds(workers.idle));
+  options.Number("worker-memory", 1, 4096,
+                 [&](unsigned number) { workers.memory = size_t{number} << 20; });
   std::string error;
   if (!options.Read(argc, argv, error)) {
     fprintf(stderr, "%s\n%s", error.c_str(), kUsage);
     return false;
   }
+  workers.call = limits.request;
   return true;
 }
 
@@ -163,6 +179,15 @@ int main(int argc, char** argv) {
   QELO::Server server(service, settings.limits, metrics);
   if (!server.Open() || !listen(server, settings, handed)) {
     return 1;
+  }
+  QELO::WorkerHub workers(server, settings.workers, argc, argv);
+  if (settings.workers.fronts > 0) {
+    if (!workers.Open()) {
+      perror("workers");
+      return 1;
+    }
+    service.Use(&workers);
+    server.Use(&workers);
   }
   QELO::ServiceManager::Tell("READY=1");
   server.Run();

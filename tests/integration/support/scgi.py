@@ -86,3 +86,42 @@ def start(root, tmp_path):
     yield run
     for server in started:
         server.stop()
+
+
+# An API whose calls share a process.
+STAYING = "QELO.Test.Staying"
+EVERYBODY = [f"{kind}.{store}" for kind in ("admin", "normal") for store in ("local", "domain", "ldap")]
+SHARED = ("state", "who", "leave", "escape", "crash", "finish", "fail", "silent", "echo", "large", "bytes",
+          "slow", "later", "refused")
+
+
+def methods():
+    listed = [{name: {"isolation": "worker"}} for name in SHARED]
+    listed += [{name: {"isolation": "worker", "grantByUser": True}} for name in ("asUser", "userSlow")]
+    listed += [{"asAlice": {"isolation": "worker", "runAs": "alice"}},
+               {"asRoot": {"isolation": "worker", "runAs": "root"}}, {"apart": {"isolation": "process"}}]
+    return {"1": listed}
+
+
+@pytest.fixture
+def staying(describe):
+    """The API, for logged-in callers of all classes; answers the query of a call."""
+    describe(STAYING, "staying.so", authLevel=1, allowUser=EVERYBODY, methods=methods())
+    return f"api={STAYING}&version=1&method="
+
+
+@pytest.fixture
+def start_workers(root, tmp_path):
+    """Starts the fork server with workers; it ends with the test."""
+    started = []
+    directory = tmp_path / "workers"
+    directory.mkdir()
+
+    def run(*options):
+        server = ForkServer(directory, "--fronts", 2, *options)
+        started.append(server)
+        return server.start()
+
+    yield run
+    for server in started:
+        server.stop()
