@@ -1,6 +1,7 @@
 """What the README shows works as it stands there."""
 
 import json
+import os
 import re
 import shutil
 import subprocess
@@ -12,6 +13,7 @@ from documents import broken_links
 README = (SOURCE / "README.md").read_text()
 DOWNLOADS = (SOURCE / "docs" / "downloads.md").read_text()
 PARAMETERS = (SOURCE / "docs" / "parameters.md").read_text()
+SHARING = (SOURCE / "docs" / "sharing.md").read_text()
 PORT = "127.0.0.1:8080"
 
 
@@ -63,6 +65,33 @@ def test_Files_GoInAndOut(server, root, alice, tmp_path):
         assert (tmp_path / "copy.md").read_bytes() == b"some text"
     finally:
         (root / "home" / "alice" / "README.md").unlink(missing_ok=True)
+
+
+def test_BackgroundTask_IsWaitedForAndStopped(server, root, alice, tmp_path):
+    preamble = f"URL=http://{PORT}/webapi/entry.cgi\nSID={alice['sid']}\n"
+    seen, stopped = run(preamble + block("task"), tmp_path, server.port).splitlines()
+    assert json.loads(seen)["data"]["info"]["api"] == "QELO.Work.Checksum"
+    assert json.loads(stopped)["success"]
+
+
+def test_SharedFolder_IsListedAndCopiedByAVisitor(server, root, alice, tmp_path):
+    folder = root / "home" / "alice" / "photos"
+    owner = (root / "home" / "alice").stat()
+    folder.mkdir()
+    (folder / "a.jpg").write_bytes(b"some picture")
+    (tmp_path / "b.jpg").write_bytes(b"another")
+    for path in (folder, folder / "a.jpg"):
+        os.chown(path, owner.st_uid, owner.st_gid)
+    preamble = f"URL=http://{PORT}/webapi/entry.cgi\nSID={alice['sid']}\n"
+    script = block("sharing-owner", SHARING) + block("sharing-visitor", SHARING)
+    try:
+        listing, upload = run(preamble + script, tmp_path, server.port).splitlines()
+        assert [item["name"] for item in json.loads(listing)["data"]["items"]] == ["a.jpg"]
+        assert (tmp_path / "a.jpg").read_bytes() == b"some picture"
+        assert [item["name"] for item in json.loads(upload)["data"]["items"]] == ["b.jpg"]
+        assert (folder / "b.jpg").read_bytes() == b"another"
+    finally:
+        shutil.rmtree(folder)
 
 
 def test_CompoundExample_Works(server, alice, tmp_path):
