@@ -1,7 +1,6 @@
 #include "programs/webapi/check/CheckSchema.h"
 
 #include <algorithm>
-#include <regex>
 #include <set>
 #include <string>
 #include <string_view>
@@ -13,8 +12,6 @@
 
 namespace QELO::AuthorProgram {
 namespace {
-
-constexpr size_t kLongestPattern = 1024;  // bytes
 
 /// What the value of a keyword is.
 enum class Form : uint8_t {
@@ -28,7 +25,6 @@ enum class Form : uint8_t {
   kCount,     ///< an integer from 0 on
   kBoolean,
   kText,
-  kPattern,
   kNames,  ///< a list of different texts
   kTypes,
   kValues,  ///< a list, not empty
@@ -58,7 +54,7 @@ constexpr Keyword kKeywords[] = {
     {"uniqueItems", Form::kBoolean},
     {"minLength", Form::kCount},
     {"maxLength", Form::kCount},
-    {"pattern", Form::kPattern},
+    {"pattern", Form::kText},
     {"format", Form::kText},
     {"minimum", Form::kNumber},
     {"maximum", Form::kNumber},
@@ -157,8 +153,6 @@ class SchemaCheck {
         return Demand(value.isBool(), word, value, "true or false");
       case Form::kText:
         return Demand(value.isString(), word, value, "a text");
-      case Form::kPattern:
-        return Pattern(word, value);
       case Form::kNames:
         return NameList(word, value);
       case Form::kTypes:
@@ -215,21 +209,6 @@ class SchemaCheck {
       Refuse(value, std::string("a \"type\" is a text, not ") + NameOfType(value));
     } else if (std::find(names.begin(), names.end(), name) == names.end()) {
       Refuse(value, "there is no type " + Quoted(name) + Suggestion(name, names));
-    }
-  }
-
-  void Pattern(const Keyword& word, const Json::Value& value) {
-    if (!value.isString()) {
-      return Demand(false, word, value, "a text");
-    }
-    const std::string pattern = value.asString();
-    if (pattern.size() > kLongestPattern) {
-      return Refuse(value, "a pattern is at most " + std::to_string(kLongestPattern) + " bytes");
-    }
-    try {
-      const std::regex expression(pattern, std::regex::ECMAScript);
-    } catch (const std::regex_error&) {
-      Refuse(value, "no regular expression: " + Quoted(pattern));
     }
   }
 

@@ -111,6 +111,7 @@ def test_Check_WarnsOfWhatIsOfNoUse(check, good, bad, finding):
     ('"summary": 5', '9:41: error: "summary" is a text, not an integer'),
     ('"errors": {"399": "x"}', '9:48: error: "/errors/399" codes of an API are integers from 400 on'),
     ('"params": {"$ref": "#/definitions/x"}', None),
+    ('"params": {"properties": {"a": {"pattern": "("}}}', None),
 ])
 def test_Check_OfWhatIsToldOfParameters_FindsWithPlace(check, attributes, finding):
     lines, status = check(GOOD.replace('"grantByUser": true', attributes))
