@@ -116,7 +116,8 @@ endforeach()
 # The documents stand to each other as in the source tree, so their links work.
 install(FILES README.md DEVELOPING.md CHANGELOG.md LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR})
 install(FILES packaging/lighttpd.conf.in packaging/lighttpd.service.conf packaging/nginx.conf.in
-              packaging/apache2.conf.in packaging/lighttpd-scgi.conf.in packaging/nginx-scgi.conf.in
+              packaging/apache2.conf.in packaging/apache2-scgi.conf.in packaging/lighttpd-scgi.conf.in
+              packaging/nginx-scgi.conf.in
         DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY packaging/fail2ban DESTINATION ${CMAKE_INSTALL_DOCDIR}/packaging)
 install(DIRECTORY apis docs DESTINATION ${CMAKE_INSTALL_DOCDIR} FILES_MATCHING PATTERN *.md)

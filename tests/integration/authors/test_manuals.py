@@ -43,7 +43,7 @@ def completed(root, *words):
 def test_Manual_HasEveryOption(manual):
     text = (MANUALS / manual).read_text()
     options = {option for words in ASKED[manual] for option in re.findall(r"--([a-z][a-z-]*)", told(*words))}
-    options -= {"help"}  # the daemons show their usage when they are asked for what they do not know
+    options -= {"help"}
     assert options
     assert [option for option in sorted(options) if f"Fl -{option}" not in text] == []
 
