@@ -43,9 +43,12 @@ void LookAtPlace(const Place& place, Diagnosis& diagnosis) {
       return diagnosis.Note(named + ": " + strerror(errno) +
                             (geteuid() == 0 ? "" : "; ask as root"));
     }
-    return place.isNeeded
-               ? diagnosis.Wrong(named + " is missing", "install again, or make it")
-               : diagnosis.Good(named + " is not there, and will be made when it is needed");
+    if (place.missing == Missing::kWrong) {
+      return diagnosis.Wrong(named + " is missing", "install again, or make it");
+    }
+    return diagnosis.Good(
+        named + " is not there, and " +
+        (place.missing == Missing::kMadeLater ? "will be made when it is needed" : "need not be"));
   }
   if (place.isDirectory ? !S_ISDIR(info.st_mode) : !S_ISREG(info.st_mode)) {
     return diagnosis.Wrong(named + (place.isDirectory ? " is no directory" : " is no regular file"),

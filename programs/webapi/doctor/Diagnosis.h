@@ -22,12 +22,15 @@ class Diagnosis {
   int wrong_ = 0;
 };
 
+/// What it means that something is not there.
+enum class Missing { kWrong, kMadeLater, kLeftOut };
+
 /// What a place in the file system must be.
 struct Place {
   std::string path;
   unsigned mode;  ///< the bits that it may have
   bool isDirectory;
-  bool isNeeded;     ///< else it is made when it is first used
+  Missing missing;
   const char* what;  ///< for people
 };
 

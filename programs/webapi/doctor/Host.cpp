@@ -128,18 +128,18 @@ void LookAtAccounts(Diagnosis& diagnosis) {
 
 void LookAtPlaces(Diagnosis& diagnosis) {
   const Place places[] = {
-      {Paths::kDescriptionDir, 0755, true, true, "directory of descriptions"},
-      {Paths::kLibDef, 0644, false, true, "defaults of descriptions"},
-      {Paths::kTaskDir, 01733, true, true, "directory of tasks"},
-      {Paths::kStateDir, 0755, true, true, "directory of records"},
-      {Paths::kTokenDatabase, 0600, false, false, "access tokens"},
-      {Paths::kSharingDatabase, 0600, false, false, "sharing links"},
-      {Paths::kRuntimeDir, 0755, true, false, "directory of the running system"},
-      {Paths::kSessionDir, 0700, true, false, "login sessions"},
-      {Paths::kLoginDir, 0700, true, false, "login attempts"},
-      {Paths::kSystemInfo, 0644, false, false, "settings"},
-      {Paths::kCipherKey, 0600, false, false, "key of enciphered parameters"},
-      {Paths::kRelayHosts, 0644, false, false, "hosts that calls are passed to"},
+      {Paths::kDescriptionDir, 0755, true, Missing::kWrong, "directory of descriptions"},
+      {Paths::kLibDef, 0644, false, Missing::kWrong, "defaults of descriptions"},
+      {Paths::kTaskDir, 01733, true, Missing::kWrong, "directory of tasks"},
+      {Paths::kStateDir, 0755, true, Missing::kWrong, "directory of records"},
+      {Paths::kTokenDatabase, 0600, false, Missing::kMadeLater, "access tokens"},
+      {Paths::kSharingDatabase, 0600, false, Missing::kMadeLater, "sharing links"},
+      {Paths::kRuntimeDir, 0755, true, Missing::kMadeLater, "directory of the running system"},
+      {Paths::kSessionDir, 0700, true, Missing::kMadeLater, "login sessions"},
+      {Paths::kLoginDir, 0700, true, Missing::kMadeLater, "login attempts"},
+      {Paths::kSystemInfo, 0644, false, Missing::kLeftOut, "settings"},
+      {Paths::kCipherKey, 0600, false, Missing::kLeftOut, "key of enciphered parameters"},
+      {Paths::kRelayHosts, 0600, false, Missing::kLeftOut, "hosts that calls are passed to"},
   };
   for (const Place& place : places) {
     LookAtPlace(place, diagnosis);

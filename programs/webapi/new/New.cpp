@@ -68,7 +68,7 @@ std::string faultOf(const std::string& name, std::string& project) {
     ++parts;
   }
   if (!isGood || parts < kLeastParts || parts > kMostParts) {
-    return Shown(name) + " cannot be an API's name";
+    return Shown(name) + " cannot be an API's name: two to five parts, as QELO.Photo.Album";
   }
   project = projectOf(last);
   const std::string file = Paths::kDescriptionDir + name + ".lib";
@@ -159,12 +159,13 @@ ExitCode New(const Arguments& arguments) {
     return kFailed;
   }
   printf(
-      "%s is written. Build it, test it, install it:\n"
+      "%s is written. Build it, test it, install it as root, call it:\n"
       "  cmake -S %s -B %s/build\n"
       "  cmake --build %s/build --target check\n"
-      "  cmake --install %s/build\n",
+      "  cmake --install %s/build\n"
+      "  webapi call --api %s --method greet --param name=Ann\n",
       Shown(words[0]).c_str(), Shown(words[0]).c_str(), Shown(words[0]).c_str(),
-      Shown(words[0]).c_str(), Shown(words[0]).c_str());
+      Shown(words[0]).c_str(), Shown(words[0]).c_str(), words[1].c_str());
   return kDone;
 }
 

@@ -48,6 +48,20 @@ def test_Doctor_OfAGoodHost_FindsNothingWrong(root):
         assert any(line.startswith("ok: ") and part in line for line in lines), part
 
 
+def test_Doctor_TellsWhatIsMadeByItself_AndWhatByTheAdministrator(root):
+    hosts = ROOT / "etc" / "webapi" / "relay.json"
+    hosts.unlink(missing_ok=True)
+    lines = lines_of()
+    assert f"ok: hosts that calls are passed to {hosts} is not there, and need not be" in lines
+    assert not any("qeloinfo.conf" in line and "will be made" in line for line in lines)
+    hosts.write_text("{}")
+    hosts.chmod(0o640)  # it holds tokens, and is not read then
+    try:
+        assert wrong() == [f"hosts that calls are passed to {hosts} has the mode 0640; chmod 0600 {hosts}"]
+    finally:
+        hosts.unlink()
+
+
 def test_Doctor_TellsOfSyslog_WhatIsTrue(root):
     line = next(line for line in lines_of() if "/dev/log" in line)
     with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as log:

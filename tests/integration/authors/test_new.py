@@ -18,6 +18,7 @@ def files_of(directory):
 def test_New_WritesAllFiles_WithTheirNamesPutIn(root, tmp_path):
     result = webapi("new", tmp_path / "album", NAME)
     assert (result.returncode, result.stderr) == (0, "")
+    assert result.stdout.endswith(f"\n  webapi call --api {NAME} --method greet --param name=Ann\n")
     assert files_of(tmp_path / "album") == FILES
     texts = "".join((tmp_path / "album" / file).read_text() for file in FILES)
     assert NAME in texts and "album_api_" in texts
