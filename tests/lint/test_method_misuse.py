@@ -60,7 +60,7 @@ def test_Guide_IsCompiled(tmp_path):
     blocks = re.findall(r"^<!-- test: method[\w-]* -->\n```cpp\n(.*?)^```$", text, re.DOTALL | re.MULTILINE)
     assert len(blocks) > 2
     source = tmp_path / "guide.cpp"
-    source.write_text("\n".join(blocks) + "auto entries = {QELO::Method<report>, QELO::Method<count>};\n")
+    source.write_text("\n".join(blocks) + "auto entries = {QELO::Method<report>, QELO::Method<count>, QELO::Method<keep>};\n")
     flags = run("pkg-config", "--cflags", "jsoncpp").stdout.split()
     result = run("g++", "-std=c++20", "-Wall", "-Wextra", "-Wshadow", "-Wpedantic", "-Werror", "-fsyntax-only",
                  f"-I{SOURCE}/include", *flags, str(source))
