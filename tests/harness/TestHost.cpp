@@ -23,6 +23,7 @@
 #include "tests/support/FakeTask.h"
 #include "tests/support/SyslogCapture.h"
 #include "webapi/APIAuth.h"
+#include "webapi/APIDescription.h"
 #include "webapi/JsonHelper.h"
 #include "webapi/WebEntry.h"
 #include "webapi/platform/WebAPIUtil.h"
@@ -66,6 +67,13 @@ void expectOneFramework() {
   }
 }
 
+/// A value as careful clients send it: a text that is declared one arrives as it was sent, any
+/// other stands in quotes.
+std::string wireTextOf(const Json::Value& value, const Json::Value& declared) {
+  const bool isText = JsonHelper::isText(JsonHelper::member(declared, "type"), "string");
+  return isText && value.isString() ? value.asString() : JsonHelper::toString(value);
+}
+
 bool isIn(const std::string& line, const std::string& text) {
   return line.find(text) != std::string::npos;
 }
@@ -77,6 +85,7 @@ struct TestHost::State {
   fs::path former = fs::current_path();
   std::map<std::string, Account> accounts = {{"root", {0, true}}, {"system", {kSystemId, false}}};
   std::map<std::string, std::string> variables;
+  std::map<std::string, Json::Value> descriptions;
   std::string user;  ///< who is logged in; "": nobody
   bool hasUpload = false;
   int log = -1;
@@ -209,6 +218,7 @@ void TestHost::Describe(const std::string& api, const Json::Value& description) 
     file[api]["lib"] = "the test program";
   }
   JsonHelper::toFile(state_->directory / "descriptions" / (api + ".lib"), file);
+  state_->descriptions[api] = file[api];
 }
 
 void TestHost::AddUser(const std::string& name, uid_t uid, bool isAdmin) {
@@ -260,10 +270,15 @@ void TestHost::SetClock(time_t now) {
 
 TestAnswer TestHost::Call(const std::string& api, int version, const std::string& method,
                           const Params& params) {
+  const Json::Value* attributes =
+      APIDescription(state_->descriptions[api]).Attributes(version, method);
+  const Json::Value none;
+  const Json::Value& declared = JsonHelper::member(
+      JsonHelper::member(attributes != nullptr ? *attributes : none, "params"), "properties");
   std::string line;
   for (const auto& [name, value] : params) {
     line += (line.empty() ? "" : "&") + WebAPIUtil::URLEncode(name) + "=" +
-            WebAPIUtil::URLEncode(JsonHelper::toString(value));
+            WebAPIUtil::URLEncode(wireTextOf(value, JsonHelper::member(declared, name)));
   }
   return CallLine(api, version, method, line);
 }

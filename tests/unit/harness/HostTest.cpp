@@ -106,6 +106,29 @@ TEST_F(Host, ParametersComeAsOnTheWire) {
   EXPECT_TRUE(refused.isCalled);
 }
 
+TEST_F(Host, DeclaredParametersAreReadAndCheckedBeforeTheMethod) {
+  Json::Value text;
+  text["type"] = "string";
+  text["maxLength"] = 5;
+  Json::Value method;
+  method["echo"]["params"]["type"] = "object";
+  method["echo"]["params"]["properties"]["text"] = text;
+  Json::Value description;
+  description["minVersion"] = description["maxVersion"] = 1;
+  description["allowUser"].append("normal.local");
+  description["methods"]["1"].append(method);
+  host.Describe(kApi, description);
+  EXPECT_EQ(host.CallLine(kApi, 1, "echo", "text=1.50").Data(), "1.50");
+  EXPECT_EQ(host.CallLine(kApi, 1, "echo", "text=null").Data(), "null");
+  for (const char* given : {"Ann", "5", "\"5\""}) {
+    EXPECT_EQ(Call("echo", {{"text", given}}).Data(), given);
+  }
+  const TestAnswer refused = host.CallLine(kApi, 1, "echo", "text=123456");
+  EXPECT_EQ(refused.Code(), 101);
+  EXPECT_EQ(refused.Errors()[0]["rule"], "maxLength");
+  EXPECT_FALSE(refused.isCalled);
+}
+
 TEST_F(Host, HeadersAndCookiesAreThere) {
   const TestAnswer answer = Call("echo", {{"text", "hi"}});
   EXPECT_EQ(answer.status, 200);
