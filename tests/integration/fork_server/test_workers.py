@@ -76,6 +76,17 @@ def test_Answers_AreTheSameBytes(start_workers, start, staying, sid):
     assert compared > 50
 
 
+@pytest.mark.parametrize("call", [
+    "QELO.Catalog.API&version=1&method=list", "QELO.Catalog.API&version=1&method=describe&name=QELO.Catalog.API"])
+def test_BundledApis_AnswerTheSameBytesByWorkers(start_workers, sid, call):
+    server = start_workers()
+    query = f"api={call}&_sid={sid}"
+    expected = run_entry(query)
+    assert b'"success":true' in expected
+    assert [server.request(query) for _ in range(4)] == [expected] * 4
+    assert wait_for(lambda: len(children(server.process.pid)) > 2, 1)  # a worker beside the fronts
+
+
 def test_Worker_ServesTheCallsOfItsAccount(start_workers, staying, sid):
     server = start_workers()
     found = [server.call(f"{staying}who&_sid={sid}&mark={i}")["data"] for i in range(8)]

@@ -39,14 +39,10 @@ bool APIRunner::RunByRoad(APIRequest* request, APIResponse* response,
 
 bool APIRunner::ProcessPermitted(APIRequest* request, APIResponse* response) {
   QLIBCErrSetEx(0, "APIRunner.cpp", __LINE__);  // of the call before
-  if (!SetProcessName(request, response)) {
-    return false;
-  }
-  const bool called = Execution(*this, request, response, Execution::Account::kTaken)
-                          .Run(Json::Value(Json::objectValue));
-  private_->ForgetCallName();
-  SetProcessName(request, response);
-  return called;
+  private_->ForgetCallName();                   // the log was closed since, and opens unnamed
+  return SetProcessName(request, response) &&
+         Execution(*this, request, response, Execution::Account::kTaken)
+             .Run(Json::Value(Json::objectValue));
 }
 
 }  // namespace QELO
