@@ -1,6 +1,7 @@
 #include <arpa/inet.h>
 #include <poll.h>
 #include <sys/socket.h>
+#include <sys/uio.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -84,7 +85,20 @@ bool SockConnection::Send(const std::string& message) {
   const uint32_t length = htonl(static_cast<uint32_t>(message.size()));
   char head[sizeof length];
   memcpy(head, &length, sizeof length);
-  return sendAll(descriptor_, {head, sizeof head}, end) && sendAll(descriptor_, message, end);
+  // At once, so that the other side is woken once alone.
+  iovec parts[] = {{head, sizeof head}, {const_cast<char*>(message.data()), message.size()}};
+  msghdr whole{};
+  whole.msg_iov = parts;
+  whole.msg_iovlen = message.empty() ? 1 : 2;
+  const ssize_t count =
+      TEMP_FAILURE_RETRY(sendmsg(descriptor_, &whole, MSG_NOSIGNAL | MSG_DONTWAIT));
+  if (count < 0 && errno != EAGAIN) {
+    return false;
+  }
+  const size_t sent = static_cast<size_t>(std::max<ssize_t>(count, 0));
+  const size_t ofHead = std::min(sent, sizeof head);
+  return sendAll(descriptor_, std::string_view(head, sizeof head).substr(ofHead), end) &&
+         sendAll(descriptor_, std::string_view(message).substr(sent - ofHead), end);
 }
 
 bool SockConnection::Recv(std::string& message) {
