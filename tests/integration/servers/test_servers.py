@@ -49,6 +49,17 @@ def test_Login_ServesCallsByCookieAndByParameter(client):
     assert by_cookie.data["user"] == "alice"
 
 
+def test_Rest_IsServedBesideIt(client, server, echo):  # noqa: F811
+    if server.socket is not None:
+        pytest.skip("the fork server serves entry.cgi's address alone")
+    answer = client.request("POST", f"/webapi/rest/{API}/v1/echo?a=1", '{"name": "5"}',
+                            {"Content-Type": "application/json"})
+    assert answer.status == 200, answer.body
+    assert (answer.data["name"], answer.data["a"]) == ("5", 1)
+    assert client.request("POST", "/webapi/rest/QELO.No.Such/v1/x").status == 404
+    assert client.request("GET", f"/webapi/rest/{API}/v1/echo").status == 405
+
+
 def test_Login_SetsTheCookieForThePathThatTheClientSees(client):
     answer = client.login("alice", "alice-pw")
     assert answer.headers["set-cookie"].startswith("id=")

@@ -30,17 +30,20 @@ def serving(kind, change=lambda text: text):
     """
     directory = Path(tempfile.mkdtemp(prefix="webapi-server-"))
     entry = directory / "entry.cgi"
-    shutil.copy(ENTRY, entry)
+    programs = [entry, directory / "rest.cgi"]
+    for program in programs:
+        shutil.copy(ENTRY.with_name(program.name), program)
     identity = {}
     if os.geteuid() == 0:
         directory.chmod(0o755)
         identity = {"user": "www-data", "group": "www-data", "extra_groups": []}
-        entry.chmod(0o4755)
+        for program in programs:
+            program.chmod(0o4755)
     server = kind(directory, entry)
     server.configuration.write_text(change(server.configuration.read_text()))
     if identity:
         for path in (directory, *directory.iterdir()):
-            if path != entry:
+            if path not in programs:
                 shutil.chown(path, "www-data", "www-data")
     server.start(**identity)
     yield server
