@@ -107,6 +107,13 @@ def has_processes(uid):
     return False
 
 
+def is_answered(compound):
+    try:
+        return code(compound.results([entry("echo")])[0]) == 0
+    except ValueError:  # the web server itself had no process left for the program
+        return False
+
+
 @needs_root  # an ordinary user has other processes
 def test_LimitOfProcesses_GivesTheRest117(serve):
     assert wait_for(lambda: not has_processes(account("alice")[0]), 20)
@@ -118,7 +125,7 @@ def test_LimitOfProcesses_GivesTheRest117(serve):
     assert codes == [0] * good + [117] * (100 - good)
     assert compound.has_fail
     # Once the last of them has ended, all is as it was.
-    assert wait_for(lambda: code(compound.results([entry("echo")])[0]) == 0, 10)
+    assert wait_for(lambda: is_answered(compound), 10)
 
 
 def test_LimitOfDescriptors_GivesTheRest117(serve):
