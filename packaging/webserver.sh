@@ -96,23 +96,23 @@ webserver_configure() {
   fi
 }
 
-# webserver_scgi PATH SOCKET: the configuration that has PATH served by what listens at SOCKET, which
-# is that of the recipe for the fork server.
+# webserver_scgi PREFIX SOCKET: the configuration that has PREFIX/webapi/entry.cgi and PREFIX/webapi/rest
+# served by what listens at SOCKET, which is that of the recipe for the fork server.
 webserver_scgi() {
-  local path=$1 socket=$2 name=$webserver_kind part
+  local prefix=$1 socket=$2 name=$webserver_kind part
   case $webserver_kind in
     lighttpd)
       echo 'server.modules += ("mod_scgi")'
       part="/^server.stream/,\$p"
       ;;
-    nginx) part='/^ *location = /,/^    }/p' ;;
+    nginx) part='/^ *location /,/^    }/p' ;;
     apache)
       name=apache2
-      part="/^LoadModule proxy/p; /^ProxyPass/,\$p"
+      part="/^LoadModule \\(proxy\\|setenvif\\)/p; /^SetEnvIf/,\$p"
       ;;
   esac
   sed -n "$part" "$webserver_packaging/$name-scgi.conf.in" \
-    | sed "s|/webapi/entry.cgi|$path|g; s|@SOCKET@|$socket|g"
+    | sed "s|/webapi/|$prefix/webapi/|g; s|@SOCKET@|$socket|g"
 }
 
 webserver_port_is_taken() {

@@ -3,6 +3,7 @@
 #include <webapi/JsonHelper.h>
 #include <webapi/MethodDescription.h>
 
+#include <algorithm>
 #include <map>
 #include <string>
 
@@ -60,18 +61,27 @@ Json::Value ErrorAnswer(const std::string& text) {
   return answer;
 }
 
+/// Whether something is wrong with what a description has by a key, as "/params".
+bool IsFaulty(const Json::Value& attributes, const std::string& key) {
+  const auto faults = MethodDescription(attributes).Faults();
+  return std::any_of(faults.begin(), faults.end(), [&key](const MethodDescription::Fault& fault) {
+    return fault.path.compare(0, key.size(), key) == 0;
+  });
+}
+
 Json::Value GoodAnswer(const Json::Value& attributes) {
   Json::Value answer(Json::objectValue);
   if (JsonHelper::asBool(member(attributes, "allowDownload"))) {
-    answer["description"] = "The file";
-    answer["content"]["application/octet-stream"] = Json::Value(Json::objectValue);
+    answer["description"] = "The file, whose type is its own";
+    answer["content"]["*/*"] = Json::Value(Json::objectValue);
     return answer;
   }
   Json::Value schema = Parse(R"({"type": "object", "required": ["success"],
                                  "properties": {"success": {"const": true}}})");
   const Json::Value& returns = MethodDescription(attributes).GetReturns();
-  schema["properties"]["data"] =
-      returns.isNull() ? Json::Value(Json::objectValue) : SchemaOf(returns);
+  schema["properties"]["data"] = returns.isNull() || IsFaulty(attributes, "/returns")
+                                     ? Json::Value(Json::objectValue)
+                                     : SchemaOf(returns);
   answer["description"] = "What the method gives";
   answer["content"] = Content(schema);
   return answer;
@@ -80,6 +90,10 @@ Json::Value GoodAnswer(const Json::Value& attributes) {
 Json::Value Answers(const Json::Value& attributes) {
   Json::Value answers(Json::objectValue);
   answers["200"] = GoodAnswer(attributes);
+  if (JsonHelper::asBool(member(attributes, "allowDownload"))) {
+    answers["206"] = GoodAnswer(attributes);
+    answers["206"]["description"] = "What a Range header asks for of the file";
+  }
   answers["400"] = ErrorAnswer("Wrong parameters, code 101");
   answers["401"] = ErrorAnswer("Not logged in, or no longer");
   answers["403"] = ErrorAnswer("Not allowed to this caller");
@@ -127,6 +141,43 @@ Json::Value Operation(const std::string& api, const std::string& version, const 
   return operation;
 }
 
+/// Adds an API's methods to the paths, and the names of those that take files to "uploads".
+/// @return whether the paths have one of it
+bool AddMethods(const Json::Value& api, Json::Value& paths, std::string& uploads) {
+  const std::string name = JsonHelper::asString(member(api, "api"));
+  const Json::Value& level = member(api, "authLevel");
+  const bool isForEverybody = level.isInt() && JsonHelper::asInt(level) == 0;
+  bool isShown = false;
+  const Json::Value& versions = member(api, "methods");
+  for (auto version = versions.begin(); version != versions.end(); ++version) {
+    for (auto method = version->begin(); method != version->end(); ++method) {
+      if (IsFaulty(*method, "/params")) {
+        continue;  // which no call gets past
+      }
+      if (JsonHelper::asBool(member(*method, "allowUpload"))) {
+        uploads += uploads.empty() ? "" : "; ";
+        uploads += name + " " + version.name() + " " + method.name();
+        continue;
+      }
+      isShown = true;
+      paths["/" + name + "/v" + version.name() + "/" + method.name()]["post"] =
+          Operation(name, version.name(), method.name(), *method, isForEverybody);
+    }
+  }
+  return isShown;
+}
+
+/// A reader who misses them is told where they are.
+void TellUploads(const std::string& uploads, Json::Value& document) {
+  if (!uploads.empty()) {
+    document["info"]["description"] =
+        "Methods that take files have no address of their own. Send a form (multipart/form-data) "
+        "to /webapi/entry.cgi, with api, version and method in the query or before the first "
+        "file: " +
+        uploads + ".";
+  }
+}
+
 }  // namespace
 
 Json::Value OpenApi(const Json::Value& apis) {
@@ -139,24 +190,12 @@ Json::Value OpenApi(const Json::Value& apis) {
   document["components"] = Components();
   document["tags"] = Json::Value(Json::arrayValue);
   Json::Value& paths = document["paths"] = Json::Value(Json::objectValue);
+  std::string uploads;
   for (const Json::Value& api : apis) {
-    const std::string name = JsonHelper::asString(member(api, "api"));
-    const Json::Value& level = member(api, "authLevel");
-    const bool isForEverybody = level.isInt() && JsonHelper::asInt(level) == 0;
-    bool isShown = false;
-    const Json::Value& versions = member(api, "methods");
-    for (auto version = versions.begin(); version != versions.end(); ++version) {
-      for (auto method = version->begin(); method != version->end(); ++method) {
-        if (!JsonHelper::asBool(member(*method, "allowUpload"))) {
-          isShown = true;
-          paths["/" + name + "/v" + version.name() + "/" + method.name()]["post"] =
-              Operation(name, version.name(), method.name(), *method, isForEverybody);
-        }
-      }
-    }
-    if (isShown) {
-      document["tags"].append(Json::Value(Json::objectValue))["name"] = name;
+    if (AddMethods(api, paths, uploads)) {
+      document["tags"].append(Json::Value(Json::objectValue))["name"] = member(api, "api");
     }
   }
+  TellUploads(uploads, document);
   return document;
 }

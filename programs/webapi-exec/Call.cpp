@@ -107,7 +107,7 @@ std::string makeCall(const Options& options, Json::Value& answer) {
   }
   const bool isBatch = !options.batch.empty();
   Json::Value attributes(Json::objectValue);
-  if (!isBatch) {  // whose entries have parameters of their own
+  if (!isBatch && options.api != kBatchAPI) {  // whose entries have parameters of their own
     attributes["_sent_texts"] = options.sent;
   }
   ExecParam param;

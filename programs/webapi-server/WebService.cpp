@@ -7,10 +7,13 @@
 #include <unistd.h>
 
 #include <cstdint>
+#include <cstdlib>
 #include <set>
 #include <vector>
 
-#include "programs/entry.cgi/ServeRequest.h"
+#include "programs/entry/RestEntry.h"
+#include "programs/entry/RestPath.h"
+#include "programs/entry/ServeRequest.h"
 #include "programs/server/ServiceManager.h"
 #include "programs/server/metrics/Page.h"
 #include "programs/webapi-server/EntryName.h"
@@ -39,6 +42,13 @@ std::set<std::string> describedLibraries() {
     }
   }
   return paths;
+}
+
+/// Of the request whose variables are the environment.
+bool isForRest() {
+  const char* script = getenv("SCRIPT_NAME");
+  const char* path = getenv("PATH_INFO");
+  return script != nullptr && RestPath::IsAddress(script, path != nullptr ? path : "");
 }
 
 std::string refusal(const char* status, const char* text) {
@@ -109,8 +119,9 @@ int WebService::Serve(Connection& connection, Note&) {
     return 1;
   }
   environ = environment.data();
-  TakeEntryName();
-  return ServeRequest(argc_, argv_);
+  const bool isRest = isForRest();
+  TakeEntryName(isRest);
+  return ServeRequest(argc_, argv_, isRest ? RestEntry::Make : nullptr);
 }
 
 std::string WebService::Refuse(Refusal reason) {

@@ -13,7 +13,7 @@ class WorkerHub;
 
 /// Serves the requests that a web server passes on by SCGI, each as a CGI program that was just
 /// started would: with the request's variables as its whole environment, the body on standard input
-/// and the answer on standard output.
+/// and the answer on standard output. Addresses of methods are served, too.
 class WebService : public Service {
  public:
   /// Who may connect beside root and our own account; (uid_t)-1: nobody.

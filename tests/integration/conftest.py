@@ -102,8 +102,8 @@ def describe(root):
             file.write_text(content)
 
 
-def run_entry(query=None, body=None, length=None, **environment):
-    """Runs entry.cgi without a web server; answers its whole output."""
+def run_entry(query=None, body=None, length=None, program="entry.cgi", **environment):
+    """Runs entry.cgi, or rest.cgi, without a web server; answers its whole output."""
     variables = {"REQUEST_METHOD": "GET", "REMOTE_ADDR": "127.0.0.1", **environment}
     if query is not None:
         variables["QUERY_STRING"] = query
@@ -112,7 +112,7 @@ def run_entry(query=None, body=None, length=None, **environment):
         variables.setdefault("CONTENT_TYPE", "application/x-www-form-urlencoded")
         variables["CONTENT_LENGTH"] = str(len(body) if length is None else length)
     process = subprocess.run(
-        [ENTRY], input=body or b"", env=variables, capture_output=True, timeout=30, check=False
+        [ENTRY.with_name(program)], input=body or b"", env=variables, capture_output=True, timeout=30, check=False
     )
     assert process.returncode == 0, process
     return process.stdout

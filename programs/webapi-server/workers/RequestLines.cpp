@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "programs/entry/RestPath.h"
 #include "webapi/base/Number.h"
 
 namespace QELO {
@@ -41,6 +42,8 @@ RequestLines::RequestLines(std::string_view header) {
   std::string_view rest = header.substr(std::min(header.find(':') + 1, header.size()));
   int64_t length = -1;
   bool isBarred = false;
+  std::string_view script;
+  std::string_view path;
   while (rest.size() > 1) {
     const std::string_view name = takeText(rest);
     const std::string_view value = takeText(rest);
@@ -50,10 +53,15 @@ RequestLines::RequestLines(std::string_view header) {
       query = value;
     } else if (name == "CONTENT_TYPE") {
       isForm = value.find("multipart") == std::string_view::npos;
+    } else if (name == "SCRIPT_NAME") {
+      script = value;
+    } else if (name == "PATH_INFO") {
+      path = value;
     }
     isBarred = isBarred || std::find(std::begin(kBarredNames), std::end(kBarredNames), name) !=
                                std::end(kBarredNames);
   }
+  isBarred = isBarred || RestPath::IsAddress(script, path);
   bodyLength = isBarred || !isForm ? -1 : length;
 }
 

@@ -81,7 +81,7 @@ void lookAtLighttpd(const std::string& path, const std::string& text, Diagnosis&
 /// @return whether it serves the web API
 bool lookAtConfiguration(const std::string& path, Diagnosis& diagnosis) {
   const std::string text = textOf(path);
-  if (!holds(text, "entry.cgi") && !holds(text, "webapi-server")) {
+  if (!holds(text, "entry.cgi") && !holds(text, "entry\\.cgi") && !holds(text, "webapi-server")) {
     return false;
   }
   const int before = diagnosis.Count();

@@ -1,8 +1,11 @@
 """Declared parameters on all roads of a call: alone, in a compound request, from code, by REST."""
 
 import json
+from urllib.parse import quote
 
 import pytest
+
+from conftest import run_entry
 
 from exec_program import call as exec_call, data_of
 
@@ -66,6 +69,15 @@ def test_ACallFromTheCommandLine_GetsTextsAsTheyWereGiven(root, good):
     assert wrong(json.loads(refused.stdout)["error"]) == {("/name", "required"), ("/size", "minimum")}
 
 
+def test_ACompoundCallFromTheCommandLine_LeavesItsEntriesAsTheyAre(root, good):
+    entries = [{"api": API, "version": 1, "method": "echo", "name": name} for name in ("5", 5)]
+    answer = exec_call("QELO.Entry.Request", "request", "--param", f"compound={json.dumps(entries)}", "--param",
+                       "name=5")
+    results = data_of(answer)["result"]
+    assert results[0]["data"]["name"] == "5"
+    assert wrong(results[1]["error"]) == {("/name", "type")}
+
+
 class Rest:
     def __init__(self, client):
         self.client = client
@@ -91,6 +103,16 @@ def test_Rest_TakesJsonAndLeavesItAsItIs(rest, good):
     assert answer.headers["Content-Type"] == 'application/json; charset="UTF-8"'
 
 
+def test_Rest_ReadsTextsOfTheQueryAloneAsTheyWereSent(rest, good):
+    path = f"{API}/v1/echo"
+    for text in ("12345", "true", "[1]", '"5"'):
+        assert rest.post(path, query=f"?name={quote(text)}").data["name"] == text
+        assert rest.post(path, {"size": 3}, query=f"?name={quote(text)}").data["name"] == text
+        assert rest.post(path, {"name": text}, query="?name=5").data["name"] == text
+    for body, query in (({"name": 5}, "?name=5"), ({"name": True}, "?name=true")):
+        assert wrong(rest.post(path, body, query=query).json["error"]) == {("/name", "type")}
+
+
 def test_Rest_TellsErrorsByStatus(rest, good, alice, describe):
     answer = rest.post(f"{API}/v1/echo", {"name": 12345})
     assert answer.status == 400
@@ -112,13 +134,20 @@ def test_Rest_RefusesOtherMethodsAndBodies(rest, client, good):
     path = f"{API}/v1/echo"
     answer = client.request("GET", f"/webapi/rest/{path}?name=x")
     assert (answer.status, answer.code, answer.headers["Allow"]) == (405, 101, "POST")
-    for body in ("", "[1]", "{", '{"name": "x"} more', "name=x", b"\xff", "[" * 300):
+    for body in ("", "[1]", "{", '{"name": "x"} more', "name=x", b"\xff", "[" * 300,
+                 '{"name": "x"}\0', '{"name": "x"}\0, "size": 3}'):
         answer = rest.post(path, body or " ")
         assert (answer.status, answer.code) == (400, 101), body
     assert rest.post(path, {"a": list(range(60_000))}).status == 400
     assert rest.post(path, "name=x", Content_Type="application/x-www-form-urlencoded").status == 415
     assert rest.post(path, "x", Content_Type="multipart/form-data; boundary=x").status == 415
     assert rest.post(path, {"name": "x"}, Content_Type="APPLICATION/JSON; charset=utf-8").status == 200
+
+
+def test_Rest_RefusesABodyThatIsCutOff(good):
+    answer = run_entry(program="rest.cgi", body=b'{"name": "x"}', length=14, CONTENT_TYPE="application/json",
+                       PATH_INFO=f"/{API}/v1/echo")
+    assert b"\r\nStatus: 400\r\n" in answer
 
 
 def test_Rest_TakesCredentialsAsEver(rest, alice):

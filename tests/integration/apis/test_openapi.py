@@ -82,7 +82,16 @@ def test_Document_HasWhatTheDescriptionTells(document):
     assert good["properties"]["data"] == {"type": "object", "properties": {"name": {"type": "string"}}}
     assert operation["responses"]["422"]["description"] == "404: nobody"
     download = document["paths"]["/QELO.Test.Good/v1/get"]["post"]
-    assert "application/octet-stream" in download["responses"]["200"]["content"]
+    assert download["responses"]["200"]["content"] == download["responses"]["206"]["content"] == {"*/*": {}}
+    assert "206" not in operation["responses"]
+
+
+def test_Document_SaysWhereUploadsAre(client, document, alice, described):
+    text = document["info"]["description"]
+    assert "QELO.Test.Good 1 put" in text and "multipart/form-data" in text and "/webapi/entry.cgi" in text
+    assert "QELO.Test.Good 1 get" not in text
+    other = client.call(API, "openapi", _sid=alice["sid"], prefix=API).data
+    assert "description" not in other["info"]
 
 
 def test_Document_OfAPrefix_HasThoseAlone(client, alice, described):
@@ -95,7 +104,7 @@ def test_Document_IsValid(document):
     """By the rules that matter of OpenAPI 3.1: members, references, and schemas that are schemas."""
     jsonschema = pytest.importorskip("jsonschema")
     assert set(document) <= {"openapi", "info", "servers", "paths", "components", "security", "tags"}
-    assert {"title", "version"} <= set(document["info"])
+    assert {"title", "version"} <= set(document["info"]) <= {"title", "version", "description"}
     schemes = set(document["components"]["securitySchemes"])
     assert all(set(needed) <= schemes for needed in document["security"])
     schemas = list(document["components"]["schemas"].values())
@@ -115,6 +124,18 @@ def test_Document_IsValid(document):
         jsonschema.Draft202012Validator.check_schema(schema)
     references = set(re.findall(r'"\$ref": "([^"]*)"', json.dumps(document)))
     assert references == {"#/components/schemas/Error"}
+
+
+def test_Document_HasNoSchemaThatIsNone(client, describe, alice):
+    """A method whose params are no schema cannot be called."""
+    describe("QELO.Test.Good", "good.so", maxVersion=1, methods={"1": [
+        {"echo": {"params": {"type": "object", "properties": {"a": {"type": "text"}}}}},
+        {"fail": {"params": {"type": "array"}}}, {"silent": {"returns": {"minimum": "x"}}}]})
+    paths = client.call(API, "openapi", _sid=alice["sid"], prefix="QELO.Test.Good").data["paths"]
+    assert list(paths) == ["/QELO.Test.Good/v1/silent"]
+    good = paths["/QELO.Test.Good/v1/silent"]["post"]["responses"]["200"]["content"]["application/json"]
+    assert good["schema"]["properties"]["data"] == {}
+    assert client.call("QELO.Test.Good", "echo", a="x").code == 103
 
 
 @needs_tools

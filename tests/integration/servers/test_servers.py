@@ -50,14 +50,23 @@ def test_Login_ServesCallsByCookieAndByParameter(client):
 
 
 def test_Rest_IsServedBesideIt(client, server, echo):  # noqa: F811
-    if server.socket is not None:
-        pytest.skip("the fork server serves entry.cgi's address alone")
     answer = client.request("POST", f"/webapi/rest/{API}/v1/echo?a=1", '{"name": "5"}',
                             {"Content-Type": "application/json"})
     assert answer.status == 200, answer.body
     assert (answer.data["name"], answer.data["a"]) == ("5", 1)
     assert client.request("POST", "/webapi/rest/QELO.No.Such/v1/x").status == 404
     assert client.request("GET", f"/webapi/rest/{API}/v1/echo").status == 405
+    assert client.request("POST", f"/webapi/rest/a%20b/v1/x?api={API}&version=1&method=echo").status == 404
+    assert client.request("POST", f"/webapi/restful/{API}/v1/echo").status in (403, 404)
+
+
+def test_Rest_TakesASession(client, server):  # noqa: F811
+    session = session_of(client, "alice")
+    path = "/webapi/rest/QELO.Access.Session/v1/current"
+    assert client.request("POST", f"{path}?_sid={session['sid']}").data["user"] == "alice"
+    cookie = {"Cookie": f"id={session['sid']}", "X-Qelo-Token": session["token"]}
+    assert client.request("POST", path, headers=cookie).data["user"] == "alice"
+    assert client.request("POST", path).status == 401
 
 
 def test_Login_SetsTheCookieForThePathThatTheClientSees(client):

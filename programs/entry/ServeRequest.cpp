@@ -1,4 +1,4 @@
-#include "programs/entry.cgi/ServeRequest.h"
+#include "programs/entry/ServeRequest.h"
 
 #include <syslog.h>
 #include <unistd.h>

@@ -1,9 +1,14 @@
-#include "programs/rest.cgi/RestPath.h"
+#include "programs/entry/RestPath.h"
 
 #include "webapi/base/Number.h"
 #include "webapi/base/Text.h"
 
 namespace QELO {
+namespace {
+
+constexpr std::string_view kPart = "/rest";
+
+}  // namespace
 
 bool RestPath::Read(std::string_view path, RestPath& call) {
   if (path.substr(0, 1) != "/") {
@@ -20,6 +25,11 @@ bool RestPath::Read(std::string_view path, RestPath& call) {
   }
   call = {std::string(api), number, std::string(path)};
   return true;
+}
+
+bool RestPath::IsAddress(std::string_view scriptName, std::string_view pathInfo) {
+  return scriptName.ends_with(kPart) ||
+         (!pathInfo.empty() && scriptName.find("/rest/") != std::string_view::npos);
 }
 
 }  // namespace QELO

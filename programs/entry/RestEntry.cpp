@@ -1,4 +1,4 @@
-#include "programs/rest.cgi/RestEntry.h"
+#include "programs/entry/RestEntry.h"
 
 #include <strings.h>
 #include <unistd.h>
@@ -8,7 +8,7 @@
 #include <string_view>
 #include <utility>
 
-#include "programs/rest.cgi/RestPath.h"
+#include "programs/entry/RestPath.h"
 #include "webapi/APIRequest.h"
 #include "webapi/APIResponse.h"
 #include "webapi/JsonHelper.h"
@@ -28,6 +28,16 @@ constexpr std::string_view kJson = "application/json";
 std::string variable(const char* name) {
   const char* value = getenv(name);
   return value != nullptr ? value : "";
+}
+
+/// A body's values are JSON already: none takes the text that the query has by its name.
+void forgetTextsOf(const Json::Value& body, APIRequest& request) {
+  Json::Value texts = request.GetSentTexts();
+  for (auto it = body.begin(); it != body.end(); ++it) {
+    texts.removeMember(it.name());
+  }
+  request.ForgetSentTexts();
+  request.KeepSentTexts(std::move(texts));
 }
 
 /// Whether a media type is JSON's, whatever stands behind it.
@@ -76,6 +86,9 @@ bool RestEntry::Initialize(const Json::Value& param) {
   if (!WebEntry::Initialize(param)) {
     return false;
   }
+  if (!params.empty()) {
+    forgetTextsOf(params, *Request());
+  }
   params["api"] = call.api;
   params["version"] = call.version;
   params["method"] = call.method;
@@ -109,7 +122,9 @@ bool RestEntry::TakeBody(Json::Value& params) {
   JsonHelper::Reading how;
   how.maxValues = kMostValues;
   Json::Value body;
-  if (!isRead || JsonHelper::readJsonText(text, how, body) != JsonHelper::ReadResult::kRead ||
+  // What was cut off, or stands behind a NUL, is no part of the text.
+  if (!isRead || text.size() != static_cast<size_t>(size) ||
+      JsonHelper::readJsonText(text, how, body) != JsonHelper::ReadResult::kRead ||
       !body.isObject()) {
     return Refuse(WEBAPI_ERR_BAD_REQUEST, HTTP_STATUS_BAD_REQUEST, "type",
                   "the body must be a JSON object");
