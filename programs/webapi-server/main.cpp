@@ -180,7 +180,7 @@ int main(int argc, char** argv) {
   if (!server.Open() || !listen(server, settings, handed)) {
     return 1;
   }
-  QELO::WorkerHub workers(server, settings.workers, argc, argv);
+  QELO::WorkerHub workers(server, settings.workers, metrics, argc, argv);
   if (settings.workers.fronts > 0) {
     if (!workers.Open()) {
       perror("workers");

@@ -28,6 +28,19 @@ struct Metrics {
     std::chrono::microseconds sum{};
   };
 
+  /// Of one kind of processes that stay: how many there are and were, and why they have ended.
+  struct Staying {
+    size_t now = 0;
+    uint64_t started = 0;
+    uint64_t idle = 0;     ///< nobody called for long
+    uint64_t calls = 0;    ///< it has served as many as it may
+    uint64_t memory = 0;   ///< it has taken too much
+    uint64_t crash = 0;    ///< a signal, or the end of the process within a call
+    uint64_t timeOut = 0;  ///< its call took too long
+    uint64_t remains = 0;  ///< a call has left something else that cannot be put back
+    uint64_t other = 0;    ///< nobody needs it any more, or it could not be set up
+  };
+
   void CountRefusal(Service::Refusal reason);
 
   std::time_t startedAt = 0;
@@ -43,6 +56,10 @@ struct Metrics {
   uint64_t tooLarge = 0;   ///< refused, for the header's length
   uint64_t gone = 0;       ///< the client had gone before its turn
   uint64_t denied = 0;     ///< connections of accounts that may not connect
+
+  Staying fronts;
+  Staying workers;
+  uint64_t byFronts = 0;  ///< requests that a front has seen to, and no process of their own
 
   Times arriving;                         ///< from the connection to the whole header
   Times waiting;                          ///< from there to the turn

@@ -60,6 +60,20 @@ std::vector<std::pair<const char*, const Metrics::Times*>> stages(const Metrics&
           {"serving", &metrics.serving}};
 }
 
+std::vector<std::pair<const char*, const Metrics::Staying*>> staying(const Metrics& metrics) {
+  return {{"front", &metrics.fronts}, {"worker", &metrics.workers}};
+}
+
+Named endings(const Metrics::Staying& kind) {
+  return {{"idle", kind.idle},   {"calls", kind.calls},      {"memory", kind.memory},
+          {"crash", kind.crash}, {"time_out", kind.timeOut}, {"remains", kind.remains},
+          {"other", kind.other}};
+}
+
+Named roads(const Metrics& metrics) {
+  return {{"worker", metrics.byFronts}, {"forked", metrics.forking.Count()}};
+}
+
 void addStages(const Metrics& metrics, std::string& text) {
   Lines lines(text, "stage_seconds", "histogram", "How long requests are in each stage.");
   for (const auto& [name, times] : stages(metrics)) {
@@ -78,6 +92,23 @@ void addStages(const Metrics& metrics, std::string& text) {
 void addNamed(const Named& figures, const char* kind, Lines lines) {
   for (const auto& [name, count] : figures) {
     lines.Add(static_cast<double>(count), label(kind, name));
+  }
+}
+
+void addStaying(const Metrics& metrics, std::string& text) {
+  Lines now(text, "staying", "gauge", "Processes that stay from request to request.");
+  for (const auto& [name, kind] : staying(metrics)) {
+    now.Add(static_cast<double>(kind->now), label("process", name));
+  }
+  Lines started(text, "started_total", "counter", "Those that were started.");
+  for (const auto& [name, kind] : staying(metrics)) {
+    started.Add(static_cast<double>(kind->started), label("process", name));
+  }
+  Lines ended(text, "ended_total", "counter", "Those that have ended.");
+  for (const auto& [name, kind] : staying(metrics)) {
+    for (const auto& [reason, count] : endings(*kind)) {
+      ended.Add(static_cast<double>(count), label("process", name) + "," + label("reason", reason));
+    }
   }
 }
 
@@ -108,6 +139,9 @@ std::string Text(const Metrics& metrics) {
       .Add(metrics.limits.queued, label("of", "waiting"))
       .Add(metrics.limits.arriving, label("of", "arriving"));
   addStages(metrics, text);
+  addNamed(roads(metrics), "road",
+           {text, "calls_total", "counter", "Requests by the road that they have taken."});
+  addStaying(metrics, text);
   Lines(text, "processor_seconds_total", "counter", "Processor time of processes that have ended.")
       .Add(seconds(metrics.processor));
   Lines(text, "start_time_seconds", "gauge", "When the server was started, seconds since 1970.")
@@ -129,6 +163,12 @@ Json::Value Object(const Metrics& metrics) {
   for (const auto& [name, times] : stages(metrics)) {
     object["stages"][name]["count"] = static_cast<Json::UInt64>(times->Count());
     object["stages"][name]["seconds"] = seconds(times->sum);
+  }
+  object["calls"] = objectOf(roads(metrics));
+  for (const auto& [name, kind] : staying(metrics)) {
+    object["staying"][name]["now"] = static_cast<Json::UInt64>(kind->now);
+    object["staying"][name]["started"] = static_cast<Json::UInt64>(kind->started);
+    object["staying"][name]["ended"] = objectOf(endings(*kind));
   }
   object["processorSeconds"] = seconds(metrics.processor);
   return object;

@@ -71,8 +71,11 @@ void Front::ReapWaiters() {
   }
 }
 
-bool Front::IsWornOut() const {
-  return served_ >= kMostRequests || (served_ % 16 == 0 && OwnMemory() > kMostMemory);
+Ending Front::WornOut() const {
+  if (served_ >= kMostRequests) {
+    return Ending::kCalls;
+  }
+  return served_ % 16 == 0 && OwnMemory() > kMostMemory ? Ending::kMemory : Ending::kTold;
 }
 
 /// @return whether the request is served, or somebody's who serves it
@@ -121,13 +124,14 @@ int Front::Run() {
     message.descriptor = UniqueFd();
     explicit_bzero(message.text.data(), message.text.size());
     ++served_;
-    const bool isLast = IsWornOut();
+    const Ending ending = WornOut();
+    const bool isLast = ending != Ending::kTold;
     const char word = served ? (isLast ? kDoneLast : kDone) : (isLast ? kLeftLast : kLeft);
     if (!Send(channel_.Get(), word, "", -1, true) || isLast) {
-      break;
+      return static_cast<int>(ending);
     }
   }
-  return 0;
+  return static_cast<int>(Ending::kTold);
 }
 
 }  // namespace QELO

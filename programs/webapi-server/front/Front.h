@@ -8,6 +8,7 @@
 #include "programs/webapi-server/front/FrontRoad.h"
 #include "programs/webapi-server/front/WorkerLinks.h"
 #include "programs/webapi-server/workers/ControlChannel.h"
+#include "programs/webapi-server/workers/Ending.h"
 #include "programs/webapi-server/workers/WorkerLimits.h"
 #include "webapi/base/UniqueFd.h"
 
@@ -22,14 +23,15 @@ class Front {
   /// @param argc, argv  main()'s, whose area shows the call
   Front(UniqueFd channel, const WorkerLimits& limits, int argc, char** argv);
 
-  /// @return the process's exit status
+  /// @return the process's exit status, see Ending
   int Run();
 
  private:
   UniqueFd StartWorker(const std::string& key);
   bool Serve(std::string& header, const UniqueFd& connection);
   void ReapWaiters();
-  bool IsWornOut() const;
+  /// Why it is to take no more requests; kTold: nothing says so.
+  Ending WornOut() const;
 
   const UniqueFd channel_;
   const WorkerLimits limits_;

@@ -8,6 +8,7 @@
 #include <syslog.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <exception>
 #include <utility>
 #include <vector>
@@ -71,10 +72,12 @@ bool isSame(const struct stat& left, const struct stat& right) {
 
 }  // namespace
 
-Worker::Worker(UniqueFd socket, std::string key, const WorkerLimits& limits, int argc, char** argv)
+Worker::Worker(UniqueFd socket, std::string key, CallClock clock, const WorkerLimits& limits,
+               int argc, char** argv)
     : socket_(socket.Get()),
       front_(std::move(socket), {std::chrono::seconds(0), kSendLimit, limits.idle}),
       key_(std::move(key)),
+      clock_(std::move(clock)),
       limits_(limits),
       argc_(argc),
       argv_(argv),
@@ -119,8 +122,12 @@ void Worker::SetTimer(bool runs) const {
 
 /// A call that the front has sent is not lost to the end of a worker that nobody needed so far.
 bool Worker::Receive(std::string& text) {
+  const auto begin = std::chrono::steady_clock::now();
   if (front_.Recv(text)) {
     return true;
+  }
+  if (std::chrono::steady_clock::now() - begin >= limits_.idle) {
+    ending_ = Ending::kIdle;
   }
   shutdown(socket_, SHUT_RD);  // the front is refused from here on
   return front_.Await(std::chrono::milliseconds(0)) == WorkerLink::Coming::kWhole &&
@@ -129,11 +136,15 @@ bool Worker::Receive(std::string& text) {
 
 int Worker::Run() {
   if (!Prepare()) {
-    return 1;
+    return static_cast<int>(Ending::kFailed);
   }
   std::string text;
   Remains::Left left = Remains::Left::kNothing;
-  for (unsigned calls = 0; calls < limits_.calls; ++calls) {
+  for (unsigned calls = 0;; ++calls) {
+    if (calls == limits_.calls) {
+      ending_ = Ending::kCalls;
+      break;
+    }
     if (!front_.Send("") || !Receive(text)) {
       break;
     }
@@ -147,7 +158,9 @@ int Worker::Run() {
   }
   SetTimer(true);  // what libraries do when they are closed is foreign as well
   runner_.reset();
-  return left == Remains::Left::kNothing ? 0 : kLeftStatus + static_cast<int>(left);
+  return left == Remains::Left::kNothing
+             ? static_cast<int>(ending_)
+             : static_cast<int>(Ending::kRemains) + static_cast<int>(left);
 }
 
 /// What is open is what the file was. A front that is told nothing has the call made elsewhere.
@@ -183,9 +196,11 @@ Worker::After Worker::Serve(std::string& text) {
     front_.Send("");
     return After::kEnd;
   }
+  clock_.Begin();
   SetTimer(true);
   runner_->ProcessPermitted(&request, &response);
   SetTimer(false);
+  clock_.End();
   if (!front_.Send(JsonHelper::toString(response.Serialize()))) {
     WEBAPI_LOG(kSource, "the answer was not taken [%m]");
     return After::kEnd;

@@ -9,6 +9,8 @@
 
 #include "programs/webapi-server/front/WorkerLink.h"
 #include "programs/webapi-server/worker/Remains.h"
+#include "programs/webapi-server/workers/CallClock.h"
+#include "programs/webapi-server/workers/Ending.h"
 #include "programs/webapi-server/workers/WorkerLimits.h"
 #include "webapi/base/UniqueFd.h"
 
@@ -21,15 +23,14 @@ class WorkerRunner;
 /// another has left. A call that crashes, or takes too long, takes the worker with it.
 class Worker {
  public:
-  /// The exit status of a worker that ends because of what a call has left, less a Remains::Left.
-  static constexpr int kLeftStatus = 64;
-
   /// @param key         whose calls, see WorkerMessage::KeyOf()
+  /// @param clock       tells the server since when a call is made
   /// @param argc, argv  main()'s, whose area shows the call
-  Worker(UniqueFd socket, std::string key, const WorkerLimits& limits, int argc, char** argv);
+  Worker(UniqueFd socket, std::string key, CallClock clock, const WorkerLimits& limits, int argc,
+         char** argv);
   ~Worker();
 
-  /// @return the process's exit status
+  /// @return the process's exit status, see Ending
   int Run();
 
  private:
@@ -44,10 +45,12 @@ class Worker {
   const int socket_;
   WorkerLink front_;
   const std::string key_;
+  CallClock clock_;
   const WorkerLimits limits_;
   const int argc_;
   char** const argv_;
   timer_t timer_{};
+  Ending ending_ = Ending::kTold;
   Remains remains_;
   std::unique_ptr<WorkerRunner> runner_;
   std::map<std::string, struct stat> libraries_;  ///< as they were when they were opened

@@ -16,6 +16,8 @@
 #include "programs/server/Server.h"
 #include "programs/webapi-server/front/Front.h"
 #include "programs/webapi-server/worker/Worker.h"
+#include "programs/webapi-server/workers/CallClock.h"
+#include "programs/webapi-server/workers/Ending.h"
 #include "programs/webapi-server/workers/RequestLines.h"
 #include "webapi/base/Log.h"
 
@@ -30,12 +32,17 @@ constexpr std::chrono::milliseconds kStartPause{
     200};  ///< between two fronts that take others' place
 /// For one request: whatever holds a front up, it is not needed by those that come after.
 constexpr std::chrono::seconds kFrontLimit{30};
-constexpr unsigned kPartOfOne = 4;  ///< an account has a quarter of all workers at most
 
 }  // namespace
 
-WorkerHub::WorkerHub(Server& server, const WorkerLimits& limits, int argc, char** argv)
-    : server_(server), limits_(limits), argc_(argc), argv_(argv) {}
+WorkerHub::WorkerHub(Server& server, const WorkerLimits& limits, Metrics& metrics, int argc,
+                     char** argv)
+    : server_(server),
+      limits_(limits),
+      metrics_(metrics),
+      argc_(argc),
+      argv_(argv),
+      workers_(limits, metrics.workers) {}
 
 WorkerHub::~WorkerHub() = default;
 
@@ -80,6 +87,8 @@ bool WorkerHub::StartFront() {
   front.channel = std::move(ours);
   const int channel = front.channel.Get();
   fronts_.emplace(channel, std::move(front));
+  ++metrics_.fronts.started;
+  ++metrics_.fronts.now;
   return true;
 }
 
@@ -120,7 +129,6 @@ bool WorkerHub::Give(Front& front, Held& connection) {
                             connection->socket.Get(), false)) {
     return false;
   }
-  ++counts_.taken;
   front.connection = std::move(connection);
   front.since = ServerClock::now();
   return true;
@@ -190,6 +198,7 @@ void WorkerHub::TakeWord(Front& front, ControlChannel::Message& word) {
     case ControlChannel::kDone:
       if (front.connection != nullptr) {
         server_.CountServed(*front.connection);
+        ++metrics_.byFronts;
       }
       front.connection.reset();
       return;
@@ -197,7 +206,6 @@ void WorkerHub::TakeWord(Front& front, ControlChannel::Message& word) {
       front.isLast = true;
       [[fallthrough]];
     case ControlChannel::kLeft:
-      ++counts_.left;
       if (front.connection != nullptr) {
         server_.ServeApart(std::move(front.connection));
       }
@@ -210,21 +218,16 @@ void WorkerHub::TakeWord(Front& front, ControlChannel::Message& word) {
 void WorkerHub::StartWorker(Front& front, const std::string& key) {
   int ends[2] = {-1, -1};
   pid_t pid = -1;
-  const unsigned mostOfOne = std::max(1U, limits_.workers / kPartOfOne);
-  const auto known = workersOf_.find(key);
-  if (workers_.size() < limits_.workers &&
-      (known == workersOf_.end() || known->second < mostOfOne) &&
-      socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends) == 0) {
+  CallClock clock;
+  if (workers_.HasRoomFor(key) && socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends) == 0) {
     pid = server_.Spawn(UniqueFd(ends[1]), [&](UniqueFd socket) {
       ForgetRequests();
-      return Worker(std::move(socket), key, limits_, argc_, argv_).Run();
+      return Worker(std::move(socket), key, std::move(clock), limits_, argc_, argv_).Run();
     });
   }
   const UniqueFd theirs(ends[0]);
   if (pid > 0) {
-    workers_.emplace(pid, key);
-    ++workersOf_[key];
-    ++counts_.workers;
+    workers_.Add(pid, key, std::move(clock));
   }
   ControlChannel::Send(front.channel.Get(),
                        pid > 0 ? ControlChannel::kWorker : ControlChannel::kNoWorker, "",
@@ -232,24 +235,7 @@ void WorkerHub::StartWorker(Front& front, const std::string& key) {
 }
 
 void WorkerHub::Ended(pid_t pid, int status) {
-  const auto worker = workers_.find(pid);
-  if (worker != workers_.end()) {
-    const std::string account = worker->second.substr(worker->second.find(' ') + 1);
-    if (WIFSIGNALED(status)) {
-      ++counts_.killed;
-      WEBAPI_LOG(kSource, "the worker %d of %s ended by signal %d", pid, LogText(account).c_str(),
-                 WTERMSIG(status));
-      kill(-pid, SIGKILL);  // what its call has started
-    } else if (const char* left = Remains::TextOf(
-                   static_cast<Remains::Left>(WEXITSTATUS(status) - Worker::kLeftStatus))) {
-      syslog(LOG_INFO, "%s:%d the worker %d of %s ended: a call has left %s", kSource, __LINE__,
-             pid, LogText(account).c_str(), LogText(left).c_str());
-    }
-    const auto count = workersOf_.find(worker->second);
-    if (--count->second == 0) {
-      workersOf_.erase(count);
-    }
-    workers_.erase(worker);
+  if (workers_.TakeEnded(pid, status)) {
     return;
   }
   for (auto it = fronts_.begin(); it != fronts_.end(); ++it) {
@@ -262,13 +248,14 @@ void WorkerHub::Ended(pid_t pid, int status) {
     }
     const bool isGone = errno == 0;
     if (front.connection != nullptr) {
-      ++counts_.lost;
+      ++metrics_.crashed;
       WEBAPI_LOG(kSource, "the front %d ended within a request, status %d", pid, status);
       shutdown(front.connection->socket.Get(), SHUT_RDWR);
       front.connection.reset();
     }
     front.pid = 0;
     front.isLast = true;
+    CountEnding(metrics_.fronts, EndingOf(status));
     if (isGone) {
       server_.Unwatch(it->first);
       fronts_.erase(it);
@@ -307,7 +294,7 @@ bool WorkerHub::IsIdle() const {
                        [&](const auto& entry) { return what(entry.second); });
   };
   if (isStopping_) {
-    return waiting_.empty() && fronts_.empty() && workers_.empty();
+    return waiting_.empty() && fronts_.empty() && workers_.IsEmpty();
   }
   const auto alive = std::count_if(fronts_.begin(), fronts_.end(),
                                    [](const auto& entry) { return entry.second.pid != 0; });
@@ -329,9 +316,7 @@ void WorkerHub::KillAll() {
       kill(-front.pid, SIGKILL);
     }
   }
-  for (const auto& [pid, key] : workers_) {
-    kill(-pid, SIGKILL);
-  }
+  workers_.KillAll();
 }
 
 }  // namespace QELO

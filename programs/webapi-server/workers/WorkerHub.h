@@ -9,8 +9,10 @@
 #include <vector>
 
 #include "programs/server/Connection.h"
+#include "programs/server/metrics/Metrics.h"
 #include "programs/server/processes/Residents.h"
 #include "programs/webapi-server/workers/ControlChannel.h"
+#include "programs/webapi-server/workers/Roster.h"
 #include "programs/webapi-server/workers/WorkerCalls.h"
 #include "programs/webapi-server/workers/WorkerLimits.h"
 #include "webapi/base/UniqueFd.h"
@@ -24,24 +26,15 @@ class Server;
 /// takes soon goes the way of all others.
 class WorkerHub : public Residents {
  public:
-  /// What has happened since the start.
-  struct Counts {
-    unsigned long taken = 0;    ///< requests that a front got
-    unsigned long left = 0;     ///< of them: served by a process of their own after all
-    unsigned long lost = 0;     ///< of them: whose front ended
-    unsigned long workers = 0;  ///< that were started
-    unsigned long killed = 0;   ///< workers that a signal ended
-  };
-
+  /// @param metrics     is kept up to date
   /// @param argc, argv  main()'s, whose area shows the call that a process makes
-  WorkerHub(Server& server, const WorkerLimits& limits, int argc, char** argv);
+  WorkerHub(Server& server, const WorkerLimits& limits, Metrics& metrics, int argc, char** argv);
   ~WorkerHub() override;
 
   /// Starts the fronts. @return false, with errno, when they cannot be had
   bool Open();
   /// Reads anew which calls are workers'.
   void Reload() { calls_.Read(); }
-  const Counts& Counted() const { return counts_; }
 
   bool TakeOver(std::unique_ptr<Connection>& connection) override;
   bool Hear(int descriptor) override;
@@ -73,15 +66,14 @@ class WorkerHub : public Residents {
 
   Server& server_;
   const WorkerLimits limits_;
+  Metrics& metrics_;
   const int argc_;
   char** const argv_;
   WorkerCalls calls_;
-  std::unordered_map<int, Front> fronts_;           ///< by channel
-  std::unordered_map<pid_t, std::string> workers_;  ///< keys
-  std::unordered_map<std::string, unsigned> workersOf_;
+  std::unordered_map<int, Front> fronts_;  ///< by channel
+  Roster workers_;
   std::deque<Held> waiting_;
   ServerClock::time_point nextStart_;
-  Counts counts_;
   bool isStopping_ = false;
 };
 

@@ -62,6 +62,28 @@ TEST(MetricsReport, TextHasBucketsThatAddUp) {
   }
 }
 
+TEST(MetricsReport, TellsOfProcessesThatStay) {
+  Metrics metrics;
+  metrics.fronts.now = 2;
+  metrics.workers.started = 7;
+  metrics.workers.timeOut = 3;
+  metrics.byFronts = 5;
+  metrics.forking.Add(microseconds(200));
+  const std::string text = MetricsReport::Text(metrics);
+  for (const char* line : {"webapi_server_staying{process=\"front\"} 2\n",
+                           "webapi_server_started_total{process=\"worker\"} 7\n",
+                           "webapi_server_ended_total{process=\"worker\",reason=\"time_out\"} 3\n",
+                           "webapi_server_ended_total{process=\"front\",reason=\"crash\"} 0\n",
+                           "webapi_server_calls_total{road=\"worker\"} 5\n",
+                           "webapi_server_calls_total{road=\"forked\"} 1\n"}) {
+    EXPECT_NE(text.find(line), std::string::npos) << line << text;
+  }
+  const Json::Value object = MetricsReport::Object(metrics);
+  EXPECT_EQ(object["staying"]["worker"]["ended"]["time_out"], 3U);
+  EXPECT_EQ(object["staying"]["front"]["now"], 2U);
+  EXPECT_EQ(object["calls"]["worker"], 5U);
+}
+
 TEST(MetricsReport, CountsKeepTheirDigits) {
   Metrics metrics;
   metrics.served = 123456789012;
