@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <fenv.h>
+#include <linux/capability.h>
 #include <locale.h>
 #include <sys/prctl.h>
 #include <sys/stat.h>
@@ -111,15 +112,25 @@ const char* Remains::TextOf(Left left) {
 
 bool Remains::Ids::operator==(const Ids& other) const {
   return memcmp(user, other.user, sizeof user) == 0 &&
-         memcmp(group, other.group, sizeof group) == 0 && groups == other.groups;
+         memcmp(group, other.group, sizeof group) == 0 && groups == other.groups &&
+         capabilities == other.capabilities && secureBits == other.secureBits &&
+         noNewPrivileges == other.noNewPrivileges;
 }
 
+/// By ids alone a process looks the same that has become the root of a user namespace of its own.
 bool Remains::Read(Ids& ids) {
+  __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
+  __user_cap_data_struct words[_LINUX_CAPABILITY_U32S_3]{};
+  static_assert(sizeof words == sizeof ids.capabilities);
+  const bool hasWords = syscall(SYS_capget, &header, words) == 0;
+  memcpy(ids.capabilities.data(), words, sizeof words);
+  ids.secureBits = prctl(PR_GET_SECUREBITS);
+  ids.noNewPrivileges = prctl(PR_GET_NO_NEW_PRIVS, 0, 0, 0, 0);
   const int count = getgroups(0, nullptr);
   ids.groups.resize(count > 0 ? static_cast<size_t>(count) : 0);
   return getresuid(&ids.user[0], &ids.user[1], &ids.user[2]) == 0 &&
          getresgid(&ids.group[0], &ids.group[1], &ids.group[2]) == 0 &&
-         getgroups(count, ids.groups.data()) == count;
+         getgroups(count, ids.groups.data()) == count && hasWords;
 }
 
 bool Remains::Read(Schedule& schedule) {

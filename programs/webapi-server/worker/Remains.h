@@ -56,6 +56,9 @@ class Remains {
     uid_t user[3];
     gid_t group[3];
     std::vector<gid_t> groups;
+    std::array<uint32_t, 6> capabilities{};  ///< as capget(2) gives them
+    int secureBits = 0;                      ///< what root is to a program that is executed
+    int noNewPrivileges = 0;
     bool operator==(const Ids& other) const;
   };
   struct Schedule {
