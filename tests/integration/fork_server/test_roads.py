@@ -1,4 +1,4 @@
-"""What users do, by entry.cgi and by the fork server: the answers are the same bytes, dates and ids aside.
+"""What users do, by entry.cgi, by the fork server and by its workers: the answers are the same bytes, dates and ids aside.
 Requests that say who calls, send files and get files; test_requests.py has those that anybody makes."""
 
 import json
@@ -10,7 +10,7 @@ import pytest
 
 from conftest import ROOT, answer_of, run_entry, session_of
 from files import home, put  # noqa: F401  (a fixture)
-from scgi import start  # noqa: F401  (a fixture)
+from scgi import start, start_workers  # noqa: F401  (fixtures)
 
 FILES = "api=QELO.Files.Item&version=1&method="
 SESSION = "api=QELO.Access.Session&version=1&method=current"
@@ -27,16 +27,17 @@ def alike(answer):
 
 
 @pytest.fixture
-def both(start):
-    """Makes a request by both roads and gives the answer, which is the same."""
-    server = start()
+def both(start, start_workers):
+    """Makes a request by all roads and gives the answer, which is the same."""
+    servers = [start(), start_workers("--fronts", 1)]
 
     def ask(query=None, prepare=lambda: None, **request):
         prepare()
         expected = run_entry(query, **request)
-        prepare()
-        got = server.request(query, **request)
-        assert alike(got) == alike(expected), (query, request)
+        for server in servers:
+            prepare()
+            got = server.request(query, **request)
+            assert alike(got) == alike(expected), (server.options, query, request)
         return got
 
     return ask
@@ -111,14 +112,17 @@ def test_CompoundRequests_OfAUser_AreAnsweredAlike(both, sid):
         assert len(answer["data"]["result"]) == 4
 
 
+@pytest.mark.parametrize("isolation", ["process", "worker"])
 @pytest.mark.parametrize("library", FAULTY)
-def test_LibrariesThatMisbehave_DoSoAlike(both, describe, library):
-    describe("QELO.Test.Call", library)
-    both("api=QELO.Test.Call&version=1&method=run")
+def test_LibrariesThatMisbehave_DoSoAlike(both, describe, library, isolation):
+    describe("QELO.Test.Call", library, methods={"1": [{"run": {"isolation": isolation}}]})
+    for _ in range(2):  # the second may have a worker that is there already
+        both("api=QELO.Test.Call&version=1&method=run")
 
 
-def test_Redirects_AreAlike(both, describe):
-    describe("QELO.Test.Call", "redirecting.so")
+@pytest.mark.parametrize("isolation", ["process", "worker"])
+def test_Redirects_AreAlike(both, describe, isolation):
+    describe("QELO.Test.Call", "redirecting.so", methods={"1": [{"run": {"isolation": isolation}}]})
     answer = both("api=QELO.Test.Call&version=1&method=run&to=%22/there?x=1%22", HTTP_HOST="nas.example:81",
                   SERVER_NAME="nas.example", SERVER_PORT="81")
     assert b"Location: " in answer
