@@ -41,8 +41,8 @@ bool isWanted() {
 }
 
 void count(const APIRequest& request) {
-  static UsageCounter counter(Paths::kCounterDir);
-  counter.Increase(request.GetAPIClass(), request.GetAPIMethod(), request.GetAPIVersion());
+  UsageCounter(Paths::kCounterDir)
+      .Increase(request.GetAPIClass(), request.GetAPIMethod(), request.GetAPIVersion());
 }
 
 }  // namespace
@@ -79,7 +79,7 @@ bool UsageCounter::Increase(const std::string& api, const std::string& method, i
 }
 
 void UsageCounter::Count(const APIRequest& request) {
-  // Both last as long as the process: the switch is read once, the directory made once.
+  // The switch is read once a process, which serves one request.
   static const bool enabled = isWanted();
   if (enabled) {
     count(request);

@@ -249,6 +249,17 @@ class CountedCalls : public RunnerTest {
   int reads_ = 0;  ///< of the switch, during the two calls
 };
 
+TEST_F(CountedCalls, InAProcessThatLivesOn_GoOnThoughTheDirectoryIsRemoved) {
+  platform->settings["enable_data_collect"] = "yes";
+  MakeRequest("QELO.Test.Call", 1, "run");
+  for (int i = 0; i < 2; ++i) {
+    std::filesystem::remove_all(Paths::kCounterDir);
+    UsageCounter::CountInResident(*request);
+    EXPECT_TRUE(std::filesystem::exists(std::string(Paths::kCounterDir) + "/QELO.Test.Call.json"))
+        << i;
+  }
+}
+
 TEST_F(CountedCalls, OnlyWhenCollectionIsEnabled) {
   EXPECT_FALSE(IsCounted("{}"));
   EXPECT_EQ(reads_, 1);
