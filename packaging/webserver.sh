@@ -96,19 +96,25 @@ webserver_configure() {
   fi
 }
 
-# webserver_scgi PREFIX SOCKET: the configuration that has PREFIX/webapi/entry.cgi and PREFIX/webapi/rest
-# served by what listens at SOCKET, which is that of the recipe for the fork server.
+# webserver_scgi PREFIX SOCKET [MORE]: the configuration that has PREFIX/webapi/entry.cgi and
+# PREFIX/webapi/rest served by what listens at SOCKET, which is that of the recipe for the fork server.
+# MORE, not empty: there is another such part before.
 webserver_scgi() {
-  local prefix=$1 socket=$2 name=$webserver_kind part
+  local prefix=$1 socket=$2 more=${3:-} name=$webserver_kind part
   case $webserver_kind in
     lighttpd)
-      echo 'server.modules += ("mod_scgi")'
       part="/^server.stream/,\$p"
+      if [[ -n $more ]]; then
+        part="/^\\\$HTTP/,\$p"
+      else
+        echo 'server.modules += ("mod_scgi")'
+      fi
       ;;
     nginx) part='/^ *location /,/^    }/p' ;;
     apache)
       name=apache2
-      part="/^LoadModule \\(proxy\\|setenvif\\)/p; /^SetEnvIf/,\$p"
+      part="/^SetEnvIf/,\$p"
+      [[ -n $more ]] || part="/^LoadModule \\(proxy\\|setenvif\\)/p; $part"
       ;;
   esac
   sed -n "$part" "$webserver_packaging/$name-scgi.conf.in" \
