@@ -92,6 +92,10 @@ install(CODE "
         fi
       done\" COMMAND_ERROR_IS_FATAL ANY)
   endif()")
+# The page that sharing links lead to, for the web server to serve.
+install(FILES apis/QELO.Share.Link/page/index.html apis/QELO.Share.Link/page/page.css
+              apis/QELO.Share.Link/page/page.js
+        DESTINATION ${CMAKE_INSTALL_DATADIR}/webapi/sharing)
 # The list of shared folders is the administrator's: one that is there stays, changed or not.
 set(webapi_shares ${WEBAPI_ROOT_PREFIX}/etc/webapi)
 install(CODE "

@@ -6,10 +6,11 @@ webserver_pid=
 webserver_helper_pid=
 webserver_account=www-data  # Apache's, where root starts it: it serves nothing as root
 webserver_packaging=$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd)
+webserver_pages=${webserver_packaging%/*}/apis/QELO.Share.Link/page
 
 # webserver_start DIR PORT ENTRY PID [EXTRA]: serves ENTRY as /webapi/entry.cgi, and the rest.cgi
-# beside it as /webapi/rest, with configuration and logs in DIR; PID is the file for its process id,
-# EXTRA one of further configuration. The server ends with this shell, however that ends. Says why when it cannot start.
+# beside it as /webapi/rest, and the page of sharing links, with configuration and logs in DIR; PID is
+# the file for its process id, EXTRA one of further configuration. The server ends with this shell, however that ends. Says why when it cannot start.
 webserver_start() {
   local dir=$1 port=$2 entry=$3 pid=$4 extra=${5:-} tries command=()
   mkdir -p "$dir/www" "$dir/uploads"
@@ -86,7 +87,7 @@ webserver_start_fcgiwrap() {
 webserver_configure() {
   local dir=$1 port=$2 entry=$3 pid=$4 extra=$5 name=$webserver_kind
   [[ $name != apache ]] || name=apache2
-  sed -e "s|@DIR@|$dir|g; s|@PORT@|$port|g; s|@ENTRY@|$entry|g; s|@REST@|${entry%/*}/rest.cgi|g; s|@PID@|$pid|g" \
+  sed -e "s|@DIR@|$dir|g; s|@PORT@|$port|g; s|@ENTRY@|$entry|g; s|@REST@|${entry%/*}/rest.cgi|g; s|@PID@|$pid|g; s|@PAGES@|$webserver_pages|g" \
     "$webserver_packaging/$name.conf.in" > "$dir/$name.conf"
   [[ -n $extra ]] || return 0
   if [[ $webserver_kind == nginx ]]; then  # into its server
@@ -97,7 +98,8 @@ webserver_configure() {
 }
 
 # webserver_scgi PREFIX SOCKET [MORE]: the configuration that has PREFIX/webapi/entry.cgi and
-# PREFIX/webapi/rest served by what listens at SOCKET, which is that of the recipe for the fork server.
+# PREFIX/webapi/rest served by what listens at SOCKET, which is that of the recipe for the fork server,
+# and PREFIX/webapi/sharing/, the page of sharing links.
 # MORE, not empty: there is another such part before.
 webserver_scgi() {
   local prefix=$1 socket=$2 more=${3:-} name=$webserver_kind part
@@ -118,7 +120,7 @@ webserver_scgi() {
       ;;
   esac
   sed -n "$part" "$webserver_packaging/$name-scgi.conf.in" \
-    | sed "s|/webapi/|$prefix/webapi/|g; s|@SOCKET@|$socket|g"
+    | sed "s|/webapi/|$prefix/webapi/|g; s|@SOCKET@|$socket|g; s|@PAGES@|$webserver_pages|g"
 }
 
 webserver_port_is_taken() {

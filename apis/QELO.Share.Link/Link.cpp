@@ -9,6 +9,7 @@
 
 #include <string>
 
+#include "FilesLink.h"
 #include "QrCode.h"
 
 namespace {
@@ -20,6 +21,7 @@ namespace JsonHelper = QELO::JsonHelper;
 
 constexpr char kApi[] = "QELO.Share.Link";
 constexpr char kCookie[] = "sharing_sid";
+constexpr char kFilesProject[] = "files";
 constexpr const char* kTerms[] = {"name",   "path",    "protect", "password", "matchAddress",
                                   "upload", "expires", "maxUses", "maxBytes"};
 
@@ -80,24 +82,47 @@ Json::Value TermsOf(const APIRequest& request) {
   return terms;
 }
 
-/// Adds the address that visitors are sent to, where the secret is known.
+/// Adds the address that visitors are sent to, where the secret is known. What stands behind "#" no
+/// browser sends, so that it is in no server's log.
 void AddAddress(const APIRequest& request, Json::Value& link) {
   if (JsonHelper::hasMember(link, "link")) {
-    link["url"] = request.GetSharingURL("") + JsonHelper::asString(link["link"]);
+    link["url"] = request.GetSharingURL("") + "#" + JsonHelper::asString(link["link"]);
   }
 }
 
 void Answer(APIResponse* response, SharingLink::Result result, const Json::Value& data) {
   if (result == SharingLink::LINK_OK) {
     response->SetSuccess(data);
+  } else if (result == SharingLink::LINK_BAD_TERMS) {
+    response->SetError(QELO::WEBAPI_ERR_BAD_REQUEST,
+                       share::faultAt("", "terms",
+                                      "the terms do not go together, or a text of theirs is too "
+                                      "long or holds control characters"));
   } else {
     response->SetError(ErrorOf(result));
   }
 }
 
+/// Whether a link of the caller's is of files; one that is not known is of none.
+bool IsOfFiles(const APIRequest& request, long long id) {
+  Json::Value links;
+  if (SharingLink::List(request, links) == SharingLink::LINK_OK) {
+    for (const Json::Value& link : links) {
+      if (JsonHelper::member(link, "id") == Json::Value(Json::Int64{id})) {
+        return JsonHelper::member(link, "project") == Json::Value(kFilesProject);
+      }
+    }
+  }
+  return false;
+}
+
 void Create(APIRequest* request, APIResponse* response) {
   Json::Value terms = TermsOf(*request);
   terms["project"] = request->GetParam("project");
+  if (terms["project"] == Json::Value(kFilesProject) &&
+      !share::checkFilesTerms(*request, true, terms, response)) {
+    return;
+  }
   Json::Value link;
   const SharingLink::Result result = SharingLink::Create(*request, terms, link);
   if (result == SharingLink::LINK_OK) {
@@ -121,6 +146,12 @@ void Change(APIRequest* request, APIResponse* response) {
   Json::Value terms = TermsOf(*request);
   if (request->HasParam("renew")) {
     terms["renew"] = request->GetParam("renew");
+  }
+  const bool mayMatter =
+      JsonHelper::hasMember(terms, "path") || JsonHelper::hasMember(terms, "protect");
+  if (mayMatter && IsOfFiles(*request, id.Get()) &&
+      !share::checkFilesTerms(*request, false, terms, response)) {
+    return;
   }
   Json::Value link;
   const SharingLink::Result result = SharingLink::Change(*request, id.Get(), terms, link);

@@ -1,6 +1,20 @@
 #include "webapi/platform/Sharing.h"
 
+#include <algorithm>
+
 namespace QELO::sharing {
+namespace {
+
+/// The path that the program and the page stand below. An address a method,
+/// ".../rest/API/vN/METHOD", is the program's, too.
+std::string pathOfFront(const std::string& path) {
+  const size_t rest = path.rfind("/rest/");
+  const bool isMethods = rest != std::string::npos &&
+                         std::count(path.begin() + static_cast<long>(rest), path.end(), '/') == 4;
+  return isMethods ? path.substr(0, rest + 1) : path;
+}
+
+}  // namespace
 
 bool GetSharingURL(const std::string& host, int port, bool isHttps, const std::string& path,
                    const std::string& rewriteApp, std::string& url, _tag_SHARING_URL_TYPE& type) {
@@ -17,7 +31,7 @@ bool GetSharingURL(const std::string& host, int port, bool isHttps, const std::s
   if (!rewriteApp.empty()) {
     url += "/" + rewriteApp + "/";
   } else {
-    url += path.empty() ? "/" : path;
+    url += path.empty() ? "/" : pathOfFront(path);
   }
   url += "sharing/";
   return true;

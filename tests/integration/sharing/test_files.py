@@ -64,3 +64,36 @@ def test_LinkToOneFile_SharesThatFile(alice, visit, folder):
 
 def test_WithoutASession_NothingIsShared(visitor, folder):
     assert Visitor(visitor.client, visitor.link).call("list", API, path=folder).code == 122
+
+
+def test_LinkWithoutProtection_IsMadeInTheOwnersName(alice, visit, folder):
+    link = alice.make(project="files", path=folder)
+    assert link["protect"] == "owner"
+    assert "a.txt" in names(visit(link), folder)
+
+
+@pytest.mark.parametrize("protect", ["none", "session"])
+def test_OtherProtection_IsRefused(alice, folder, protect):
+    answer = alice.call("create", project="files", protect=protect, path=folder)
+    assert answer.code == 101
+    assert [fault["path"] for fault in answer.json["error"]["errors"]] == ["/protect"]
+    link = alice.make(project="files", path=folder)
+    assert alice.call("change", id=link["id"], protect=protect).code == 101
+
+
+@pytest.mark.parametrize("path,reason", [
+    ("/own/shared/no.txt", "not_found"), ("/no/such", "no_share"), ("/own/shared/out", "link"),
+    ("own/shared", "bad_path")])
+def test_PathThatLeadsToNothing_IsRefused(alice, folder, path, reason):
+    answer = alice.call("create", project="files", path=path)
+    assert answer.code == 409, answer.body
+    assert answer.json["error"]["errors"] == {"path": path, "reason": reason}
+    link = alice.make(project="files", path=folder)
+    assert alice.call("change", id=link["id"], path=path).code == 409
+    assert alice.call("change", id=link["id"], path=folder + "/deep").data["path"] == folder + "/deep"
+
+
+def test_LinkWithoutAPath_IsRefused(alice):
+    answer = alice.call("create", project="files")
+    assert answer.code == 101
+    assert [fault["path"] for fault in answer.json["error"]["errors"]] == ["/path"]

@@ -123,7 +123,24 @@ def test_Open_ByGetOrFromAnotherSite_IsRefused(alice, stranger):
     {"password": "x" * 129}, {"protect": "none", "password": "secret"},
 ])
 def test_BadTerms_MakeNoLink(alice, terms):
-    assert alice.call("create", project="files", **terms).code == 101
+    answer = alice.call("create", project=PROJECT, **terms)
+    assert answer.code == 101
+    assert answer.json["error"]["errors"][0]["path"] == f"/{list(terms)[-1]}"
+
+
+@pytest.mark.parametrize("method,name", [
+    ("create", "project"), ("change", "id"), ("remove", "id"), ("qr", "link"), ("open", "link")])
+def test_ParameterThatIsMissing_IsNamed(alice, method, name):
+    answer = alice.call(method)
+    assert answer.code == 101
+    assert [fault["path"] for fault in answer.json["error"]["errors"]] == [f"/{name}"]
+
+
+def test_TermsThatOnlyTogetherAreWrong_AreToldSo(alice):
+    link = alice.make(password="secret")
+    answer = alice.call("change", id=link["id"], protect="none")
+    assert answer.code == 101
+    assert [fault["rule"] for fault in answer.json["error"]["errors"]] == ["terms"]
 
 
 def test_Links_OfOneOwner_AreLimited(bob):
@@ -136,6 +153,6 @@ def test_Links_OfOneOwner_AreLimited(bob):
         " created, expires, max_uses, uses, max_bytes FROM links, n"
         " WHERE id = (SELECT max(id) FROM links)")
     try:
-        assert bob.call("create", project="files").code == 406
+        assert bob.call("create", project=PROJECT).code == 406
     finally:
         change_database("DELETE FROM links WHERE typeof(hash) = 'integer'")

@@ -145,7 +145,7 @@ def test_CompoundRequest_AsksForEachEntry(alice, visit):
 
 def test_Owner_ListsChangesAndRemovesLinks(alice):
     link = alice.make(name="Holiday", path="/photos", maxUses=3)
-    assert link["url"] == f"http://127.0.0.1:{alice.client.port}/webapi/sharing/{link['link']}"
+    assert link["url"] == f"http://127.0.0.1:{alice.client.port}/webapi/sharing/#{link['link']}"
     listed = [each for each in alice.call("list").data["links"] if each["id"] == link["id"]]
     assert listed[0] == {key: link[key] for key in link if key not in ("link", "url")}
     changed = alice.call("change", id=link["id"], name="5", renew="true").data

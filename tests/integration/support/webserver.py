@@ -11,6 +11,7 @@ from pathlib import Path
 
 SOURCE = Path(__file__).resolve().parents[3]
 PACKAGING = SOURCE / "packaging"
+PAGES = SOURCE / "apis" / "QELO.Share.Link" / "page"
 FORK_SERVER = Path(os.environ.get("WEBAPI_BUILD_DIR", SOURCE / "build" / "test")) / "programs" / "webapi-server"
 
 
@@ -30,12 +31,14 @@ class WebServer:
         self.port = free_port()
         for folder in ("www", "uploads"):
             (self.directory / folder).mkdir(parents=True, exist_ok=True)
+        shutil.copytree(PAGES, self.directory / "sharing", dirs_exist_ok=True)
         text = (PACKAGING / self.template).read_text()
         self.socket = None
         if "@SOCKET@" in text:  # in a directory that nobody but root may write
             self.socket = Path(tempfile.mkdtemp(prefix="webapi-socket-")) / "server.sock"
             self.socket.parent.chmod(0o755)
-        values = {"SOCKET": self.socket, "DIR": directory, "PORT": self.port, "ENTRY": entry, "REST": Path(entry).with_name("rest.cgi"), "PID": pid or f"{directory}/pid"}
+        values = {"SOCKET": self.socket, "DIR": directory, "PORT": self.port, "ENTRY": entry, "REST": Path(entry).with_name("rest.cgi"), "PID": pid or f"{directory}/pid",
+                  "PAGES": self.directory / "sharing"}
         for name, value in values.items():
             text = text.replace(f"@{name}@", str(value))
         self.entry = entry

@@ -44,6 +44,12 @@ TEST(SharingURL, EmptyPathIsTheRoot) {
   EXPECT_EQ(make("nas", 0, false, "", "").url, "http://nas/sharing/");
 }
 
+TEST(SharingURL, AddressOfAMethod_LeadsBesideTheProgramToo) {
+  EXPECT_EQ(make("nas", 0, false, "/webapi/rest/QELO.Share.Link/v1/", "").url,
+            "http://nas/webapi/sharing/");
+  EXPECT_EQ(make("nas", 0, false, "/rest/webapi/", "").url, "http://nas/rest/webapi/sharing/");
+}
+
 TEST(SharingURL, WithoutHostThereIsNone) {
   const Address address = make("", 80, false, "/", "");
   EXPECT_FALSE(address.good);
