@@ -7,8 +7,11 @@
 
 namespace QELO {
 
-void Options::Text(const std::string& name, std::function<bool(const std::string&)> take) {
-  options_.push_back({"--" + name, std::move(take)});
+void Options::Text(const std::string& name, std::function<bool(const std::string&)> take,
+                   const std::string& wrong) {
+  const std::string option = "--" + name;
+  options_.push_back({option, std::move(take),
+                      wrong.empty() ? option + " needs another value" : option + ": " + wrong});
 }
 
 void Options::Number(const std::string& name, unsigned least, unsigned most,
@@ -34,8 +37,12 @@ bool Options::Read(int argc, char** argv, std::string& error) const {
       error = "there is no option " + name;
       return false;
     }
-    if (i + 1 >= argc || !found->take(argv[i + 1])) {
-      error = name + " needs another value";
+    if (i + 1 >= argc) {
+      error = name + " needs a value";
+      return false;
+    }
+    if (!found->take(argv[i + 1])) {
+      error = found->wrong;
       return false;
     }
   }

@@ -14,8 +14,10 @@ namespace QELO {
 class Options {
  public:
   /// @param name  without its dashes
-  /// @param take  is given the value; false: it is none of this option's
-  void Text(const std::string& name, std::function<bool(const std::string&)> take);
+  /// @param take   is given the value; false: it is none of this option's
+  /// @param wrong  what is said of such a value
+  void Text(const std::string& name, std::function<bool(const std::string&)> take,
+            const std::string& wrong = "");
   void Number(const std::string& name, unsigned least, unsigned most,
               std::function<void(unsigned)> take);
   /// @param error  receives what is wrong, in words
@@ -27,6 +29,7 @@ class Options {
   struct Option {
     std::string name;
     std::function<bool(const std::string&)> take;
+    std::string wrong;
   };
   std::vector<Option> options_;
 };

@@ -27,6 +27,7 @@
 namespace {
 
 constexpr char kBindAtStart[] = "LD_BIND_NOW";
+constexpr char kNoAccount[] = "no such account";
 constexpr char kUsage[] =
     "usage: webapi-server [--socket PATH] [--port N] [--client ACCOUNT]\n"
     "                     [--metrics PATH [--reader ACCOUNT]] [LIMITS]\n"
@@ -87,9 +88,9 @@ bool readOptions(int argc, char** argv, Settings& settings) {
   QELO::Options options;
   options.Text("socket", place(settings.socket));
   options.Number("port", 1, 65535, count(settings.port));
-  options.Text("client", account(settings.peers.client));
+  options.Text("client", account(settings.peers.client), kNoAccount);
   options.Text("metrics", place(settings.peers.figures));
-  options.Text("reader", account(settings.peers.reader));
+  options.Text("reader", account(settings.peers.reader), kNoAccount);
   options.Number("requests", 1, 4096, count(limits.atOnce));
   options.Number("queue", 0, 65536, count(limits.queued));
   options.Number("arriving", 1, 65536, count(limits.arriving));

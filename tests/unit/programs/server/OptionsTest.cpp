@@ -17,6 +17,8 @@ class ServerOptions : public testing::Test {
       text = value;
       return value != "bad";
     });
+    options.Text(
+        "guest", [](const std::string&) { return false; }, "no such account");
     words.insert(words.begin(), "program");
     return options.Read(static_cast<int>(words.size()), const_cast<char**>(words.data()), error);
   }
@@ -56,9 +58,14 @@ TEST_F(ServerOptions, UnknownAndIncompleteOnesAreNamed) {
   EXPECT_FALSE(Read({"calls", "1"}));
   EXPECT_EQ(error, "there is no option calls");
   EXPECT_FALSE(Read({"--calls"}));
-  EXPECT_EQ(error, "--calls needs another value");
+  EXPECT_EQ(error, "--calls needs a value");
   EXPECT_FALSE(Read({"--name", "bad"}));
   EXPECT_EQ(error, "--name needs another value");
+}
+
+TEST_F(ServerOptions, WhatIsWrongWithAValueIsSaidInTheOptionsOwnWords) {
+  EXPECT_FALSE(Read({"--guest", "nobody-here"}));
+  EXPECT_EQ(error, "--guest: no such account");
 }
 
 TEST_F(ServerOptions, HelpIsAskedForInTwoWaysAnywhere) {
