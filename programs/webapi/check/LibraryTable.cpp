@@ -88,6 +88,16 @@ Json::Value entriesOf(void* library) {
   return entries;
 }
 
+/// The loader's words, without the path, which stands before them anyway.
+std::string whyNotLoaded(const std::string& name) {
+  const char* error = dlerror();
+  std::string reason = error != nullptr ? error : "nobody knows why";
+  if (reason.rfind(name + ": ", 0) == 0) {
+    reason.erase(0, name.size() + 2);
+  }
+  return "it cannot be loaded: " + reason;
+}
+
 /// The child's whole work.
 [[noreturn]] void report(const std::string& path, int seconds, int file, int pipe) {
   Json::Value told;
@@ -98,10 +108,7 @@ Json::Value entriesOf(void* library) {
     const bool isHidden = file >= 0 && access(path.c_str(), R_OK) != 0;
     const std::string name = isHidden ? "/proc/self/fd/" + std::to_string(file) : path;
     void* library = dlopen(name.c_str(), RTLD_NOW);
-    const char* error = library == nullptr ? dlerror() : nullptr;
-    told = library != nullptr ? entriesOf(library)
-                              : Json::Value(std::string("it cannot be loaded: ") +
-                                            (error != nullptr ? error : "nobody knows why"));
+    told = library != nullptr ? entriesOf(library) : Json::Value(whyNotLoaded(name));
   }
   WriteText(pipe, JsonHelper::toString(told));
   _exit(0);

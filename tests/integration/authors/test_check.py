@@ -256,6 +256,7 @@ def test_Check_OfFaultyLibrary_SaysWhy(check, library, reason):
     lines, status = check(described(["run"], library), "--timeout", "1", library=True)
     assert (len(lines), status) == (1, 1)
     assert f"{PLUGINS / library}: {reason}" in lines[0]
+    assert lines[0].count(str(PLUGINS / library)) == 1
 
 
 def test_Check_OfRelativeLibrary_LooksBesideTheFile(check, tmp_path):
