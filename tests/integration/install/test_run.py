@@ -158,6 +158,20 @@ def test_PortThatIsTaken_IsSaidBeforeAnythingIsBuilt(tmp_path):
     assert not (copy / "build").exists()
 
 
+def test_BuildWithoutATerminal_IsSaidBeforeIt(tmp_path):
+    """The tree is one that was built before."""
+    copy = tmp_path / "tree"
+    shutil.copytree(SOURCE / "packaging", copy / "packaging")
+    shutil.copy(SOURCE / "run", copy)
+    program = copy / "build" / "dev" / "programs" / "entry.cgi"
+    program.parent.mkdir(parents=True)
+    program.touch(mode=0o755)
+    result = subprocess.run(["./run", "--port", str(free_port())], cwd=copy, capture_output=True,
+                            text=True, timeout=60, check=False)
+    assert result.returncode == 1  # there is nothing to build
+    assert result.stdout == "Building what has changed.\n"
+
+
 @pytest.mark.parametrize("program", ["run", "test"])
 @pytest.mark.parametrize("option", ["-h", "--help"])
 def test_Help_IsPrinted(program, option):
